@@ -1,0 +1,32 @@
+# quelta_test(NAME SOURCES file... [LIBS target...] [LABELS label...] [DEFINES macro...]
+#             [WRAP function...])
+#
+# One GoogleTest program per unit. Each case is discovered and runs in a process of its own, so
+# cases share no state and run in any order and in parallel. The test sees private members
+# (-fno-access-control); WRAP lets it replace system calls through the linker's --wrap.
+find_package(GTest REQUIRED)
+include(GoogleTest)
+
+function(quelta_test name)
+  cmake_parse_arguments(arg "" "TIMEOUT" "SOURCES;LIBS;LABELS;DEFINES;WRAP" ${ARGN})
+  add_executable(${name} ${arg_SOURCES})
+  target_include_directories(${name} PRIVATE
+    ${PROJECT_SOURCE_DIR}/src ${PROJECT_SOURCE_DIR}/tests)
+  target_link_libraries(${name} PRIVATE ${arg_LIBS} quelta_util GTest::gmock GTest::gtest_main)
+  target_compile_options(${name} PRIVATE -fno-access-control)
+  target_compile_definitions(${name} PRIVATE ${arg_DEFINES})
+  foreach(function ${arg_WRAP})
+    target_link_options(${name} PRIVATE -Wl,--wrap=${function})
+  endforeach()
+  quelta_warnings(${name})
+  quelta_sanitize(${name})
+  if(NOT arg_LABELS)
+    set(arg_LABELS unit)
+  endif()
+  if(NOT arg_TIMEOUT)
+    set(arg_TIMEOUT 120)
+  endif()
+  gtest_discover_tests(${name}
+    DISCOVERY_TIMEOUT 60
+    PROPERTIES LABELS "${arg_LABELS}" TIMEOUT ${arg_TIMEOUT})
+endfunction()
