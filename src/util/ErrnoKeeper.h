@@ -1,0 +1,23 @@
+#ifndef QUELTA_UTIL_ERRNOKEEPER_H_
+#define QUELTA_UTIL_ERRNOKEEPER_H_
+
+// Puts errno back at the end of a scope to what it was at its beginning.
+// Not thread-safe; one thread at a time per object.
+
+#include <cerrno>
+
+class ErrnoKeeper {
+public:
+    ErrnoKeeper() = default;
+    ~ErrnoKeeper() { errno = _saved; }
+    ErrnoKeeper(const ErrnoKeeper&) = delete;
+    ErrnoKeeper& operator=(const ErrnoKeeper&) = delete;
+
+    // The value that will be put back.
+    int saved() const { return _saved; }
+
+private:
+    const int _saved = errno;
+};
+
+#endif  // QUELTA_UTIL_ERRNOKEEPER_H_

@@ -1,0 +1,23 @@
+#ifndef QUELTA_UTIL_LOGMSGMETADATA_H_
+#define QUELTA_UTIL_LOGMSGMETADATA_H_
+
+// What is known of a message besides its text. It is built once for each message that passes the
+// level test, and read by every appender and layout that the message reaches.
+// Immutable after construction; safe to share.
+
+#include "util/LogLevel.h"
+#include "util/Timeval.h"
+
+class Logger;
+
+struct LogMsgMetadata {
+    // Stamps the current time.
+    // Requires: `logger` is not null and outlives the metadata.
+    LogMsgMetadata(const Logger* logger, LogLevel lvl) : category(logger), level(lvl) {}
+
+    CurrentTimeval stamp;
+    const Logger* category;  // the logger that wrote the message, not owned
+    LogLevel level;
+};
+
+#endif  // QUELTA_UTIL_LOGMSGMETADATA_H_

@@ -1,0 +1,126 @@
+#ifndef QUELTA_UTIL_LOGGER_H_
+#define QUELTA_UTIL_LOGGER_H_
+
+// The handle through which a module writes log messages.
+//
+//     static Logger logger("Pathname");                    // one per module, before main
+//     logger.error("cannot open %s: %m", path.c_str());    // anywhere, on any thread
+//
+// A logger is bound to the channel of its name. Loggers made before logging is initialized wait in
+// a list for Logger::initialize(), which binds them, newest first; later ones are bound at once.
+// Binding happens once: a channel that is made afterwards is not seen by the loggers of its name.
+//
+// Before initialization a waiting logger writes through the root channel: INFO and above go to
+// standard error as the bare message, DEBUG is dropped. A logger that is not on the list then (a
+// copy, or a static one whose constructor has not run yet) can promise nothing about levels: its
+// messages go to standard error as "LEVEL - message", whatever the level.
+//
+// No entry point reports an error to its caller, throws, or changes errno.
+//
+// Loggers may be used before main and in destructors at exit: what a logger needs is
+// constant-initialized, or made by the first logger's constructor and so outlives it.
+// Configured before other threads start; safe from any thread afterwards.
+
+#include <cstdarg>
+#include <cstddef>
+#include <exception>
+#include <string>
+
+#include "util/LogChannel.h"
+#include "util/LogLevel.h"
+
+class LogFormat;
+class Pathname;
+
+class Logger {
+public:
+    // Requires: `name` is not null and outlives the logger; the pointer is kept, not the text.
+    explicit Logger(const char* name);
+    // A copy logs to the same channel under the same name, but never waits to be bound.
+    Logger(const Logger& other);
+    Logger& operator=(const Logger& other);
+    // Takes a logger that still waits to be bound off the list.
+    ~Logger();
+
+    // True when the channel's level is DEBUG, so that callers can skip building expensive text.
+    bool isDebugEnabled() const {
+        return _channel != nullptr ? _channel->minlevel < INFO : rootDebugEnabled();
+    }
+
+    // The entry points. The first form of each takes a printf format, in which "%m" stands for the
+    // text of errno; the second takes the message as it stands; the third takes e.what().
+    // Cost: one comparison when the message is below the channel's level.
+    void fatal(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void fatal(const std::string& msg) { log(FATAL, msg); }
+    void fatal(const std::exception& e) { log(FATAL, e); }
+    void crit(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void crit(const std::string& msg) { log(CRIT, msg); }
+    void crit(const std::exception& e) { log(CRIT, e); }
+    void error(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void error(const std::string& msg) { log(ERROR, msg); }
+    void error(const std::exception& e) { log(ERROR, e); }
+    void warn(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void warn(const std::string& msg) { log(WARN, msg); }
+    void warn(const std::exception& e) { log(WARN, e); }
+    void info(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void info(const std::string& msg) { log(INFO, msg); }
+    void info(const std::exception& e) { log(INFO, e); }
+    void debug(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
+    void debug(const std::string& msg) { log(DEBUG, msg); }
+    void debug(const std::exception& e) { log(DEBUG, e); }
+
+    // Fixes the logging epoch and binds the waiting loggers.
+    // Requires: logging is not initialized yet (assertion).
+    static void initialize();
+
+    // The same, after setting up appenders and channels from a configuration file.
+    // Returns: false when the file could not be opened, or ends inside a comment.
+    static bool initialize(const Pathname& cfgFile, const Pathname& queltaHome);
+
+    // Sets the minimum level of a channel, which is made when it does not exist, even for a word
+    // that is no level; null names the root channel.
+    // Returns: false when `level` names no level.
+    static bool setChannelLevel(const char* name, const std::string& level);
+
+    // printf into a string, replacing it. "%m" stands for the error text of `errnum`, or of errno
+    // in the form without one; "UNKNOWN ERROR" for a number that is no error.
+    // Deliberate: the error text becomes a part of the format, so that a "%" in it would be read
+    // as a conversion.
+    // Requires: the arguments fit the format; they may point into `out`.
+    // Errors: std::bad_alloc; std::runtime_error when the C library cannot format the arguments.
+    // Cost: allocates only for `out`, and for texts of 256 characters and more.
+    static void vformat(std::string& out, int errnum, const char* fmt, va_list ap)
+        __attribute__((format(printf, 3, 0)));
+    static void format(std::string& out, const char* fmt, ...)
+        __attribute__((format(printf, 2, 3)));
+    static void format(std::string& out, int errnum, const char* fmt, ...)
+        __attribute__((format(printf, 3, 4)));
+
+private:
+    friend class LogFormat;  // the layouts print the name; the routing reads the channel
+
+    // False for every message of a logger that is not bound, which needs a closer look.
+    bool suppresses(LogLevel level) const {
+        return _channel != nullptr && level < _channel->minlevel;
+    }
+    void log(LogLevel level, const std::string& msg) {
+        if (!suppresses(level)) {
+            route(level, msg);
+        }
+    }
+    void log(LogLevel level, const std::exception& e) {
+        if (!suppresses(level)) {
+            route(level, "%s", e.what());
+        }
+    }
+    void route(LogLevel level, const std::string& msg);
+    void route(LogLevel level, const char* fmt, ...) __attribute__((format(printf, 3, 4)));
+    static bool rootDebugEnabled();
+
+    const char* _channel_name;      // not owned
+    std::size_t _channel_name_len;  // its length, for the layouts
+    LogChannel* _channel;           // not owned; null, read as the root channel, until bound
+    Logger* _next;                  // the next older logger that waits to be bound
+};
+
+#endif  // QUELTA_UTIL_LOGGER_H_
