@@ -1,0 +1,111 @@
+#include "xmlwrapp/node.h"
+
+#include <libxml/tree.h>
+
+#include <climits>
+#include <cstring>
+#include <new>
+#include <stdexcept>
+
+namespace {
+
+struct NodeFree {
+    void operator()(xmlNode* element) const noexcept { xmlFreeNode(element); }
+};
+using NodePtr = std::unique_ptr<xmlNode, NodeFree>;
+
+// libxml2's characters are unsigned; the bytes are the same.
+const xmlChar* toXml(const char* text) {
+    return reinterpret_cast<const xmlChar*>(text);
+}
+
+const char* fromXml(const xmlChar* text) {
+    return reinterpret_cast<const char*>(text);
+}
+
+const xmlChar* checkedName(const char* name) {
+    if (name == nullptr || xmlValidateName(toXml(name), 0) != 0) {
+        throw std::invalid_argument("xml::node: not an XML name");
+    }
+    return toXml(name);
+}
+
+NodePtr newElement(const xmlChar* name) {
+    NodePtr element(xmlNewNode(nullptr, name));
+    if (!element || element->name == nullptr) {
+        throw std::bad_alloc();
+    }
+    return element;
+}
+
+// libxml2 hands out a text node without its text when memory runs out between the two.
+NodePtr newText(const char* content) {
+    const std::size_t length = std::strlen(content);
+    if (length >= INT_MAX) {
+        throw std::length_error("xml::node: content too long");
+    }
+    if (xmlCheckUTF8(toXml(content)) == 0) {
+        throw std::invalid_argument("xml::node: content is not UTF-8");
+    }
+    NodePtr text(xmlNewTextLen(toXml(content), static_cast<int>(length)));
+    if (!text || text->content == nullptr) {
+        throw std::bad_alloc();
+    }
+    return text;
+}
+
+}  // namespace
+
+namespace xml {
+
+struct node::tree {
+    NodePtr element;  // with at most one child, a text
+};
+
+node::node() : _tree(new tree{newElement(toXml(""))}) {}
+
+node::node(const char* name) : _tree(new tree{newElement(checkedName(name))}) {}
+
+// libxml2's own copying leaves parts out silently when memory runs out, so the copy is made of
+// the two parts that a node has.
+node::node(const node& other) : _tree(new tree{newElement(other._tree->element->name)}) {
+    set_content(other.get_content());
+}
+
+node& node::operator=(const node& other) {
+    node(other).swap(*this);
+    return *this;
+}
+
+node::~node() = default;
+
+void node::swap(node& other) noexcept {
+    _tree.swap(other._tree);
+}
+
+void node::set_name(const char* name) {
+    const NodePtr renamed = newElement(checkedName(name));
+    std::swap(_tree->element->name, renamed->name);
+}
+
+const char* node::get_name() const {
+    return fromXml(_tree->element->name);
+}
+
+void node::set_content(const char* content) {
+    // The text is made first: from there on nothing can fail.
+    const bool empty = content == nullptr || *content == '\0';
+    NodePtr text = empty ? NodePtr() : newText(content);
+    xmlNode* const element = _tree->element.get();
+    xmlNodeSetContent(element, nullptr);
+    if (text) {
+        xmlAddChild(element, text.release());
+    }
+}
+
+const char* node::get_content() const {
+    const xmlNode* const text = _tree->element->children;
+    return text == nullptr ? "" : fromXml(text->content);
+}
+
+}  // namespace xml
