@@ -1,0 +1,125 @@
+#ifndef QUELTA_UTIL_FILEDESCRIPTOR_H_
+#define QUELTA_UTIL_FILEDESCRIPTOR_H_
+
+// A POSIX file descriptor as a value. Files are opened by the open operations of Pathname.
+//
+// The plain class copies the number, owns nothing and never closes by itself; the two scoped
+// classes close at the end of their scope. Any negative number means "no file". Every failure is a
+// result (-1, 0 or false) with errno as the system call left it; nothing is thrown or logged but
+// by the allocation of a long formatted text.
+// Not thread-safe; one thread at a time per object. Several threads may use one open file as far as
+// the operating system allows.
+
+#include <sys/stat.h>
+#include <sys/types.h>
+#include <sys/uio.h>
+
+#include <cstdarg>
+#include <string>
+
+class Pathname;
+
+class FileDescriptor {
+public:
+    // Takes an open descriptor's number, or a negative one for no file. Implicit, so that a number
+    // serves wherever a descriptor is taken.
+    FileDescriptor(int descriptor) noexcept : _osdep(descriptor) {}
+
+    // Returns: whether this stands for a file.
+    [[nodiscard]] bool valid() const noexcept { return _osdep >= 0; }
+
+    // Reads or writes `len` bytes with as many calls as it takes, at least one, again after each
+    // interruption by a signal.
+    // Returns: the bytes transferred. Fewer than `len` mean end of file, or an error after these
+    // bytes; 0 means end of file or that nothing was written; -1 an error before the first byte.
+    // Deliberate: an error that follows some bytes is not reported; the next call will meet it.
+    [[nodiscard]] ssize_t read(void* buf, unsigned long len) const noexcept;
+    [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const noexcept;
+    [[nodiscard]] ssize_t write(const std::string& text) const noexcept;
+    // Writes `count` buffers with a single call.
+    // Returns: the call's result: bytes written, perhaps fewer than given, or -1.
+    [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const noexcept;
+
+    // Writes a text in printf's notation. Write errors are not reported.
+    // Errors: std::bad_alloc for a text beyond 255 bytes when memory is exhausted.
+    // Cost: no allocation up to 255 bytes.
+    void vformat(const char* fmt, std::va_list args) const __attribute__((format(printf, 2, 0)));
+    void format(const char* fmt, ...) const __attribute__((format(printf, 2, 3)));
+
+    // Makes the descriptor close (or stay open) when the process executes another program; does
+    // nothing when it cannot or when it is so already.
+    void setCloseOnExec(bool on) const noexcept;
+
+    // Replaces *result by what fstat tells.
+    [[nodiscard]] bool stat(struct stat* result) const noexcept;
+    // Replaces *size by the file's size in bytes.
+    // Errors: false, and *size as it was.
+    [[nodiscard]] bool getSize(long long* size) const noexcept;
+    // Moves to an offset in bytes from the start of the file.
+    bool seek_set(long long offset) const noexcept;
+    // Moves to the end of the file.
+    // Returns: the offset of the end, in bytes, or -1.
+    long long seekEof() const noexcept;
+    // Returns: the offset in bytes from the start of the file, or -1.
+    [[nodiscard]] long long curPos() const noexcept;
+    // Waits until the file's data are on its device.
+    void sync() const noexcept;
+
+    // Copies from the current offset to the end of the file, and stops at the first failure; the
+    // destination then stays as far as it got.
+    // Errors: false with errno; ENOSPC when the destination takes no more.
+    // Cost: 8192 bytes of stack, no heap.
+    bool copyTo(FileDescriptor dest) const noexcept;
+    // The same into a file that is created with this one's permission bits, or emptied first; it
+    // must not be the file that is read.
+    bool copyTo(const Pathname& dest) const;
+
+    // Closes the descriptor; does nothing and returns true when there is none.
+    // Returns: whether the call returned 0. The descriptor is -1 afterwards in any case, as it is
+    // released even when the call was interrupted.
+    bool close() noexcept;
+
+protected:
+    // Closes the descriptor and leaves errno as it was.
+    void close_saveErrno() noexcept;
+
+    int _osdep;  // the operating system's number; negative for no file
+};
+
+// Owns its descriptor: closes it at destruction and before it takes another by assignment.
+//
+// Deliberate: copying and assigning share the number, and each owner closes it. So a copy must
+// not outlive the intent; nothing here copies one. Assignment to itself changes nothing, but what
+// counts is the object: another object with the same number is closed first, too.
+class ScopedFileDescriptor : public FileDescriptor {
+public:
+    // No file.
+    ScopedFileDescriptor() noexcept : FileDescriptor(-1) {}
+    ScopedFileDescriptor(const ScopedFileDescriptor& other) noexcept = default;
+    // Takes over an open file.
+    ScopedFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
+    // Opens the file for reading; not valid() when that fails.
+    explicit ScopedFileDescriptor(const Pathname& path);
+    ~ScopedFileDescriptor() { close_saveErrno(); }
+
+    ScopedFileDescriptor& operator=(const FileDescriptor& other) noexcept;
+    ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other) noexcept;
+};
+
+// The same, but opens its file without blocking, so that a FIFO or device does not hang the caller.
+class ScopedSaferFileDescriptor : public FileDescriptor {
+public:
+    // No file.
+    ScopedSaferFileDescriptor() noexcept : FileDescriptor(-1) {}
+    ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) noexcept = default;
+    // Takes over an open file.
+    ScopedSaferFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
+    // Opens the file for reading; not valid() when that fails.
+    explicit ScopedSaferFileDescriptor(const Pathname& path);
+    ~ScopedSaferFileDescriptor() { close_saveErrno(); }
+
+    ScopedSaferFileDescriptor& operator=(const FileDescriptor& other) noexcept;
+    ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other) noexcept;
+};
+
+#endif  // QUELTA_UTIL_FILEDESCRIPTOR_H_

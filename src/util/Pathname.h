@@ -1,0 +1,190 @@
+#ifndef QUELTA_UTIL_PATHNAME_H_
+#define QUELTA_UTIL_PATHNAME_H_
+
+// A file-system path: a string of bytes with '/' between its elements, ordered and compared as the
+// string it is.
+//
+// Three groups of operations: editing, which looks at the text alone and never at a file system;
+// thin wrappers around one system call each, which pass the text unchanged; and quoting for the
+// shell. Wrappers neither throw nor log: they return true when the call returned 0, and leave errno
+// as the call set it.
+// Not thread-safe; one thread at a time per object. The static paths are safe to share.
+
+#include <sys/stat.h>
+#include <sys/types.h>
+
+#include <cstdio>
+#include <set>
+#include <string>
+#include <utility>
+#include <vector>
+
+class FileDescriptor;
+
+class Pathname : public std::string {
+public:
+    static constexpr char sep = '/';
+    static const Pathname root;    // "/"
+    static const Pathname cur;     // "."
+    static const Pathname parent;  // ".."
+
+    // Permission bits of a new file, before the umask: 0644, 0600, 0440.
+    enum CreateMode : int { CREATE_NORMAL = 0, CREATE_PRIVATE = 1, CREATE_READABLE_NONPUBLIC = 2 };
+    // Permission bits of a new directory, before the umask: 0700, 0770, 0777, 0755.
+    enum MkdirMode : int {
+        MKDIR_PRIVATE = 0,
+        MKDIR_GROUP_RW = 1,
+        MKDIR_PUBLIC = 2,
+        MKDIR_WORLD_READ = 3
+    };
+
+    // Strings convert without a word, because a path is one; `path` must not be null.
+    Pathname() = default;
+    Pathname(const char* path) : std::string(path) {}
+    Pathname(std::string path) noexcept : std::string(std::move(path)) {}
+    Pathname(const char* path, unsigned long length) : std::string(path, length) {}
+
+    // --- Editing ---------------------------------------------------------------------------------
+
+    // Returns: whether the first character is '/'.
+    [[nodiscard]] bool isAbsolute() const noexcept { return !empty() && front() == sep; }
+    // Returns: whether there is a '/' anywhere.
+    [[nodiscard]] bool containsSep() const noexcept { return find(sep) != npos; }
+
+    // Appends one element with one '/' before it; an empty element changes nothing. `elem` may be
+    // this path itself.
+    // Deliberate: an element joined to the empty path makes an absolute path ("" / "a" is "/a");
+    // callers start from a base that is not empty.
+    Pathname& operator/=(const std::string& elem);
+    Pathname& operator/=(const char* elem);
+    [[nodiscard]] Pathname operator/(const std::string& elem) const;
+    [[nodiscard]] Pathname operator/(const char* elem) const;
+
+    // Makes sure of one '/' at the end; the empty path becomes "/".
+    void addTrailingSep();
+    // Drops every '/' at the end but the path's first character.
+    void removeTrailingSeps();
+    // Removes the last element with the '/' around it: "/a/b/" becomes "/a", "/a" becomes "/", "/"
+    // stays. Deliberate: "a" becomes the empty path, not ".".
+    void stripElement();
+    // Returns: what stripElement leaves.
+    [[nodiscard]] Pathname toParent() const;
+    // Returns: the last element without '/': "b" of "/a/b//".
+    // Deliberate: "/" for the empty path as for one of separators only, so a leaf is never empty.
+    [[nodiscard]] Pathname toLeaf() const;
+
+    // Returns: the text behind the last '.' of the last element; empty when there is none, or when
+    // the path ends in '.' or '/'.
+    // Deliberate: a name's first dot counts (".bashrc" has the extension "bashrc"), though
+    // basenameWithoutExt does not cut there.
+    [[nodiscard]] std::string ext() const;
+    // Returns: the last element without its last '.' and what follows; empty when the path ends in
+    // '/'. Deliberate: a dot that is the element's first character stays (".bashrc"), and a dot at
+    // the end goes ("file." gives "file"), other than in ext.
+    [[nodiscard]] std::string basenameWithoutExt() const;
+
+    // Deletes every ".." element, so that the path cannot climb out of a directory.
+    // Deliberate: the element before stays ("a/../b" becomes "a/b"); nothing is resolved.
+    // Cost: linear.
+    void removeDotDotSlash();
+    // Makes one '/' of each run of them, at the start, too.
+    // Cost: linear.
+    void removeDoubleSeps();
+    [[nodiscard]] static Pathname removeDoubleSeps(const Pathname& path);
+    [[nodiscard]] static Pathname removeDoubleSeps(const char* path);
+
+    // --- The shell -------------------------------------------------------------------------------
+
+    // Returns: the path as a word of a shell command line, quoted for blanks, quotes, '$', '\\' and
+    // "#&*;=?[]|".
+    // Deliberate: parentheses, redirections, backquotes, '~', '!' and braces stay bare. This
+    // serves names that the caller trusts; it is no defence against names from strangers.
+    [[nodiscard]] std::string shellQuoted() const;
+
+    // Takes the first word off `input`, with the quotes and backslashes of shellQuoted undone.
+    // `firstArg` is replaced by the word, `rest` by what follows it, from the blank on; `rest` may
+    // be the same object as `input`.
+    // Returns: true when there is a word; false, and `rest` as it was, when there is none or a
+    // quote or backslash is not completed.
+    // Deliberate: an empty quoted word counts as none; a backslash within double quotes escapes any
+    // character.
+    static bool splitArgShellQuoted(const std::string& input, Pathname& firstArg,
+                                    std::string& rest);
+
+    // --- One system call each --------------------------------------------------------------------
+
+    // Replaces *result by what stat tells, links followed.
+    bool stat(struct stat* result) const noexcept;
+    // Returns: whether it exists and is a directory (a regular file).
+    [[nodiscard]] bool isDir() const noexcept;
+    [[nodiscard]] bool isReg() const noexcept;
+    // Replaces *mtime by the time of the last change, in seconds since the epoch, and *size by the
+    // size in bytes. Errors: false, and the argument as it was.
+    bool getMtime(long* mtime) const noexcept;
+    bool getSize(long long* size) const noexcept;
+    // Returns: whether `access` grants existence, reading, writing, both, to the real user.
+    [[nodiscard]] bool exists() const noexcept;
+    [[nodiscard]] bool r_ok() const noexcept;
+    [[nodiscard]] bool w_ok() const noexcept;
+    [[nodiscard]] bool rw_ok() const noexcept;
+
+    // Returns: a new stream, or null. Owns: the caller closes it with std::fclose.
+    [[nodiscard]] std::FILE* fopen(const char* mode) const noexcept;
+    // Requires: one of the four modes; asserted.
+    bool mkdir(MkdirMode mode) const;
+    bool rmdir() const noexcept;
+    bool unlink() const noexcept;
+    bool remove() const noexcept;
+    // Cuts or extends the file to a length in bytes.
+    bool truncate(long long length) const noexcept;
+    // Fills `buf` with up to `size` bytes of the link's text, without a NUL.
+    // Deliberate: true only when the call returned 0, as for all its siblings, hence false whenever
+    // there was text; look at the buffer.
+    bool readlink(char* buf, unsigned long size) const noexcept;
+    // Creates `link`, whose text is this path.
+    bool symlinkTo(const Pathname& link) const noexcept;
+    bool renameTo(const Pathname& dest) const noexcept;
+
+    // Each opens the file with one call. Returns: the descriptor, -1 with errno on failure.
+    // Owns: the caller closes it.
+    [[nodiscard]] FileDescriptor openReadOnly() const noexcept;
+    // Does not block, neither now (on a FIFO or device) nor in later reads.
+    [[nodiscard]] FileDescriptor openReadOnlySafer() const noexcept;
+    // For writing; fails when the file exists.
+    [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const noexcept;
+    // For writing; empties an existing file.
+    [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const noexcept;
+    // The same with the permission bits of the file `model`; opens nothing when fstat refuses them.
+    [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const noexcept;
+    // For writing; each write goes to the end.
+    [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const noexcept;
+    // For reading and writing. Deliberate: empties an existing file, whatever the name suggests.
+    [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const noexcept;
+
+    // Copies the contents and permission bits to another file, replacing it.
+    // Errors: false, with errno of the step that failed; see FileDescriptor::copyTo.
+    bool copyTo(const Pathname& dest) const;
+};
+
+// Returns: the permission bits of a mode; 0644 for a value that is none.
+[[nodiscard]] mode_t createmode_to_perm(Pathname::CreateMode mode) noexcept;
+
+// Paths in the order of insertion; duplicates allowed.
+// Not thread-safe; one thread at a time per object.
+class PathList : public std::vector<Pathname> {
+public:
+    static constexpr char listSep = ':';  // the usual separator
+
+    PathList() = default;
+    // The elements of a separated list; see push_back_separated.
+    explicit PathList(const char* list, char separator = listSep);
+    explicit PathList(const std::string& list, char separator = listSep);
+    // The elements of an ordered set, in its order.
+    PathList(std::set<Pathname>::const_iterator first, std::set<Pathname>::const_iterator last);
+
+    // Appends each piece between separators that is not empty, untouched, in order. `list` must not
+    // be null.
+    void push_back_separated(const char* list, char separator = listSep);
+};
+
+#endif  // QUELTA_UTIL_PATHNAME_H_

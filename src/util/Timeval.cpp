@@ -1,0 +1,203 @@
+#include "util/Timeval.h"
+
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <limits>
+
+#include "util/Assert.h"
+
+namespace {
+
+constexpr long long maxSec = std::numeric_limits<std::int32_t>::max();
+constexpr long usecsPerSec = 1000000;
+constexpr unsigned long long maxMsecs = maxSec * 1000ULL;
+
+// a - b in whole seconds, rounded down, and the microseconds above them. The sums are unsigned, so
+// that instants which only a 64-bit time_t can hold do no worse than wrap around.
+struct Difference {
+    Difference(const struct timeval& a, const struct timeval& b)
+        : seconds(static_cast<unsigned long long>(a.tv_sec) -
+                  static_cast<unsigned long long>(b.tv_sec)),
+          micros(a.tv_usec - b.tv_usec) {
+        if (micros < 0) {
+            --seconds;
+            micros += usecsPerSec;
+        }
+    }
+
+    unsigned long long seconds;
+    long micros;  // 0..999999
+};
+
+// Appends three significant figures in a field of width 5, and the unit.
+std::string describe(double value, const char* unit) {
+    const int precision = value >= 99.5 ? 1 : value >= 9.95 ? 2 : 3;
+    char number[40];
+    std::snprintf(number, sizeof number, "%5.*f", precision, value);
+    return std::string(number) + unit;
+}
+
+std::string describe(long long value, const char* singularUnit) {
+    char number[40];
+    std::snprintf(number, sizeof number, "%lld", value);
+    return std::string(number) + singularUnit + (value == 1 ? "" : "s");
+}
+
+bool isDigit(char c) {
+    return c >= '0' && c <= '9';
+}
+
+// The digits before the point, in milliseconds.
+// Returns: the first character behind them; `hitMax` is set when they do not fit.
+const char* readWholeSeconds(const char* p, unsigned long long& msecs, bool& hitMax) {
+    constexpr unsigned long long firstTooLarge = 18446744073709552ULL;
+    unsigned long long value = 0;
+    for (; isDigit(*p); ++p) {
+        if (!hitMax) {
+            value = value * 10 + static_cast<unsigned>(*p - '0');
+            hitMax = value >= firstTooLarge;
+        }
+    }
+    msecs = value * 1000;
+    return p;
+}
+
+// The digits behind the point, added to `msecs`.
+// Returns: the first character behind them.
+const char* readFraction(const char* p, unsigned long long& msecs, bool& hitMax) {
+    unsigned tenths = 0;  // of a millisecond
+    unsigned unit = 1000;
+    bool isZero = true;
+    for (; isDigit(*p); ++p) {
+        tenths += static_cast<unsigned>(*p - '0') * unit;
+        unit /= 10;
+        isZero = isZero && *p == '0';
+    }
+    const unsigned rounded = (tenths + 5) / 10;
+    msecs += rounded;
+    if (msecs < rounded) {
+        hitMax = true;
+    }
+    if (!isZero && msecs == 0) {
+        msecs = 1;
+    }
+    return p;
+}
+
+}  // namespace
+
+Timeval Timeval::now() {
+    return CurrentTimeval();
+}
+
+long long Timeval::msec() const noexcept {
+    const auto whole = static_cast<unsigned long long>(_tv.tv_sec) * 1000;
+    return static_cast<long long>(whole + static_cast<unsigned long long>(_tv.tv_usec / 1000));
+}
+
+void Timeval::set(long long seconds, long long microseconds) noexcept {
+    long long carry = microseconds / usecsPerSec;
+    long long rest = microseconds % usecsPerSec;
+    if (rest < 0) {
+        --carry;
+        rest += usecsPerSec;
+    }
+    _tv.tv_sec = static_cast<time_t>(static_cast<unsigned long long>(seconds) +
+                                     static_cast<unsigned long long>(carry));
+    _tv.tv_usec = static_cast<suseconds_t>(rest);
+}
+
+void Timeval::setToNow() {
+    if (::gettimeofday(&_tv, nullptr) != 0) {
+        std::abort();
+    }
+}
+
+void Timeval::setToMax() noexcept {
+    _tv.tv_sec = maxSec;
+    _tv.tv_usec = usecsPerSec - 1;
+}
+
+void Timeval::addSec(unsigned int secs) noexcept {
+    if (_tv.tv_sec > maxSec - static_cast<long long>(secs)) {
+        setToMax();
+        return;
+    }
+    _tv.tv_sec += secs;
+}
+
+void Timeval::addMsec(unsigned long long msecs) {
+    if (msecs >= maxMsecs) {
+        setToMax();
+        return;
+    }
+    auto secs = static_cast<unsigned int>(msecs / 1000);
+    _tv.tv_usec += static_cast<suseconds_t>(msecs % 1000 * 1000);
+    if (_tv.tv_usec >= usecsPerSec) {
+        QUELTA_ASSERT(_tv.tv_usec < 2000000);
+        ++secs;
+        _tv.tv_usec -= usecsPerSec;
+    }
+    addSec(secs);
+}
+
+void Timeval::localtime(struct tm& result) const {
+    if (::localtime_r(&_tv.tv_sec, &result) != &result) {
+        std::abort();
+    }
+}
+
+long long Timeval::msecDifference(const Timeval& a, const Timeval& b) noexcept {
+    const Difference d(a._tv, b._tv);
+    return static_cast<long long>(d.seconds * 1000 +
+                                  static_cast<unsigned long long>((d.micros + 999) / 1000));
+}
+
+long long Timeval::usecDifference(const Timeval& a, const Timeval& b) noexcept {
+    const Difference d(a._tv, b._tv);
+    return static_cast<long long>(d.seconds * 1000000 +
+                                  static_cast<unsigned long long>(d.micros / 1000));
+}
+
+std::string Timeval::describeDifference(const Timeval& a, const Timeval& b) {
+    const bool negative = a < b;
+    const long long d = negative ? usecDifference(b, a) : usecDifference(a, b);
+    const double v = static_cast<double>(d);
+    const std::string sign = negative ? "-" : "";
+    if (v > 8000000000.0) {
+        return sign + describe(v / 3600000000.0, " hours");
+    }
+    if (v > 3000000.0) {
+        return sign + describe(v / 1000000.0, " seconds");
+    }
+    if (v > 3000.0) {
+        const bool wholeMsecs = a._tv.tv_usec % 1000 == 0 && b._tv.tv_usec % 1000 == 0;
+        return sign + (wholeMsecs ? describe(d / 1000, " millisecond")
+                                  : describe(v / 1000.0, " milliseconds"));
+    }
+    return sign + describe(d, " microsecond");
+}
+
+bool convert_string_to_milliseconds(const char* oldp, unsigned long long* res,
+                                    unsigned long* charCount) {
+    const char* p = oldp;
+    while (*p == ' ' || *p == '\t') {
+        ++p;
+    }
+    const char* const number = p;
+    bool hitMax = false;
+    p = readWholeSeconds(p, *res, hitMax);
+    // A point before anything but a digit or the end belongs to what follows the number.
+    if (*p == '.' && (isDigit(p[1]) || p[1] == '\0')) {
+        p = readFraction(p + 1, *res, hitMax);
+    }
+    if (hitMax) {
+        *res = std::numeric_limits<unsigned long long>::max();
+    }
+    const bool found = p != number;
+    if (charCount != nullptr) {
+        *charCount = found ? static_cast<unsigned long>(p - oldp) : 0;
+    }
+    return found;
+}

@@ -1,0 +1,97 @@
+#ifndef QUELTA_UTIL_TIMEVAL_H_
+#define QUELTA_UTIL_TIMEVAL_H_
+
+// An instant of wall-clock time: seconds and microseconds since the epoch.
+//
+// Additions saturate at one largest instant, 2147483647 s and 999999 us, on every host: stamps mean
+// the same wherever time_t is wider. After every operation 0 <= _tv.tv_usec <= 999999.
+// Not thread-safe; one thread at a time per object.
+
+#include <sys/time.h>
+
+#include <ctime>
+#include <string>
+
+class Timeval {
+public:
+    // The epoch.
+    Timeval() noexcept = default;
+
+    // Returns: the current time.
+    [[nodiscard]] static Timeval now();
+
+    // Returns: seconds since the epoch, rounded down.
+    [[nodiscard]] long long sec() const noexcept { return _tv.tv_sec; }
+    // Returns: milliseconds since the epoch (the whole instant, not its sub-second part), rounded
+    // down.
+    [[nodiscard]] long long msec() const noexcept;
+
+    // Sets the instant; `microseconds` outside 0..999999 carry into (or borrow from) the seconds.
+    void set(long long seconds, long long microseconds) noexcept;
+    // Errors: aborts the process when there is no time to be had.
+    void setToNow();
+    // Sets the largest instant.
+    void setToMax() noexcept;
+
+    // Adds seconds; the largest instant when the sum lies above 2147483647 s.
+    void addSec(unsigned int secs) noexcept;
+    // Adds milliseconds; the largest instant when `msecs` is 2147483647000 or more, or the sum lies
+    // above 2147483647 s.
+    void addMsec(unsigned long long msecs);
+
+    // Replaces `result` by this instant, to the second, in the local time zone.
+    // Errors: aborts the process when the year does not fit.
+    // Threads: safe from any thread.
+    void localtime(struct tm& result) const;
+
+    [[nodiscard]] bool operator<(const Timeval& other) const noexcept {
+        return _tv.tv_sec != other._tv.tv_sec ? _tv.tv_sec < other._tv.tv_sec
+                                              : _tv.tv_usec < other._tv.tv_usec;
+    }
+    [[nodiscard]] bool operator<=(const Timeval& other) const noexcept { return !(other < *this); }
+    [[nodiscard]] bool operator>(const Timeval& other) const noexcept { return other < *this; }
+    [[nodiscard]] bool operator>=(const Timeval& other) const noexcept { return !(*this < other); }
+
+    // Returns: a minus b in milliseconds, the sub-second part rounded up: 1 us later counts as 1.
+    // Deliberate: the sub-second part is what remains above whole seconds rounded down, so 1 us
+    // earlier counts as 0.
+    [[nodiscard]] static long long msecDifference(const Timeval& a, const Timeval& b) noexcept;
+    // Returns: a minus b, with 1000000 for each whole second.
+    // Deliberate: the sub-second part is added in milliseconds, rounded down, and not in
+    // microseconds: 1.5 s count as 1000500. describeDifference is built upon it.
+    [[nodiscard]] static long long usecDifference(const Timeval& a, const Timeval& b) noexcept;
+    // Returns: usecDifference in words: up to three significant figures and a unit, such as
+    // "5.000 seconds", behind "-" when a lies before b.
+    [[nodiscard]] static std::string describeDifference(const Timeval& a, const Timeval& b);
+
+    // The differences above from this instant to now, positive for an instant in the past.
+    [[nodiscard]] long long msecSince() const { return msecDifference(now(), *this); }
+    [[nodiscard]] long long usecSince() const { return usecDifference(now(), *this); }
+    [[nodiscard]] std::string describeSince() const { return describeDifference(now(), *this); }
+
+private:
+    struct timeval _tv = {0, 0};  // seconds since the epoch; microseconds, 0..999999
+};
+
+// A Timeval that starts at the current time.
+class CurrentTimeval : public Timeval {
+public:
+    CurrentTimeval() { setToNow(); }
+    CurrentTimeval(const CurrentTimeval&) noexcept = default;
+    CurrentTimeval& operator=(const CurrentTimeval&) noexcept = default;
+    CurrentTimeval& operator=(const Timeval& other) noexcept {
+        Timeval::operator=(other);
+        return *this;
+    }
+};
+
+// Reads a decimal number of seconds, with an optional fraction, behind spaces and tabs.
+//
+// `res` is replaced by the milliseconds, rounded half up, but never down to 0 for a time that is
+// not zero; all ones when they do not fit. `charCount` (null allowed) is replaced by the characters
+// read from `oldp` on, blanks included. A unit behind the number is the caller's to read.
+// Returns: true when there was a number; a lone "." is one, 0. Otherwise *res and *charCount are 0.
+bool convert_string_to_milliseconds(const char* oldp, unsigned long long* res,
+                                    unsigned long* charCount);
+
+#endif  // QUELTA_UTIL_TIMEVAL_H_

@@ -1,0 +1,59 @@
+#ifndef QUELTA_TESTS_SUPPORT_TEMPDIR_H_
+#define QUELTA_TESTS_SUPPORT_TEMPDIR_H_
+
+// A fresh folder for one test case, removed with all that is in it at the end of the scope; and
+// whole files as strings.
+//
+//     TempDir dir;
+//     writeFile(dir.file("a.cfg"), "x=1\n");
+// Not thread-safe; one thread at a time per object.
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <system_error>
+
+class TempDir {
+public:
+    TempDir() : _path(testing::TempDir() + "quelta-XXXXXX") {
+        if (::mkdtemp(_path.data()) == nullptr) {
+            throw std::system_error(errno, std::generic_category(), _path);
+        }
+    }
+    ~TempDir() {
+        std::error_code ignored;
+        std::filesystem::remove_all(_path, ignored);
+    }
+    TempDir(const TempDir&) = delete;
+    TempDir& operator=(const TempDir&) = delete;
+
+    // The folder, absolute, without a '/' at its end.
+    const std::string& path() const { return _path; }
+    // The path of an entry in it, which need not exist.
+    std::string file(const std::string& name) const { return _path + '/' + name; }
+
+private:
+    std::string _path;
+};
+
+// The bytes of a file; a failure of the test, and the empty string, when it cannot be read.
+inline std::string readFile(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    EXPECT_TRUE(in) << "cannot read " << path;
+    return std::string(std::istreambuf_iterator<char>(in), {});
+}
+
+// Creates or replaces a file.
+inline void writeFile(const std::string& path, const std::string& contents) {
+    std::ofstream out(path, std::ios::binary | std::ios::trunc);
+    out << contents;
+    out.close();
+    EXPECT_TRUE(out) << "cannot write " << path;
+}
+
+#endif  // QUELTA_TESTS_SUPPORT_TEMPDIR_H_
