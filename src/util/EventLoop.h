@@ -1,0 +1,30 @@
+#ifndef QUELTA_UTIL_EVENTLOOP_H_
+#define QUELTA_UTIL_EVENTLOOP_H_
+
+// InThreadActor: a unit of work that another thread's event loop runs on this thread's behalf.
+// The fields are the loop's: its list of pending actors, and the wake of a thread that waits for
+// one to have run.
+// Not thread-safe; one thread at a time per object.
+
+#include "util/Mutex.h"
+
+class InThreadActor {
+public:
+    InThreadActor() = default;
+    virtual ~InThreadActor() = default;
+    InThreadActor(const InThreadActor&) = delete;
+    InThreadActor& operator=(const InThreadActor&) = delete;
+
+    // Does the work, on the thread of the loop.
+    virtual void callback() = 0;
+
+private:
+    friend class EventLoop;
+
+    bool _wantWake = false;  // whether a thread waits on _cond for the callback
+    ConditionWakeAll _cond;
+    bool _ran = false;
+    InThreadActor* _next = nullptr;  // the next pending actor
+};
+
+#endif  // QUELTA_UTIL_EVENTLOOP_H_

@@ -1,0 +1,214 @@
+#ifndef QUELTA_UTIL_MUTEX_H_
+#define QUELTA_UTIL_MUTEX_H_
+
+// Checked wrappers of the POSIX locks, conditions and thread-specific keys.
+//
+// One error policy covers every call but the NOLOG_ pair: a pthread function that fails is logged
+// as a warning on the logger "Thread" and then thrown as a PthreadException with the same text.
+// The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a checked
+// failure would log through the very logger that it is locking. The destructors are checked too,
+// and therefore may throw.
+// A Mutex of static storage duration is constant-initialized: it can be used before main, whatever
+// the order in which units are initialized.
+// Safe from any thread, once the object is constructed and until its destruction begins.
+
+#include <pthread.h>
+
+#include <stdexcept>
+#include <type_traits>
+
+// Base of the wrappers; holds their error check.
+class PthreadObject {
+public:
+    // Does nothing when `rval`, the result of the pthread function `funcname`, is 0, or after
+    // Thread::mainThreadDying().
+    // Errors: logs and throws PthreadException with the text
+    // "THREADNAME: about to throw a PthreadException: FUNCNAME: ERROR-TEXT-OF-RVAL".
+    static void checkPtRes(const char* funcname, int rval);
+};
+
+// The identity of a thread; the default one is no thread's.
+class PthreadToken {
+public:
+    PthreadToken() = default;
+    explicit PthreadToken(pthread_t token) : _token(token) {}
+
+    // Returns: the calling thread's token.
+    static PthreadToken self() { return PthreadToken(::pthread_self()); }
+
+    bool operator==(const PthreadToken& other) const {
+        return ::pthread_equal(_token, other._token) != 0;
+    }
+    bool operator!=(const PthreadToken& other) const { return !(*this == other); }
+
+private:
+    friend class Thread;  // joins by it
+
+    pthread_t _token{};
+};
+
+class PthreadException : public std::runtime_error {
+public:
+    explicit PthreadException(const char* msg) : std::runtime_error(msg) {}
+};
+
+// A lock that its holder can neither take twice nor have checked who unlocks it.
+class Mutex : private PthreadObject {
+public:
+    constexpr Mutex() {
+        if (!std::is_constant_evaluated()) {
+            initialize();
+        }
+    }
+    ~Mutex() noexcept(false);
+    Mutex(const Mutex&) = delete;
+    Mutex& operator=(const Mutex&) = delete;
+
+    void lock();
+    void unlock();
+
+    // Returns: true when acquired, false when some thread holds it. After mainThreadDying() every
+    // other failure gives false too.
+    [[nodiscard]] bool tryLock();
+
+    // The pair for the logging code: no check, no message, no exception.
+    // Returns: NOLOG_lock: true when locked; NOLOG_unlock: the raw result, 0 when unlocked.
+    bool NOLOG_lock() noexcept { return ::pthread_mutex_lock(&_pthread_mutex) == 0; }
+    int NOLOG_unlock() noexcept { return ::pthread_mutex_unlock(&_pthread_mutex); }
+
+    // Debugging aids, without effect.
+    void assertIsLocked() const {}
+    void verify_mem() const {}
+    void debrec_set() const {}
+    void debrec_clear() const {}
+
+private:
+    friend class ConditionBaseClass;
+
+    void initialize();
+
+    pthread_mutex_t _pthread_mutex = PTHREAD_MUTEX_INITIALIZER;
+};
+
+// A lock that its holder may take again; it is free after as many unlock() as lock().
+// Invariant: `_owner_valid` exactly while `_owner_count` is above 0. `_owner_mutex` is never held
+// while waiting for `_mutex`.
+class RecursiveMutex {
+public:
+    RecursiveMutex() = default;
+
+    void lock();
+
+    // Returns: true when acquired or already the calling thread's, false when another holds it.
+    [[nodiscard]] bool tryLock();
+
+    // Requires: the mutex is held (asserted), by whichever thread: the caller is not compared with
+    // the owner.
+    void unlock();
+
+    // Debugging aid, without effect.
+    void assertIsLocked() const {}
+
+private:
+    void claim();
+    void claimOrUnlock();
+
+    Mutex _mutex;         // what is actually held
+    Mutex _owner_mutex;   // guards the fields below
+    PthreadToken _owner;  // meaningful only when _owner_valid
+    bool _owner_valid = false;
+    unsigned int _owner_count = 0;  // how many times the owner holds it
+};
+
+// A condition variable; derived classes say who is woken.
+class ConditionBaseClass : private PthreadObject {
+public:
+    ConditionBaseClass();
+    ~ConditionBaseClass() noexcept(false);
+    ConditionBaseClass(const ConditionBaseClass&) = delete;
+    ConditionBaseClass& operator=(const ConditionBaseClass&) = delete;
+
+    // Unlocks `mutex`, waits to be woken and locks it again. May return without a wake, so callers
+    // test what they wait for in a loop.
+    // Requires: the caller holds `mutex`.
+    void wait(Mutex& mutex);
+
+    // The same for at most `timeoutSecs` seconds from the call, whatever is done to the clock.
+    // Returns: true when woken, false when the time was up. After mainThreadDying() a failure
+    // gives false too.
+    bool wait(Mutex& mutex, unsigned int timeoutSecs);
+
+    void internal_wake_one();
+    void internal_wake_all();
+
+    // Debugging aid, without effect.
+    void verify_mem() const {}
+
+private:
+    pthread_cond_t _pthread_cond = PTHREAD_COND_INITIALIZER;
+};
+
+// A condition that wakes every waiter.
+class ConditionWakeAll : public ConditionBaseClass {
+public:
+    void wake_all() { internal_wake_all(); }
+};
+
+// A pointer with a value of its own in every thread, null at first. A thread that ends with a
+// value other than null has it passed to the cleanup function.
+class TSP_Implementor : private PthreadObject {
+public:
+    // `cleanup_fn`: null for none.
+    explicit TSP_Implementor(void (*cleanup_fn)(void*));
+    ~TSP_Implementor() noexcept(false);
+    TSP_Implementor(const TSP_Implementor&) = delete;
+    TSP_Implementor& operator=(const TSP_Implementor&) = delete;
+
+    // Returns: the calling thread's value, null allowed.
+    void* get() const { return ::pthread_getspecific(_key); }
+
+    // Replaces the calling thread's value; a former one that differs goes to the cleanup function
+    // first, unless it is null.
+    void set(void* value);
+
+    // Returns: the calling thread's value, which becomes null without cleanup.
+    // Owns: the caller has the value from now on.
+    void* release();
+
+    // Stores without cleanup.
+    void internal_set(void* value);
+
+private:
+    pthread_key_t _key;
+    void (*_cleanup_fn)(void*);
+};
+
+// TSP_Implementor with the type of its values.
+template <typename T>
+class ThreadSpecificPointer {
+public:
+    explicit ThreadSpecificPointer(void (*cleanup_fn)(void*)) : _impl(cleanup_fn) {}
+
+    T* get() const { return static_cast<T*>(_impl.get()); }
+    void set(T* value) { _impl.set(value); }
+    T* release() { return static_cast<T*>(_impl.release()); }
+
+private:
+    TSP_Implementor _impl;
+};
+
+// Unlocks a mutex for as long as the object lives.
+class ScopedMutexUnlocker {
+public:
+    // Requires: the caller holds `mutex`, which outlives this object.
+    explicit ScopedMutexUnlocker(Mutex* mutex) : _mutex(mutex) { _mutex->unlock(); }
+    explicit ScopedMutexUnlocker(Mutex& mutex) : ScopedMutexUnlocker(&mutex) {}
+    ~ScopedMutexUnlocker() noexcept(false) { _mutex->lock(); }
+    ScopedMutexUnlocker(const ScopedMutexUnlocker&) = delete;
+    ScopedMutexUnlocker& operator=(const ScopedMutexUnlocker&) = delete;
+
+private:
+    Mutex* _mutex;
+};
+
+#endif  // QUELTA_UTIL_MUTEX_H_
