@@ -1,0 +1,130 @@
+#ifndef QUELTA_UTIL_LOGAPPENDER_H_
+#define QUELTA_UTIL_LOGAPPENDER_H_
+
+// One output of the logging subsystem: a file, or standard error, with a layout, an optional size
+// limit with numbered backups, and a lock that keeps lines whole.
+//
+// Order of calls: `find` makes an appender and gives it its name, `setAttribute` fills it,
+// `finalSetup` ends the configuration, then only `write` is used. The file is opened by the first
+// write. It is closed and opened again by a rotation, after a failed write, and when somebody else
+// has moved or deleted it.
+//
+// Rotation: when the file has grown beyond `_maxSize`, app.log becomes app.log.1, app.log.1 becomes
+// app.log.2 and so on up to the first number that is free; app.log.N, N being `_maxBackupIndex`, is
+// deleted when no number is free.
+//
+// Failures never reach the caller. They go through LogFormat::internal to the other appenders of
+// the channel named "Logger", and they are sent after the lock is free again: appenders that report
+// to each other and all fail can neither wait for each other nor recurse.
+//
+// Invariants: `_fd` is negative while the file is closed; `_curSize`, `_inodeNum` and `_lastCheck`
+// describe the file behind `_fd` and mean nothing while it is closed. An appender without a file
+// name writes to the descriptor that it has and is never rotated.
+//
+// Configured before other threads start; safe from any thread afterwards (serialised by `_mutex`).
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <ctime>
+#include <map>
+#include <string>
+#include <string_view>
+
+#include "util/FileDescriptor.h"
+#include "util/Mutex.h"
+#include "util/Pathname.h"
+
+class LogAppender;
+class LogFormat;
+struct LogMsgMetadata;
+
+using file_offset_t = std::int64_t;
+
+// Appender by name, in name order; not owning.
+using LogAppenderMap = std::map<std::string, LogAppender*>;
+
+class LogAppender {
+public:
+    // Makes a closed appender without file name, size limit, backups and layout.
+    LogAppender();
+    // Closes the file; standard error stays open.
+    ~LogAppender();
+    LogAppender(const LogAppender&) = delete;
+    LogAppender& operator=(const LogAppender&) = delete;
+
+    // Finds an appender by name; with `create`, makes it when it is absent. "rootAppender" always
+    // names the root appender, which is no member of appenders().
+    // Returns: the appender; null when it is absent and not to be made.
+    // Owns: the appenders live until the process ends.
+    static LogAppender* find(const std::string& name, bool create);
+
+    // Sets one attribute: "fileName", "maxFileSize" (bytes), "maxBackupIndex", "layout"
+    // ("BasicLayout", "SimpleLayout" or "PatternLayout") or "layout.ConversionPattern". A leading
+    // "${QUELTA_HOME}" of a file name stands for `queltaHome` unless that is empty.
+    // Deliberate: "fileName" appends, so the key given twice joins both values into one name.
+    // Requires: `val` not null.
+    // Returns: false, with nothing changed, for any other key, an unknown layout name and a number
+    // that is not plain decimal, has a leading zero or does not fit.
+    [[nodiscard]] bool setAttribute(const std::string& aname, const char* val,
+                                    const Pathname& queltaHome);
+
+    // Ends the configuration: takes the root appender's layout when there is none, turns an
+    // appender without a file to standard error, takes back settings that make no sense, and opens
+    // the file once, so that a bad path shows at start-up and not with the first message.
+    // `name` (not null) is used in the warnings.
+    void finalSetup(const char* name);
+
+    // Writes one line, formatted by the layout, and rotates the file when it has grown beyond its
+    // limit. The time by which the file's identity is checked is the message's stamp.
+    // A line of which nothing could be written is reported and lost; a line cut short by a full
+    // device counts with the bytes that went out. The next line tries again.
+    // Errors: std::bad_alloc when the line cannot be formatted; errno is left as it was.
+    // Cost: one `write`; at most one `stat` in five seconds of message time.
+    void write(const LogMsgMetadata& mdata, const std::string& msg);
+
+private:
+    friend LogAppender& rootAppender();
+    struct Failure;
+    enum class Problem { NONE, OPEN, FSTAT, WRITE };
+
+    void setFileName(std::string_view value, const Pathname& queltaHome);
+    bool setLayout(std::string_view name);
+
+    // The operations below run under the lock (but for the check at start-up). With `later` they
+    // leave a failure there, for a report after the unlock; with null they report at once.
+    bool openFile(Failure* later = nullptr);
+    bool openAndInitFile(time_t now, Failure* later = nullptr);
+    void rotateFile(time_t now, Failure* later = nullptr);
+    void filenameWithSuffix(Pathname& result, unsigned suffix) const;
+    void closeFd();
+
+    void writeLine(const std::string& line, time_t now, Failure& failure);
+    void checkIdentity(time_t now);
+    void shiftBackups();
+    void failed(Problem what, Failure* later) const;
+    void report(const Failure& failure) const;
+
+    FileDescriptor _fd;          // negative: closed
+    Pathname _filename;          // empty: standard error
+    file_offset_t _maxSize = 0;  // bytes; 0: no limit, no rotation
+    file_offset_t _curSize = 0;  // bytes, as counted from what was written
+    std::uint32_t _maxBackupIndex = 0;
+    const LogFormat* _fmt = nullptr;  // not owned
+    Mutex _mutex;                     // held around everything `write` does after formatting
+    ino_t _inodeNum = 0;              // of the file when it was opened
+    time_t _lastCheck = 0;            // seconds of message stamps: identity last confirmed
+};
+
+// The appender that takes every message of a channel without appenders: standard error, with the
+// default layout. Its descriptor is closed at exit. Made on first use.
+LogAppender& rootAppender();
+
+// The layout "%m%n". Made on first use.
+const LogFormat& defaultFormat();
+
+// Every named appender. Made on first use; neither the map nor an appender is ever destroyed, so
+// that loggers may write through them until the very end.
+LogAppenderMap& appenders();
+
+#endif  // QUELTA_UTIL_LOGAPPENDER_H_
