@@ -14,6 +14,19 @@ class LogChannel;
 class Logger;
 class Timeval;
 
+// A value that is never destroyed, so that a message from the last destructor of the process still
+// finds what it needs.
+template <class Value>
+union Everlasting {
+    Value value;
+
+    template <class... Args>
+    constexpr explicit Everlasting(Args... args) : value(args...) {}
+    ~Everlasting() {}
+    Everlasting(const Everlasting&) = delete;
+    Everlasting& operator=(const Everlasting&) = delete;
+};
+
 // False until Logger::initialize().
 extern bool logger_initialized;
 

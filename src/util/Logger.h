@@ -123,4 +123,28 @@ private:
     Logger* _next;                  // the next older logger that waits to be bound
 };
 
+// g++ can hand variadic arguments on from a function that is always inlined, and so tests the level
+// where the message is written; with other compilers the test is the first thing behind the call.
+// Each body here shadows the ordinary function of that name in Logger.cpp, which is what a pointer
+// to the member points to (gnu_inline).
+#if defined(__GNUC__) && !defined(__clang__) && !defined(QUELTA_LOGGER_OUT_OF_LINE)
+#define QUELTA_LOG_ENTRY_POINT(method, level)                                          \
+    inline __attribute__((always_inline, gnu_inline, artificial)) void Logger::method( \
+        const char* fmt, ...) {                                                        \
+        if (!suppresses(level)) {                                                      \
+            route(level, fmt, __builtin_va_arg_pack());                                \
+        }                                                                              \
+    }
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"  // checked where the message is written
+QUELTA_LOG_ENTRY_POINT(fatal, FATAL)
+QUELTA_LOG_ENTRY_POINT(crit, CRIT)
+QUELTA_LOG_ENTRY_POINT(error, ERROR)
+QUELTA_LOG_ENTRY_POINT(warn, WARN)
+QUELTA_LOG_ENTRY_POINT(info, INFO)
+QUELTA_LOG_ENTRY_POINT(debug, DEBUG)
+#pragma GCC diagnostic pop
+#undef QUELTA_LOG_ENTRY_POINT
+#endif
+
 #endif  // QUELTA_UTIL_LOGGER_H_
