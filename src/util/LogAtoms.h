@@ -16,8 +16,9 @@
 // Owns: frees the old array; the caller releases the new one with delete[].
 template <class Atom>
 void growAtoms(Atom*& atoms, Atom*& end, std::uint32_t& capacity) {
-    if (capacity > std::numeric_limits<std::uint32_t>::max() / 2)
+    if (capacity > std::numeric_limits<std::uint32_t>::max() / 2) {
         throw std::length_error("too many atoms in a log layout");
+    }
     const std::uint32_t grown = capacity == 0 ? 16 : 2 * capacity;
     Atom* const array = new Atom[grown];
     end = std::copy(atoms, end, array);

@@ -2,11 +2,16 @@
 
 #include <algorithm>
 #include <charconv>
-#include <cstring>
+#include <ctime>
 #include <limits>
 
 #include "util/Assert.h"
 #include "util/LogAtoms.h"
+#include "util/LogInternal.h"
+#include "util/LogMsgMetadata.h"
+#include "util/Logger.h"
+#include "util/Thread.h"
+#include "util/Timeval.h"
 
 namespace {
 
@@ -16,13 +21,40 @@ constexpr std::uint32_t MAX_WIDTH = std::numeric_limits<std::uint32_t>::max();
 // digit `width` stays as it is.
 // Returns: the first character behind the digits.
 const char* readWidth(const char* p, std::uint32_t& width) {
-    if (*p < '0' || *p > '9')
+    if (*p < '0' || *p > '9') {
         return p;
+    }
     std::uint64_t value = 0;
-    for (; *p >= '0' && *p <= '9'; ++p)
+    for (; *p >= '0' && *p <= '9'; ++p) {
         value = std::min<std::uint64_t>(value * 10 + static_cast<unsigned>(*p - '0'), MAX_WIDTH);
+    }
     width = static_cast<std::uint32_t>(value);
     return p;
+}
+
+// Fits the text that `out` holds from `mark` on into the widths of an atom.
+void fitWidths(std::string& out, std::size_t mark, const LogFormat::Atom& atom) {
+    const std::size_t len = out.size() - mark;
+    // Deliberate: a text that was cut is not padded, even when the maximum is below the minimum.
+    if (len > atom.maxw && atom.maxw != MAX_WIDTH) {
+        out.resize(mark + atom.maxw);
+    } else if (len < atom.minw) {
+        if (atom.justify == '\0') {
+            out.append(atom.minw - len, ' ');
+        } else {
+            out.insert(mark, atom.minw - len, atom.justify);
+        }
+    }
+}
+
+// Deliberate: a negative value, such as the time before the epoch, prints as its 64 bits unsigned.
+void appendNumber(std::string& out, long long value) {
+    char buf[21];  // 20 digits for 64 bits, and one to spare
+    const std::to_chars_result result =
+        std::to_chars(buf, buf + sizeof(buf), static_cast<unsigned long long>(value));
+    const auto elen = static_cast<std::size_t>(result.ptr - buf);
+    QUELTA_ASSERT(elen < sizeof(buf));
+    out.append(buf, elen);
 }
 
 }  // namespace
@@ -36,8 +68,9 @@ LogFormat::LogFormat(const char* pattern) : LogFormat() {
 
 LogFormat::~LogFormat() {
     for (const Atom* a = _atoms; a != _atom_end; ++a) {
-        if (a->what == Atom::TIME_FMT)
+        if (a->what == Atom::TIME_FMT) {
             delete a->arg.fdate;
+        }
     }
     delete[] _atoms;
 }
@@ -63,11 +96,13 @@ const char* LogFormat::compileConversion(const char* p, const char* end) {
     QUELTA_ASSERT(*p == '%');
     ++p;
     Atom* const a = new_atom();
-    if (*p == '-' || *p == '0')
+    if (*p == '-' || *p == '0') {
         a->justify = *p++ == '-' ? '\0' : '0';
+    }
     p = readWidth(p, a->minw);
-    if (*p == '.')
+    if (*p == '.') {
         p = readWidth(p + 1, a->maxw);
+    }
     if (p == end) {
         --_atom_end;
         return end;
@@ -85,8 +120,9 @@ const char* LogFormat::compileConversion(const char* p, const char* end) {
         arglen = static_cast<std::size_t>(p - arg);
         ++p;
     }
-    if (!setKind(*a, conversion, arg, arglen))
+    if (!setKind(*a, conversion, arg, arglen)) {
         --_atom_end;
+    }
     return p;
 }
 
@@ -131,8 +167,9 @@ bool LogFormat::setKind(Atom& atom, char conversion, const char* arg, std::size_
 
 // Adds literal text, whose own length as both widths keeps it from being padded or cut.
 void LogFormat::addLiteral(const char* begin, const char* end) {
-    if (begin == end)
+    if (begin == end) {
         return;
+    }
     Atom* const a = new_atom();
     a->what = Atom::STR;
     a->arg.str = begin;
@@ -151,4 +188,64 @@ LogFormat::Atom* LogFormat::new_atom() {
     }
     *_atom_end = Atom();
     return _atom_end++;
+}
+
+void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const {
+    const std::size_t mark = out.size();
+    try {
+        out.reserve(mark + likelyLength(mdata, msg));
+        CachedTm tm;
+        for (const Atom* a = _atoms; a != _atom_end; ++a) {
+            appendAtom(out, a, tm, mdata, msg);
+        }
+    } catch (...) {
+        out.resize(mark);
+        throw;
+    }
+}
+
+// A guess that keeps most lines to one allocation: a date or a thread's name outgrows its
+// conversion by about 16 characters.
+std::size_t LogFormat::likelyLength(const LogMsgMetadata& mdata, const std::string& msg) const {
+    const auto natoms = static_cast<std::size_t>(_atom_end - _atoms);
+    return _fmt.size() + 16 * natoms + mdata.category->_channel_name_len + msg.size();
+}
+
+// Appends the text of one atom, fitted into its widths.
+void LogFormat::appendAtom(std::string& out, const Atom* a, CachedTm& tm,
+                           const LogMsgMetadata& mdata, const std::string& msg) const {
+    const std::size_t mark = out.size();
+    switch (a->what) {
+        case Atom::MSG:
+            out.append(msg);
+            break;
+        case Atom::STR:
+            out.append(a->arg.str, a->slen);
+            break;
+        case Atom::CATEGORY:
+            out.append(mdata.category->_channel_name, mdata.category->_channel_name_len);
+            break;
+        case Atom::LEVEL: {
+            std::size_t len = 0;
+            const char* const name = loglevel2str(&len, mdata.level);
+            out.append(name, len);
+            break;
+        }
+        case Atom::THREADNAME:
+            out.append(Thread::currentName());
+            break;
+        case Atom::EPOCH_MSEC:
+            appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()));
+            break;
+        case Atom::EPOCH_SEC:
+            appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()) / 1000);
+            break;
+        case Atom::TIME_PROC:
+            appendNumber(out, std::clock());
+            break;
+        default:
+            QUELTA_ASSERT(a->what == Atom::TIME_FMT);
+            a->arg.fdate->fmt(out, tm, mdata);
+    }
+    fitWidths(out, mark, *a);
 }

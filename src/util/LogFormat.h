@@ -24,7 +24,8 @@
 #include <ctime>
 #include <string>
 
-enum LogLevel : std::int32_t;
+#include "util/LogLevel.h"
+
 class LogAppender;
 class LogFormattedDate;
 class Logger;
@@ -36,8 +37,7 @@ public:
     // strftime of the message's stamp.
     // Requires: the same stamp in every call on one object; `buf` has room for `size` bytes.
     // Returns: the length of the text; 0 when it does not fit or is empty.
-    std::size_t ftime(char* buf, std::size_t size, const char* fmt, const LogMsgMetadata& mdata)
-        __attribute__((format(strftime, 4, 0)));
+    std::size_t ftime(char* buf, std::size_t size, const char* fmt, const LogMsgMetadata& mdata);
 
 private:
     struct tm _stamp = {};   // valid once _stampSet

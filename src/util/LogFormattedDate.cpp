@@ -1,31 +1,114 @@
+#include "util/LogFormat.h"
+
 #include <algorithm>
 #include <cstring>
+#include <ctime>
 #include <memory>
+#include <string>
 #include <string_view>
 
 #include "util/Assert.h"
 #include "util/LogAtoms.h"
-#include "util/LogFormat.h"
+#include "util/LogMsgMetadata.h"
+#include "util/Timeval.h"
 
 namespace {
 
 using std::string_view;
+
+// A buffer that has grown to the larger of these and still holds nothing stops growing: the text is
+// empty, as that of "%Z" is in a zone without a name.
+constexpr std::size_t MIN_BUFFER_CAP = std::size_t{1} << 20;  // bytes
+constexpr std::size_t CAP_PER_CHARACTER = 256;                // bytes per character of the piece
 
 constexpr string_view MSEC_CONVERSION = "%l";
 constexpr string_view ISO8601_PATTERN = "%Y-%m-%d %H:%M:%S,%l";
 
 // Returns: the pattern that a date argument stands for, which is itself unless it is a name.
 string_view datePattern(string_view arg) {
-    if (arg.empty() || arg == "ISO8601")
+    if (arg.empty() || arg == "ISO8601") {
         return ISO8601_PATTERN;
-    if (arg == "DATE")
+    }
+    if (arg == "DATE") {
         return "%d %b %Y %H:%M:%S,%l";
-    if (arg == "ABSOLUTE")
+    }
+    if (arg == "ABSOLUTE") {
         return "%H:%M:%S,%l";
+    }
     return arg;
 }
 
+// Appends the milliseconds of a stamp, three digits.
+void appendMsec(std::string& out, const Timeval& stamp) {
+    const auto msec = static_cast<int>(stamp.msec() - stamp.sec() * 1000);
+    const char digits[] = {static_cast<char>('0' + msec / 100),
+                           static_cast<char>('0' + msec / 10 % 10),
+                           static_cast<char>('0' + msec % 10)};
+    out.append(digits, sizeof(digits));
+}
+
+// Returns: whether strftime may yield no text for a piece, which it tells like a buffer that is too
+// small. Only "%p", in any spelling, is known to: there are languages without AM and PM.
+bool mayBeEmpty(const char* piece) {
+    for (const char* p = piece; *p != '\0'; ++p) {
+        if (*p++ != '%') {
+            return false;
+        }
+        if (*p != '\0' && std::strchr("_-^#", *p) != nullptr) {
+            ++p;
+        }
+        while (*p >= '0' && *p <= '9') {
+            ++p;
+        }
+        if (*p == 'E' || *p == 'O') {
+            ++p;
+        }
+        if (*p != 'p') {
+            return false;
+        }
+    }
+    return true;
+}
+
+// Appends a piece that does not fit a buffer of `size` bytes.
+void appendLongPiece(std::string& out, CachedTm& tm, const char* piece, std::size_t size,
+                     const LogMsgMetadata& mdata) {
+    const std::size_t cap = std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece));
+    while (size < cap) {
+        size = std::min(2 * size, cap);
+        const std::unique_ptr<char[]> buf(new char[size]);
+        const std::size_t len = tm.ftime(buf.get(), size, piece, mdata);
+        if (len > 0 && len < size) {
+            out.append(buf.get(), len);
+            return;
+        }
+    }
+}
+
+void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsgMetadata& mdata) {
+    char buf[64];
+    const std::size_t len = tm.ftime(buf, sizeof(buf), piece, mdata);
+    if (len > 0 && len < sizeof(buf)) {
+        out.append(buf, len);
+    } else if (len > 0 || !mayBeEmpty(piece)) {
+        appendLongPiece(out, tm, piece, sizeof(buf), mdata);
+    }
+}
+
 }  // namespace
+
+// The pieces of a layout are read from a configuration: no compiler can check them.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+std::size_t CachedTm::ftime(char* buf, std::size_t size, const char* fmt,
+                            const LogMsgMetadata& mdata) {
+    if (!_stampSet) {
+        mdata.stamp.localtime(_stamp);
+        _stampSet = true;
+    }
+    return std::strftime(buf, size, fmt, &_stamp);
+}
+#pragma GCC diagnostic pop
 
 // Delegates, so that the destructor releases what was built when an allocation fails half way.
 LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) : LogFormattedDate() {
@@ -64,8 +147,9 @@ void LogFormattedDate::compile(const char* fmtstr, const char* fmtend) {
 }
 
 void LogFormattedDate::addPiece(const char* begin, const char* end) {
-    if (begin == end)
+    if (begin == end) {
         return;
+    }
     const char* const piece = store_string(begin, static_cast<std::size_t>(end - begin));
     Atom* const a = new_atom();
     a->what = Atom::STRFTIME;
@@ -92,4 +176,14 @@ const char* LogFormattedDate::store_string(const char* str, std::size_t len) {
     node->next = _sstor;
     _sstor = node.release();
     return _sstor->str;
+}
+
+void LogFormattedDate::fmt(std::string& out, CachedTm& tm, const LogMsgMetadata& mdata) const {
+    for (const Atom* a = _atoms; a != _atom_end; ++a) {
+        if (a->what == Atom::MSEC) {
+            appendMsec(out, mdata.stamp);
+        } else {
+            appendPiece(out, tm, a->str, mdata);
+        }
+    }
 }

@@ -88,8 +88,9 @@ TEST(LogFormatCompile, EveryConversionCharacterHasItsKind) {
 TEST(LogFormatCompile, NoOtherCharacterIsAConversion) {
     for (int c = 1; c < 256; ++c) {
         const char letter = static_cast<char>(c);
-        if (std::string_view("mncptrRud%-0123456789.").find(letter) != std::string_view::npos)
+        if (std::string_view("mncptrRud%-0123456789.").find(letter) != std::string_view::npos) {
             continue;
+        }
         const std::string pattern = std::string("a%") + letter + "b";
         EXPECT_EQ((std::vector<Expected>{literal("a"), literal("b")}),
                   atomsOf(LogFormat(pattern.c_str())))
@@ -172,14 +173,16 @@ TEST(LogFormatCompile, EveryConversionReadsAnArgumentAndOnlyTheDateUsesIt) {
 
 TEST(LogFormatCompile, AnUnterminatedArgumentEndsThePattern) {
     for (const char* const pattern :
-         {"a%d{%H:%M %m", "a%c{2 %m%n", "a%q{", "a%m{", "a%n{x %m", "a%-5.7d{{"})
+         {"a%d{%H:%M %m", "a%c{2 %m%n", "a%q{", "a%m{", "a%n{x %m", "a%-5.7d{{"}) {
         EXPECT_EQ(std::vector<Expected>{literal("a")}, atomsOf(LogFormat(pattern))) << pattern;
+    }
 }
 
 TEST(LogFormatCompile, AnIncompleteConversionAtTheEndIsDropped) {
     for (const char* const pattern :
-         {"a%", "a%-", "a%0", "a%5", "a%-5", "a%05", "a%5.", "a%5.7", "a%.", "a%.7"})
+         {"a%", "a%-", "a%0", "a%5", "a%-5", "a%05", "a%5.", "a%5.7", "a%.", "a%.7"}) {
         EXPECT_EQ(std::vector<Expected>{literal("a")}, atomsOf(LogFormat(pattern))) << pattern;
+    }
 }
 
 TEST(LogFormatCompile, AConversionMayEndInAPercentSign) {

@@ -1,0 +1,128 @@
+#include "support/SlowLayout.h"
+
+#include <cstddef>
+#include <cstdio>
+#include <optional>
+#include <regex>
+#include <stdexcept>
+#include <vector>
+
+namespace {
+
+// The patterns are made at run time: no compiler can check them.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+// strftime with room enough; the sentinel in front tells an empty text from one that does not fit.
+std::string strftimeOf(const std::string& piece, const struct tm& local) {
+    std::vector<char> buf(65536);
+    const std::size_t len = std::strftime(buf.data(), buf.size(), ("x" + piece).c_str(), &local);
+    if (len == 0) {
+        throw std::length_error("date too long for the slow renderer");
+    }
+    return std::string(buf.data() + 1, len - 1);
+}
+#pragma GCC diagnostic pop
+
+std::string dateOf(const std::optional<std::string>& arg, const SlowLine& line) {
+    std::string pattern = arg.value_or("");
+    if (pattern == "DATE") {
+        pattern = "%d %b %Y %H:%M:%S,%l";
+    } else if (pattern == "ABSOLUTE") {
+        pattern = "%H:%M:%S,%l";
+    } else if (pattern == "ISO8601" || pattern.empty()) {
+        pattern = "%Y-%m-%d %H:%M:%S,%l";
+    }
+    char msec[8];
+    std::snprintf(msec, sizeof(msec), "%03u", line.usec / 1000 % 1000);
+    std::string date;
+    for (std::size_t cut; (cut = pattern.find("%l")) != std::string::npos;) {
+        date += strftimeOf(pattern.substr(0, cut), line.local) + msec;
+        pattern.erase(0, cut + 2);
+    }
+    return date + strftimeOf(pattern, line.local);
+}
+
+std::optional<std::string> textOf(char conversion, const std::optional<std::string>& arg,
+                                  const SlowLine& line) {
+    switch (conversion) {
+        case 'm':
+            return line.message;
+        case 'n':
+            return "\n";
+        case 'c':
+            return line.category;
+        case 'p':
+            return line.level;
+        case 't':
+            return line.thread;
+        case 'r':
+            return line.epochMsec;
+        case 'R':
+            return line.epochSec;
+        case 'u':
+            return line.clock;
+        case 'd':
+            return dateOf(arg, line);
+        default:
+            return std::nullopt;
+    }
+}
+
+// Widths stay small enough here that a number of more than nine digits can only mean "no limit".
+std::size_t widthOf(const std::string& digits, std::size_t none) {
+    if (digits.empty()) {
+        return none;
+    }
+    return digits.size() > 9 ? std::string::npos : std::stoul(digits);
+}
+
+std::string fitted(const std::string& text, const std::smatch& widths) {
+    const std::size_t minw = widthOf(widths[2], 0);
+    const std::size_t maxw = widthOf(widths[4], std::string::npos);
+    if (text.size() > maxw) {
+        return text.substr(0, maxw);
+    }
+    if (text.size() >= minw) {
+        return text;
+    }
+    const std::string flag = widths[1];
+    const std::string padding(minw - text.size(), flag == "0" ? '0' : ' ');
+    return flag == "-" ? text + padding : padding + text;
+}
+
+}  // namespace
+
+std::string renderSlowly(const std::string& pattern, const SlowLine& line) {
+    static const std::regex widthsBefore("^%([-0]?)([0-9]*)(\\.?)([0-9]*)");
+    std::string out;
+    std::string rest = pattern;
+    while (!rest.empty()) {
+        std::smatch widths;
+        if (rest[0] != '%' || rest.compare(0, 2, "%%") == 0) {
+            out += rest[0];
+            rest.erase(0, rest[0] == '%' ? 2 : 1);
+            continue;
+        }
+        const std::string conversion = rest;
+        std::regex_search(conversion, widths, widthsBefore);
+        rest = widths.suffix();
+        if (rest.empty()) {
+            break;
+        }
+        const char letter = rest[0];
+        rest.erase(0, 1);
+        std::optional<std::string> arg;
+        if (!rest.empty() && rest[0] == '{') {
+            const std::size_t close = rest.find('}');
+            if (close == std::string::npos) {
+                break;
+            }
+            arg = rest.substr(1, close - 1);
+            rest.erase(0, close + 1);
+        }
+        if (const auto text = textOf(letter, arg, line)) {
+            out += fitted(*text, widths);
+        }
+    }
+    return out;
+}

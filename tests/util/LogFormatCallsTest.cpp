@@ -1,0 +1,245 @@
+// What a line costs and what happens when a call beneath it fails: conversions to local time,
+// buffers given to strftime, allocations.
+
+#include <gtest/gtest.h>
+
+#include <ctime>
+#include <functional>
+#include <new>
+#include <string>
+#include <vector>
+
+#include "support/AllocationProbe.h"
+#include "support/LogLine.h"
+#include "support/TimeZone.h"
+#include "util/LogFormat.h"
+#include "util/Logger.h"
+
+namespace {
+
+using Strftime = std::function<std::size_t(char*, std::size_t, const char*)>;
+
+int localtimeCalls = 0;
+std::vector<std::size_t> strftimeSizes;
+Strftime fakeStrftime;  // used in place of strftime when set
+
+const Logger logger("calls");
+constexpr long long STAMP = 981173106;  // 2001-02-03 04:05:06 UTC
+
+}  // namespace
+
+extern "C" {
+struct tm* __real_localtime_r(const std::time_t* time, struct tm* result);
+struct tm* __wrap_localtime_r(const std::time_t* time, struct tm* result) {
+    ++localtimeCalls;
+    return __real_localtime_r(time, result);
+}
+
+std::size_t __real_strftime(char* buf, std::size_t size, const char* fmt, const struct tm* tm);
+std::size_t __wrap_strftime(char* buf, std::size_t size, const char* fmt, const struct tm* tm) {
+    if (!fakeStrftime) {
+        return __real_strftime(buf, size, fmt, tm);
+    }
+    strftimeSizes.push_back(size);
+    return fakeStrftime(buf, size, fmt);
+}
+}
+
+namespace {
+
+std::size_t alwaysEmpty(char* buf, std::size_t, const char*) {
+    buf[0] = '\0';
+    return 0;
+}
+
+// The sizes of the buffers that strftime is given for one piece.
+std::vector<std::size_t> sizesFor(const std::string& piece, const Strftime& fake = alwaysEmpty) {
+    const LogFormattedDate date(piece.data(), piece.size());
+    CachedTm tm;
+    std::string out;
+    strftimeSizes.clear();
+    fakeStrftime = fake;
+    date.fmt(out, tm, stampedAt(logger, INFO, STAMP));
+    fakeStrftime = nullptr;
+    EXPECT_EQ("", fake.target<decltype(&alwaysEmpty)>() != nullptr ? out : "");
+    return strftimeSizes;
+}
+
+std::size_t allocationsFor(const char* pattern, const std::string& msg, std::string& out) {
+    const LogFormat layout(pattern);
+    const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
+    layout.apply(out, mdata, msg);  // the first call makes what the C library keeps
+    out.clear();
+    AllocationProbe probe;
+    layout.apply(out, mdata, msg);
+    probe.stop();
+    return probe.count();
+}
+
+std::size_t allocationsFor(const char* pattern, const std::string& msg) {
+    const LogFormat layout(pattern);
+    const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
+    AllocationProbe probe;
+    std::string out;
+    layout.apply(out, mdata, msg);
+    probe.stop();
+    return probe.count();
+}
+
+}  // namespace
+
+TEST(LogFormatCalls, LocalTimeIsConvertedAtMostOncePerLine) {
+    const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
+    const struct {
+        const char* pattern;
+        int calls;
+    } rows[] = {{"%m%n", 0},
+                {"%r %R %u %p %t %c %m%n", 0},
+                {"%d{%l}", 0},
+                {"%d", 1},
+                {"%d %d{ABSOLUTE} %d{DATE} %d{%H%l%M} %m", 1}};
+    for (const auto& row : rows) {
+        const LogFormat layout(row.pattern);
+        localtimeCalls = 0;
+        lineOf(layout, mdata, "x");
+        EXPECT_EQ(row.calls, localtimeCalls) << row.pattern;
+        lineOf(layout, mdata, "x");
+        EXPECT_EQ(2 * row.calls, localtimeCalls) << row.pattern << ": each line converts anew";
+    }
+}
+
+TEST(LogFormatCalls, OnlyAmAndPmMayBeEmpty) {
+    for (const char* const piece :
+         {"%p", "%p%p", "%_p", "%-p", "%^p", "%#p", "%12p", "%_12p", "%Ep", "%Op", "%#7Ep%p"}) {
+        EXPECT_EQ(std::vector<std::size_t>{64}, sizesFor(piece)) << piece;
+    }
+    for (const char* const piece :
+         {"%P",   "%p ",  " %p",  "%p%H",  "%H%p", "%",   "%p%", "%_", "%7",  "%E",
+          "%EOp", "%OEp", "%^#p", "%12_p", "%E7p", "%+p", "%Z",  "p",  "%%p", "%pp"}) {
+        EXPECT_EQ(15u, sizesFor(piece).size()) << piece;
+    }
+}
+
+TEST(LogFormatCalls, ADigitZeroIsNoFlagOfAmAndPm) {
+    EXPECT_EQ(std::vector<std::size_t>{64}, sizesFor("%0p"));
+    EXPECT_EQ(std::vector<std::size_t>{64}, sizesFor("%_0p"));
+    EXPECT_LT(1u, sizesFor("%0_p").size());
+}
+
+TEST(LogFormatCalls, AnEmptyPieceIsAskedForOnce) {
+    const std::string piece("\0abc", 4);
+    EXPECT_EQ(std::vector<std::size_t>{64}, sizesFor(piece));
+}
+
+TEST(LogFormatCalls, BuffersDoubleUpToOneMebibyte) {
+    std::vector<std::size_t> expected;
+    for (std::size_t size = 64; size <= (std::size_t{1} << 20); size *= 2) {
+        expected.push_back(size);
+    }
+    EXPECT_EQ(expected, sizesFor("%Z"));
+    EXPECT_EQ(expected, sizesFor(std::string(4096, 'x'))) << "256 times its length is the same";
+}
+
+TEST(LogFormatCalls, BuffersOfALongPieceReach256TimesItsLength) {
+    EXPECT_EQ(std::size_t{256} * 4097, sizesFor(std::string(4097, 'x')).back());
+    EXPECT_EQ(std::size_t{256} * 5000, sizesFor(std::string(5000, 'x')).back());
+    EXPECT_EQ(std::size_t{256} * 8192, sizesFor(std::string(8192, 'x')).back());
+    EXPECT_EQ(16u, sizesFor(std::string(8192, 'x')).size());
+}
+
+TEST(LogFormatCalls, ALengthThatIsNotBelowTheBufferIsTriedAgain) {
+    EXPECT_EQ((std::vector<std::size_t>{64, 128, 256}),
+              sizesFor("%p", [](char* buf, std::size_t size, const char*) {
+                  buf[0] = 'x';
+                  return size < 256 ? size : 1;
+              }));
+}
+
+TEST(LogFormatCalls, AShortDateNeedsOneCallPerPiece) {
+    EXPECT_EQ(std::vector<std::size_t>{64},
+              sizesFor("%Y-%m-%d %H:%M:%S", [](char* buf, std::size_t, const char*) {
+                  buf[0] = 'x';
+                  return std::size_t{63};
+              }));
+}
+
+TEST(LogFormatCalls, ALineAllocatesAtMostOnce) {
+    for (const char* const pattern :
+         {"%m%n", "%d{%m-%d-%Y %H:%M:%S.%l} %-5p %c - %m%n", "%d %m%n", "%d{DATE} [%t] %p %m%n",
+          "%R %p %c %m%n", "%-8p: %m%n", "%30d{ABSOLUTE} %.20c %.3d%n"}) {
+        for (const std::size_t length : {0u, 10u, 100u, 1000u}) {
+            EXPECT_GE(1u, allocationsFor(pattern, std::string(length, 'x')))
+                << pattern << " with a message of " << length;
+        }
+    }
+}
+
+TEST(LogFormatCalls, ALineIntoARoomyStringDoesNotAllocate) {
+    std::string out;
+    out.reserve(1000);
+    EXPECT_EQ(0u, allocationsFor("%30d %d{%H%l} %-5p %08r %t %c - %m%n", "hello", out));
+}
+
+TEST(LogFormatCalls, ManyLinesInOneStringReallocateSeldom) {
+    const LogFormat layout("%m%n");
+    const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
+    std::string out;
+    AllocationProbe probe;
+    for (int i = 0; i < 10000; ++i) {
+        layout.apply(out, mdata, "hello");
+    }
+    probe.stop();
+    EXPECT_EQ(60000u, out.size());
+    EXPECT_GE(20u, probe.count());
+}
+
+TEST(LogFormatCalls, AFailedAllocationLeavesTheOutputAsItWas) {
+    const TimeZone utc("UTC0");
+    const LogFormat layout(
+        "%m %c %200p %d{%H:%M:%S %A %A %A %A %A %A %A %A %A %A %A %A %A %A %A} %400d%n");
+    const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
+    const std::string expected = "before " + lineOf(layout, mdata, "hello");
+    std::size_t failures = 0;
+    for (std::size_t nth = 1;; ++nth) {
+        std::string out = "before ";
+        AllocationProbe probe(nth);
+        bool failed = false;
+        try {
+            layout.apply(out, mdata, "hello");
+        } catch (const std::bad_alloc&) {
+            failed = true;
+        }
+        probe.stop();
+        EXPECT_EQ(failed ? "before " : expected, out) << "allocation " << nth;
+        EXPECT_EQ(expected, "before " + lineOf(layout, mdata, "hello"));
+        if (!failed) {
+            break;
+        }
+        ++failures;
+    }
+    EXPECT_LE(3u, failures);
+}
+
+TEST(LogFormatCalls, AFailedAllocationWhileCompilingLeaksNothing) {
+    std::string pattern;
+    for (int i = 0; i < 9; ++i) {
+        pattern += "%d{%H:%M a long piece that is stored outside the string %l and another one} ";
+    }
+    std::size_t failures = 0;
+    for (std::size_t nth = 1;; ++nth) {
+        AllocationProbe probe(nth);
+        bool failed = false;
+        try {
+            const LogFormat layout(pattern.c_str());
+        } catch (const std::bad_alloc&) {
+            failed = true;
+        }
+        probe.stop();
+        EXPECT_EQ(0, probe.live()) << "allocation " << nth;
+        if (!failed) {
+            break;
+        }
+        ++failures;
+    }
+    EXPECT_EQ(1 + 2 + 9 * 6, failures) << "pattern, atoms twice, and six for each date";
+}
