@@ -105,7 +105,7 @@ LogAppenderMap& appenders() {
 
 LogAppender::LogAppender() : _fd(-1) {}
 
-LogAppender::~LogAppender() {
+LogAppender::~LogAppender() noexcept {
     if (!_filename.empty()) {
         closeFd();
     }
@@ -227,11 +227,16 @@ void LogAppender::writeLine(const std::string& line, time_t now, Failure& failur
     if (_fd.valid() && !_filename.empty()) {
         checkIdentity(now);
     }
-    if (!_fd.valid() && !openAndInitFile(now, &failure)) {
+    if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now, &failure)) {
         return;
     }
-    const ssize_t count = _fd.write(line);
-    if (count < 0) {
+    // Without a file and before its setup, an appender is asked to report another one's trouble.
+    const FileDescriptor out = _fd.valid() ? _fd : FileDescriptor(STDERR_FILENO);
+    const ssize_t count = out.write(line);
+    if (count < 0 || (count == 0 && !line.empty())) {
+        if (count == 0) {
+            errno = ENOSPC;  // neither taken nor refused: the device is full
+        }
         failed(Problem::WRITE, &failure);
         if (!_filename.empty()) {
             closeFd();
