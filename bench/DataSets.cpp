@@ -89,7 +89,9 @@ PatternSet programSet(std::size_t draws, std::size_t count) {
     for (; draws > 0 && distinct.size() < count; --draws) {
         distinct.insert(drawPattern());
     }
-    PatternSet set{"program", {distinct.begin(), distinct.end()}, {PROGRAM_TERM}};
+    PatternSet set{"program", {distinct.begin(), distinct.end()}, {PROGRAM_TERM}, ""};
+    // Every pattern ends with the last letter, which this term lacks.
+    set.miss = "abcdefghijklmnopqrstuvwxy";
     std::sort(set.patterns.begin(), set.patterns.end());
     return set;
 }
@@ -108,7 +110,7 @@ PatternSet urlSet(std::size_t count) {
         const std::string& stem = stems[pick(generator, stems.size())];
         distinct.insert(stem + std::to_string(pick(generator, 900) + 100) + "/*");
     }
-    PatternSet set{"urls", {distinct.begin(), distinct.end()}, {}};
+    PatternSet set{"urls", {distinct.begin(), distinct.end()}, {}, ""};
     for (int term = 0; term < 64; ++term) {
         std::string base = set.patterns[pick(generator, set.patterns.size())];
         base.pop_back();
@@ -130,7 +132,7 @@ PatternSet shortTermSet(std::size_t count, std::size_t terms) {
             distinct.insert(word(generator, 1) + pattern);
         }
     }
-    PatternSet set{"short terms", {distinct.begin(), distinct.end()}, {}};
+    PatternSet set{"short terms", {distinct.begin(), distinct.end()}, {}, ""};
     for (; terms > 0; --terms) {
         set.terms.push_back(word(generator, 1 + pick(generator, 3)));
     }

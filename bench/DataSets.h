@@ -15,6 +15,7 @@ struct PatternSet {
     std::string name;
     std::vector<std::string> patterns;  // distinct
     std::vector<std::string> terms;     // looked up one after another
+    std::string miss;  // if not empty: begins with every prefix of the set, matches no pattern
 };
 
 // The number of draws of the program Rete.

@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <map>
+#include <sstream>
 #include <vector>
 
 namespace bench {
@@ -94,9 +95,11 @@ public:
                             run.error_message.c_str());
                 break;
             }
-            const double nanoseconds =
-                run.GetAdjustedRealTime() / benchmark::GetTimeUnitMultiplier(run.time_unit) * 1e9;
-            record(values, where, "time_ns", nanoseconds);
+            const double unit = 1e9 / benchmark::GetTimeUnitMultiplier(run.time_unit);
+            record(values, where, "time_ns", run.GetAdjustedRealTime() * unit);
+            if (run.threads == 1 && run.run_name.time_type != "manual_time") {
+                record(values, where, "cpu_ns", run.GetAdjustedCPUTime() * unit);
+            }
             for (const auto& [name, counter] : run.counters) {
                 record(values, where, name, counter.value);
             }
@@ -203,6 +206,11 @@ int main(int argc, char** argv) {
     benchmark::Initialize(&count, pointers.data());
     if (benchmark::ReportUnrecognizedArguments(count, pointers.data())) {
         return 2;
+    }
+    // The peers that were not there to build with, from the build.
+    std::istringstream missing(QUELTA_BENCH_MISSING);
+    for (std::string peer; missing >> peer;) {
+        bench::leaveOut("all", peer, "not installed");
     }
     for (void (*registerAll)() : bench::suites()) {
         registerAll();

@@ -41,6 +41,7 @@ struct Outcome {
     double spanNs;    // negative: not measured
     double firstNs;   // the very first lookup, with whatever the peer puts off until then
     double lookupNs;  // per term, median
+    double missNs;    // of the term that has candidates and no match; negative: no such term
     double setResetNs;
     double matches;      // over all terms
     double differences;  // pairs of pattern and term where the usual meaning differs
@@ -92,17 +93,17 @@ struct Case {
 
 // Runs `body` over all terms again and again; the median of the rounds, per term.
 template <class Body>
-double medianPerTerm(const PatternSet& set, const Body& body) {
+double medianPerTerm(const std::vector<std::string>& terms, const Body& body) {
     const std::size_t least = bench::quick() ? 2 : 7;
     const double budget = bench::quick() ? 1e7 : 3e8;
     std::vector<double> rounds;
     const auto begin = std::chrono::steady_clock::now();
     while (rounds.size() < least || (since(begin) < budget && rounds.size() < 10001)) {
         const auto start = std::chrono::steady_clock::now();
-        for (const std::string& term : set.terms) {
+        for (const std::string& term : terms) {
             benchmark::DoNotOptimize(body(term));
         }
-        rounds.push_back(since(start) / static_cast<double>(set.terms.size()));
+        rounds.push_back(since(start) / static_cast<double>(terms.size()));
     }
     const auto middle = rounds.begin() + static_cast<std::ptrdiff_t>(rounds.size() / 2);
     std::nth_element(rounds.begin(), middle, rounds.end());
@@ -150,10 +151,19 @@ std::string measure(const Entry& entry, const Case& what, Outcome& out) {
         return error;
     }
     out.lookupNs =
-        medianPerTerm(what.set, [&](const std::string& term) { return peer->count(term); });
+        medianPerTerm(what.set.terms, [&](const std::string& term) { return peer->count(term); });
+    out.missNs = -1;
+    if (const std::string& miss = what.set.miss; !miss.empty()) {
+        const long set = peer->keepsMatches() ? peer->count(first) : 0;
+        if (peer->count(miss) != set) {
+            return "WRONG: a match where there is none";
+        }
+        out.missNs =
+            medianPerTerm({miss}, [&](const std::string& term) { return peer->count(term); });
+    }
     out.setResetNs = -1;
     if (peer->keepsMatches()) {
-        out.setResetNs = medianPerTerm(what.set, [&](const std::string& term) {
+        out.setResetNs = medianPerTerm(what.set.terms, [&](const std::string& term) {
             const long matches = peer->count(term);
             peer->forget(term);
             return matches;
@@ -263,6 +273,9 @@ void run(benchmark::State& state, const Entry& entry, const Case& what) {
         state.counters["differences"] = outcome.differences;
         if (outcome.spanNs >= 0) {
             state.counters["span_ns"] = outcome.spanNs;
+        }
+        if (outcome.missNs >= 0) {
+            state.counters["miss_ns"] = outcome.missNs;
         }
         if (outcome.setResetNs >= 0) {
             state.counters["set_reset_ns"] = outcome.setResetNs;

@@ -1,0 +1,70 @@
+#ifndef QUELTA_BENCH_LOGPEER_H_
+#define QUELTA_BENCH_LOGPEER_H_
+
+// What every logger of the benchmarks offers: one logger named "bench" at level INFO with one file
+// that rotates at 25 MB, keeps five backups and holds each line when the call returns. Each peer is
+// one file below peers/ that adds itself to the list with a static registrar.
+//
+// open and close run in one thread; lines and suppressed in any number at once between them.
+
+#include <cstddef>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace bench {
+
+// The two layouts: the bare message, and
+// "12-31-2025 23:59:59.999 INFO  bench - message" with local time.
+enum class Layout { PLAIN, DATE };
+
+constexpr long ROTATE_BYTES = 25000000;
+constexpr int BACKUPS = 5;
+
+// The message of the n-th line is "request n of client 10.0.0.7 served in 42 ms", put together by
+// the logger's own means.
+#define QUELTA_BENCH_CLIENT "10.0.0.7"
+constexpr int BENCH_MILLISECONDS = 42;
+
+class LogPeer {
+public:
+    virtual ~LogPeer() = default;
+
+    // Directs the lines to directory/bench.log, appending to what is there.
+    virtual void open(const std::string& directory, Layout layout) = 0;
+
+    // Writes the lines first, first + 1, ... (`count` of them) at level INFO.
+    virtual void lines(std::size_t first, std::size_t count) = 0;
+
+    // The same call `count` times over at level DEBUG, which is below the logger's level.
+    // Returns: false when the peer has no levels.
+    virtual bool suppressed(std::size_t count) = 0;
+
+    // After this the file may be deleted.
+    virtual void close() = 0;
+};
+
+struct LogPeerEntry {
+    std::string name;
+    std::unique_ptr<LogPeer> (*make)();
+};
+
+inline std::vector<LogPeerEntry>& logPeers() {
+    static std::vector<LogPeerEntry> list;
+    return list;
+}
+
+// Adds a peer at static initialization.
+template <class Implementation>
+class LogRegistrar {
+public:
+    explicit LogRegistrar(const char* name) {
+        logPeers().push_back({name, []() -> std::unique_ptr<LogPeer> {
+                                  return std::make_unique<Implementation>();
+                              }});
+    }
+};
+
+}  // namespace bench
+
+#endif  // QUELTA_BENCH_LOGPEER_H_
