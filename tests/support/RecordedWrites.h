@@ -1,0 +1,104 @@
+#ifndef QUELTA_TESTS_SUPPORT_RECORDEDWRITES_H_
+#define QUELTA_TESTS_SUPPORT_RECORDEDWRITES_H_
+
+// Takes the place of LogAppender::write, so that a test sees what reaches which appender, and
+// decides what happens there. The test program wraps the function:
+//     WRAP ${APPENDER_WRITE}       (in its quelta_test)
+// While no object lives, appenders write as they always do.
+//
+//     RecordedWrites writes;
+//     logger.info("text");
+//     EXPECT_EQ("INFO Name text\n", writes.text());
+//
+// Included by one source of a program. Not thread-safe to make and destroy; writes may come from
+// any thread, serialised by `_mutex`.
+
+#include <functional>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "util/LogAppender.h"
+#include "util/LogMsgMetadata.h"
+#include "util/Logger.h"
+
+class RecordedWrites {
+public:
+    struct Message {
+        const LogAppender* appender;
+        const Logger* category;
+        LogLevel level;
+        std::string text;
+    };
+    using Action = std::function<void(const Message&)>;
+
+    // `action` runs for each message, after it has been recorded and outside the lock.
+    explicit RecordedWrites(Action action = {}) : _action(std::move(action)) { s_current = this; }
+    ~RecordedWrites() { s_current = nullptr; }
+    RecordedWrites(const RecordedWrites&) = delete;
+    RecordedWrites& operator=(const RecordedWrites&) = delete;
+
+    std::vector<Message> messages() const {
+        const std::lock_guard lock(_mutex);
+        return _messages;
+    }
+    // "LEVEL category text" and a line feed for each message.
+    std::string text() const {
+        std::string result;
+        for (const Message& message : messages()) {
+            std::size_t ignored = 0;
+            result += loglevel2str(&ignored, message.level);
+            result += std::string(" ") + message.category->_channel_name + ' ';
+            result += message.text + '\n';
+        }
+        return result;
+    }
+    // The appenders of the messages, in their order.
+    std::vector<const LogAppender*> appenders() const {
+        std::vector<const LogAppender*> result;
+        for (const Message& message : messages()) {
+            result.push_back(message.appender);
+        }
+        return result;
+    }
+
+    void record(const Message& message) {
+        {
+            const std::lock_guard lock(_mutex);
+            _messages.push_back(message);
+        }
+        if (_action) {
+            _action(message);
+        }
+    }
+
+    static inline RecordedWrites* s_current = nullptr;  // the one object that lives
+
+private:
+    const Action _action;
+    mutable std::mutex _mutex;  // guards _messages
+    std::vector<Message> _messages;
+};
+
+// LogAppender::write(const LogMsgMetadata&, const std::string&) as the linker names it, behind the
+// prefixes of the real and of the wrapped function.
+// clang-format off
+#define QUELTA_APPENDER_WRITE(prefix) \
+    prefix##__ZN11LogAppender5writeERK14LogMsgMetadataRKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEE
+// clang-format on
+
+extern "C" {
+void QUELTA_APPENDER_WRITE(__real)(LogAppender* appender, const LogMsgMetadata& mdata,
+                                   const std::string& msg);
+void QUELTA_APPENDER_WRITE(__wrap)(LogAppender* appender, const LogMsgMetadata& mdata,
+                                   const std::string& msg) {
+    if (RecordedWrites::s_current != nullptr) {
+        RecordedWrites::s_current->record({appender, mdata.category, mdata.level, msg});
+    } else {
+        QUELTA_APPENDER_WRITE(__real)(appender, mdata, msg);
+    }
+}
+}
+
+#endif  // QUELTA_TESTS_SUPPORT_RECORDEDWRITES_H_

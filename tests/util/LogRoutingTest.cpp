@@ -1,0 +1,324 @@
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+#include <new>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "support/AllocationProbe.h"
+#include "support/InChild.h"
+#include "support/RecordedWrites.h"
+#include "support/ScriptedCalls.h"
+#include "support/StderrCapture.h"
+#include "util/LogFormat.h"
+#include "util/LogInternal.h"
+#include "util/Logger.h"
+
+extern "C" {
+ssize_t __real_write(int fd, const void* buf, std::size_t size);
+ssize_t __wrap_write(int fd, const void* buf, std::size_t size) {
+    return scriptedCall("write", size,
+                        [&](std::size_t limit) { return __real_write(fd, buf, limit); });
+}
+int __real_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
+    __attribute__((format(printf, 3, 0)));
+int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
+    __attribute__((format(printf, 3, 0)));
+int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
+    return scriptedCall("vsnprintf", [&] { return __real_vsnprintf(buf, size, fmt, ap); });
+}
+}
+
+namespace {
+
+using Written = std::vector<const LogAppender*>;
+
+LogAppender* appender(const char* name) {
+    return LogAppender::find(name, true);
+}
+
+void expectInChild(const std::string& standardError, void (*body)()) {
+    const ChildRun run = inChild(body);
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ(standardError, run.err);
+}
+
+// Initializes logging with a channel for the reports of the logging subsystem.
+LogChannel& channelNamedLogger(LogLevel minlevel, const std::vector<LogAppender*>& appenders) {
+    LogChannel& channel = *LogChannel::find("Logger", true);
+    channel.minlevel = minlevel;
+    channel._appenders = appenders;
+    Logger::initialize();
+    return channel;
+}
+
+TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
+    const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the line feed fill 1024 bytes
+    const struct {
+        int level;
+        std::string message, expected;
+    } rows[] = {
+        {DEBUG, "text", "DEBUG - text\n"},
+        {INFO, "", "INFO - \n"},
+        {NOTICE, "two\nlines", "NOTICE - two\nlines\n"},
+        {EMERG, "100% %d %m", "EMERG - 100% %d %m\n"},
+        {9, "text", "??? - text\n"},
+        {-1, "text", "??? - text\n"},
+        {INFO, std::string("a\0b", 3), std::string("INFO - a\0b\n", 11)},
+        {DEBUG, nearlyLong, "DEBUG - " + nearlyLong + "\n"},
+        {DEBUG, nearlyLong + "x", "DEBUG - " + nearlyLong + "x\n"},
+        {DEBUG, std::string(100000, 'y'), "DEBUG - " + std::string(100000, 'y') + "\n"},
+    };
+    for (const auto& row : rows) {
+        const StderrCapture err;
+        const ScriptedCalls writes("write");
+        fallback_to_stderr(static_cast<LogLevel>(row.level), row.message);
+        EXPECT_EQ(row.expected, err.text());
+        EXPECT_EQ(1u, writes.calls());
+    }
+}
+
+TEST(FallbackTest, IgnoresTheResultOfTheCall) {
+    ScriptedCalls writes("write");
+    writes.fail(EIO).limit(3).fail(EINTR);
+    const StderrCapture err;
+    fallback_to_stderr(INFO, "lost");
+    fallback_to_stderr(INFO, "cut");
+    fallback_to_stderr(INFO, "interrupted");
+    EXPECT_EQ("INF", err.text());
+    EXPECT_EQ(3u, writes.calls());
+}
+
+TEST(FallbackTest, KeepsErrnoForTheCallerOfALogger) {
+    const Logger logger("name");
+    Logger copy(logger);  // goes to the fallback
+    ScriptedCalls writes("write");
+    writes.fail(EIO, 2);
+    errno = ENOENT;
+    copy.info("%d", 1);
+    copy.info(std::string("text"));
+    EXPECT_EQ(ENOENT, errno);
+    EXPECT_EQ(2u, writes.calls());
+}
+
+TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted) {
+    const Logger logger("name");
+    Logger copy(logger);
+    ScriptedCalls formats("vsnprintf");
+    formats.give(-1, 20);
+    const StderrCapture err;
+    copy.debug("%s %d", "text", 1);
+    EXPECT_EQ("DEBUG - %s %d\n", err.text());
+}
+
+// Every allocation of a call fails once; whatever it is for, the message or its format comes out,
+// except when the fallback itself has no room.
+TEST(FallbackTest, ExhaustedMemoryLosesAMessageAtMost) {
+    Logger logger("name");
+    Logger copy(logger);
+    const std::string text(500, 'x');
+    const std::string longText(2000, 'y');
+    for (Logger* const each : {&logger, &copy}) {
+        std::size_t failing = 1;
+        bool failed = true;
+        for (; failed; ++failing) {
+            const StderrCapture err;
+            AllocationProbe allocations(failing);
+            errno = ENOENT;
+            each->error("%s", text.c_str());
+            EXPECT_EQ(ENOENT, errno);
+            failed = allocations.count() >= failing;
+            allocations.stop();
+            const std::string expected = each == &logger && !failed ? text : "ERROR - " + text;
+            EXPECT_TRUE(err.text() == expected + '\n' || err.text() == "ERROR - %s\n")
+                << failing << ": " << err.text();
+        }
+        EXPECT_LT(2u, failing);
+    }
+}
+
+TEST(FallbackTest, AMessageThatItHasNoRoomForIsLost) {
+    const Logger logger("name");
+    Logger copy(logger);
+    const std::string longText(2000, 'y');
+    const StderrCapture err;
+    AllocationProbe allocations(1);
+    EXPECT_THROW(fallback_to_stderr(ERROR, longText), std::bad_alloc);
+    AllocationProbe again(1);
+    copy.error(longText);
+    EXPECT_EQ(1u, again.count());
+    again.stop();
+    EXPECT_EQ("", err.text());
+}
+
+TEST(InternalReportTest, ReachesTheRootAppenderBeforeInitialization) {
+    expectInChild("report 1\n", [] {
+        LogFormat::internal(nullptr, WARN, "report %d", 1);
+        LogFormat::internal(nullptr, DEBUG, "suppressed %d", 1);
+    });
+}
+
+TEST(InternalReportTest, IgnoresTheRootChannelBeforeInitialization) {
+    expectInChild("report\n", [] {
+        rootChannel().minlevel = EMERG;
+        rootChannel()._appenders = {appender("A1")};
+        LogFormat::internal(nullptr, INFO, "report");
+        rootChannel().minlevel = DEBUG;
+        LogFormat::internal(nullptr, DEBUG, "suppressed");
+    });
+}
+
+TEST(InternalReportTest, FallsBackWhenTheRootAppenderItselfFails) {
+    expectInChild("CRIT - report\n",
+                  [] { LogFormat::internal(&rootAppender(), CRIT, "%s", "report"); });
+}
+
+TEST(InternalReportTest, WaitsForItsChannelLikeAnyLogger) {
+    expectInChild("", [] {
+        const RecordedWrites writes;
+        LogFormat::internal(nullptr, WARN, "before");
+        EXPECT_STREQ("Logger", uninitialized_loggers->_channel_name);
+        channelNamedLogger(ERROR, {appender("A1")});
+        LogFormat::internal(nullptr, WARN, "suppressed");
+        LogFormat::internal(nullptr, ERROR, "after");
+        EXPECT_EQ("WARN Logger before\nERROR Logger after\n", writes.text());
+        EXPECT_EQ((Written{&rootAppender(), appender("A1")}), writes.appenders());
+    });
+}
+
+TEST(InternalReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
+    expectInChild("", [] {
+        channelNamedLogger(DEBUG, {appender("A1")});
+        const RecordedWrites writes;
+        LogFormat::internal(nullptr, DEBUG, "report");
+        EXPECT_EQ("DEBUG Logger report\n", writes.text());
+        EXPECT_EQ(Written{appender("A1")}, writes.appenders());
+    });
+}
+
+TEST(InternalReportTest, SparesTheAppenderThatFailed) {
+    expectInChild("WARN - nobody left\n", [] {
+        LogChannel& channel = channelNamedLogger(INFO, {appender("A1"), appender("A2")});
+        const RecordedWrites writes;
+        LogFormat::internal(appender("A1"), WARN, "one left");
+        EXPECT_EQ(Written{appender("A2")}, writes.appenders());
+        channel._appenders = {appender("A1"), appender("A1")};
+        LogFormat::internal(appender("A1"), WARN, "nobody left");
+        EXPECT_EQ(1u, writes.messages().size());
+    });
+}
+
+TEST(InternalReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
+    expectInChild("", [] {
+        const RecordedWrites writes([](const RecordedWrites::Message&) { errno = EIO; });
+        errno = ENOSPC;
+        LogFormat::internal(nullptr, ERROR, "Error writing to \"%s\": %m", "x");
+        EXPECT_EQ(ENOSPC, errno);
+        EXPECT_EQ(
+            std::string("ERROR Logger Error writing to \"x\": ") + std::strerror(ENOSPC) + '\n',
+            writes.text());
+        LogFormat::internal(nullptr, DEBUG, "suppressed");
+        EXPECT_EQ(ENOSPC, errno);
+    });
+}
+
+TEST(InternalReportTest, DoesNotFormatWhatItSuppresses) {
+    expectInChild("", [] {
+        const ScriptedCalls formats("vsnprintf");
+        LogFormat::internal(nullptr, DEBUG, "%d", 1);
+        EXPECT_EQ(0u, formats.calls());
+    });
+}
+
+TEST(InternalReportTest, FallsBackWhenAnAppenderThrows) {
+    expectInChild("ERROR - report 1\n", [] {
+        const RecordedWrites writes(
+            [](const RecordedWrites::Message&) { throw std::runtime_error("thrown"); });
+        errno = ENOSPC;
+        LogFormat::internal(nullptr, ERROR, "report %d", 1);
+        EXPECT_EQ(ENOSPC, errno);
+        EXPECT_FALSE(report_in_progress(nullptr));
+    });
+}
+
+TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
+    expectInChild("ERROR - report %d\n", [] {
+        ScriptedCalls formats("vsnprintf");
+        formats.give(-1, 20);
+        LogFormat::internal(nullptr, ERROR, "report %d", 1);
+    });
+}
+
+TEST(InternalReportTest, AppendersThatReportEachOthersFailuresEndOnStandardError) {
+    // A1 fails; its report goes to A2, which fails, too; the report of that goes nowhere else.
+    expectInChild("ERROR - A2 failed\n", [] {
+        channelNamedLogger(INFO, {appender("A1"), appender("A2")});
+        const RecordedWrites writes([](const RecordedWrites::Message& message) {
+            EXPECT_TRUE(report_in_progress(appender("A1")));
+            EXPECT_EQ(appender("A2"), message.appender);
+            EXPECT_FALSE(report_in_progress(appender("A2")));
+            LogFormat::internal(appender("A2"), ERROR, "A2 failed");
+        });
+        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
+        EXPECT_EQ("ERROR Logger A1 failed\n", writes.text());
+        EXPECT_FALSE(report_in_progress(appender("A1")));
+        EXPECT_FALSE(report_in_progress(appender("A2")));
+    });
+}
+
+TEST(InternalReportTest, AThirdAppenderHearsOfBothFailures) {
+    expectInChild("", [] {
+        channelNamedLogger(INFO, {appender("A1"), appender("A2"), appender("A3")});
+        const RecordedWrites writes([](const RecordedWrites::Message& message) {
+            if (message.appender == appender("A2")) {
+                LogFormat::internal(appender("A2"), ERROR, "A2 failed");
+            }
+        });
+        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
+        EXPECT_EQ("ERROR Logger A1 failed\nERROR Logger A2 failed\nERROR Logger A1 failed\n",
+                  writes.text());
+        EXPECT_EQ((Written{appender("A2"), appender("A3"), appender("A3")}), writes.appenders());
+    });
+}
+
+TEST(InternalReportTest, IsInProgressOnItsOwnThreadOnly) {
+    expectInChild("", [] {
+        channelNamedLogger(INFO, {appender("A2")});
+        bool here = false;
+        bool elsewhere = true;
+        const RecordedWrites writes([&](const RecordedWrites::Message&) {
+            here = report_in_progress(appender("A1"));
+            std::thread([&] { elsewhere = report_in_progress(appender("A1")); }).join();
+        });
+        EXPECT_FALSE(report_in_progress(appender("A1")));
+        LogFormat::internal(appender("A1"), ERROR, "report");
+        EXPECT_TRUE(here);
+        EXPECT_FALSE(elsewhere);
+        EXPECT_FALSE(report_in_progress(appender("A1")));
+    });
+}
+
+TEST(InternalReportTest, OrdinaryMessagesStillReachAnAppenderWhoseReportIsInProgress) {
+    expectInChild("", [] {
+        channelNamedLogger(INFO, {appender("A2")});
+        LogChannel ordinary;
+        ordinary._appenders = {appender("A1")};
+        Logger logger("name");
+        logger._channel = &ordinary;
+        const RecordedWrites writes([&](const RecordedWrites::Message& message) {
+            if (message.appender == appender("A2")) {
+                logger.info("%s", "ordinary");
+            }
+        });
+        LogFormat::internal(appender("A1"), ERROR, "report");
+        EXPECT_EQ((Written{appender("A2"), appender("A1")}), writes.appenders());
+    });
+}
+
+}  // namespace
