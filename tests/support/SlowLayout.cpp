@@ -1,9 +1,9 @@
 #include "support/SlowLayout.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdio>
 #include <optional>
-#include <regex>
 #include <stdexcept>
 #include <vector>
 
@@ -68,6 +68,30 @@ std::optional<std::string> textOf(char conversion, const std::optional<std::stri
     }
 }
 
+// Takes the leading characters that are among `letters`, at most `limit` of them.
+std::string take(std::string& rest, const char* letters, std::size_t limit = std::string::npos) {
+    const std::size_t run = std::min(rest.find_first_not_of(letters), rest.size());
+    const std::string taken = rest.substr(0, std::min(run, limit));
+    rest.erase(0, taken.size());
+    return taken;
+}
+
+struct Widths {
+    std::string flag;
+    std::string least;
+    std::string most;
+};
+
+Widths takeWidths(std::string& rest) {
+    Widths widths;
+    widths.flag = take(rest, "-0", 1);
+    widths.least = take(rest, "0123456789");
+    if (!take(rest, ".", 1).empty()) {
+        widths.most = take(rest, "0123456789");
+    }
+    return widths;
+}
+
 // Widths stay small enough here that a number of more than nine digits can only mean "no limit".
 std::size_t widthOf(const std::string& digits, std::size_t none) {
     if (digits.empty()) {
@@ -76,36 +100,32 @@ std::size_t widthOf(const std::string& digits, std::size_t none) {
     return digits.size() > 9 ? std::string::npos : std::stoul(digits);
 }
 
-std::string fitted(const std::string& text, const std::smatch& widths) {
-    const std::size_t minw = widthOf(widths[2], 0);
-    const std::size_t maxw = widthOf(widths[4], std::string::npos);
+std::string fitted(const std::string& text, const Widths& widths) {
+    const std::size_t minw = widthOf(widths.least, 0);
+    const std::size_t maxw = widthOf(widths.most, std::string::npos);
     if (text.size() > maxw) {
         return text.substr(0, maxw);
     }
     if (text.size() >= minw) {
         return text;
     }
-    const std::string flag = widths[1];
-    const std::string padding(minw - text.size(), flag == "0" ? '0' : ' ');
-    return flag == "-" ? text + padding : padding + text;
+    const std::string padding(minw - text.size(), widths.flag == "0" ? '0' : ' ');
+    return widths.flag == "-" ? text + padding : padding + text;
 }
 
 }  // namespace
 
 std::string renderSlowly(const std::string& pattern, const SlowLine& line) {
-    static const std::regex widthsBefore("^%([-0]?)([0-9]*)(\\.?)([0-9]*)");
     std::string out;
     std::string rest = pattern;
     while (!rest.empty()) {
-        std::smatch widths;
         if (rest[0] != '%' || rest.compare(0, 2, "%%") == 0) {
             out += rest[0];
             rest.erase(0, rest[0] == '%' ? 2 : 1);
             continue;
         }
-        const std::string conversion = rest;
-        std::regex_search(conversion, widths, widthsBefore);
-        rest = widths.suffix();
+        rest.erase(0, 1);
+        const Widths widths = takeWidths(rest);
         if (rest.empty()) {
             break;
         }

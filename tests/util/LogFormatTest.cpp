@@ -4,9 +4,12 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <cctype>
 #include <ctime>
 #include <string>
+#include <thread>
+#include <vector>
 
 #include "support/LogLine.h"
 #include "support/TimeZone.h"
@@ -251,6 +254,26 @@ TEST(LogFormat, AWholeLine) {
     EXPECT_EQ("02-03-2001 04:05:06.007 INFO  net.Http - hello\n",
               lineOf("%d{%m-%d-%Y %H:%M:%S.%l} %-5p %c - %m%n", stampedAt(net, INFO, STAMP, 7500),
                      "hello"));
+}
+
+TEST(LogFormat, OneLayoutServesManyThreads) {
+    const TimeZone utc("UTC0");
+    const LogFormat layout("%d %-5p %c [%t] %06.3m%n");
+    const std::string expected = "2001-02-03 04:05:06,007 WARN  net.Http [Main Thread] 0000ab\n";
+    std::atomic<int> wrong = 0;
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 8; ++i) {
+        threads.emplace_back([&] {
+            const LogMsgMetadata mdata = stampedAt(net, WARN, STAMP, 7500);
+            for (int line = 0; line < 500; ++line) {
+                wrong += lineOf(layout, mdata, "ab") != expected;
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(0, wrong);
 }
 
 TEST(LogFormatDeathTest, AnUnknownKindIsAsserted) {
