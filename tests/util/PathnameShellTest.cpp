@@ -1,0 +1,241 @@
+#include "util/Pathname.h"
+
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+
+#include <cstdio>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "support/AllStrings.h"
+#include "support/TempDir.h"
+
+namespace {
+
+TEST(PathnameShellTest, QuotesAsLittleAsItsClassesAllow) {
+    const struct {
+        const char *path, *expected;
+    } rows[] = {
+        {"", "\"\""},
+        {"plain", "plain"},
+        {"/a/b-c_d.e,f:g@h%i+j^k", "/a/b-c_d.e,f:g@h%i+j^k"},
+        // A blank alone, or with anything but '"', '$', '\\': double quotes.
+        {"a b", "\"a b\""},
+        {"a\tb", "\"a\tb\""},
+        {"a\nb", "\"a\nb\""},
+        {" ", "\" \""},
+        {"a b;c", "\"a b;c\""},
+        {"it's here", "\"it's here\""},
+        // '"', '$', '\\' without a single quote: single quotes, and nothing escaped.
+        {"a$b", "'a$b'"},
+        {"a\\b", "'a\\b'"},
+        {"say \"hi\"", "'say \"hi\"'"},
+        {"$x y", "'$x y'"},
+        {"$x;y", "'$x;y'"},
+        // Specials and single quotes without a blank: backslashes.
+        {"a;b", "a\\;b"},
+        {"#&*;=?[]|", "\\#\\&\\*\\;\\=\\?\\[\\]\\|"},
+        {"'", "\\'"},
+        {"it's", "it\\'s"},
+        {"it's;", "it\\'s\\;"},
+        {"'$", "\\'\\$"},
+        {"'\"\\;", "\\'\\\"\\\\\\;"},
+        // All of them: double quotes, and backslashes where they still matter.
+        {"it's $x", "\"it's \\$x\""},
+        {"' \"\\$;", "\"' \\\"\\\\\\$;\""},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(row.expected, Pathname(row.path).shellQuoted()) << row.path;
+    }
+}
+
+TEST(PathnameShellTest, LeavesOtherShellCharactersBare) {
+    for (const char* path : {"(", ")", "<", ">", "`", "~", "!", "{", "}", "`a`(b)<c>~d!{e}\r\v"}) {
+        EXPECT_EQ(path, Pathname(path).shellQuoted());
+    }
+}
+
+TEST(PathnameShellTest, SplitsOneWordOffALine) {
+    const struct {
+        const char *line, *word, *rest;
+    } rows[] = {
+        {"  'a b'  c", "a b", "  c"},
+        {"a", "a", ""},
+        {"a b c", "a", " b c"},
+        {"\t\n a\tb", "a", "\tb"},
+        {"a\nb", "a", "\nb"},
+        {"a ", "a", " "},
+        {"\"a b\" c", "a b", " c"},
+        {"a'b c'd\"e f\"g h", "ab cde fg", " h"},
+        {"a\\ b c", "a b", " c"},
+        {"\\a\\\\b", "a\\b", ""},
+        {"'a\\'b", "a\\b", ""},
+        {"'\"' x", "\"", " x"},
+        {"\"'\" x", "'", " x"},
+        {"\\' x", "'", " x"},
+        {"\\\" x", "\"", " x"},
+        {"\\\n x", "\n", " x"},
+        // Within double quotes a backslash escapes any character, not only the shell's few.
+        {"\"\\a\\$\\\"\\n\"", "a$\"n", ""},
+        {"''a", "a", ""},
+        {"\"\"a''", "a", ""},
+        {"$x;y&z", "$x;y&z", ""},
+        {"\va", "\va", ""},
+    };
+    for (const auto& row : rows) {
+        Pathname word("before");
+        std::string rest = "before";
+        EXPECT_TRUE(Pathname::splitArgShellQuoted(row.line, word, rest)) << row.line;
+        EXPECT_EQ(row.word, word) << row.line;
+        EXPECT_EQ(row.rest, rest) << row.line;
+    }
+}
+
+TEST(PathnameShellTest, FindsNoWordInAnEmptyOrUnfinishedLine) {
+    for (const char* line : {"", " ", "\t\n ", "''", "\"\"", "  ''  a", "\"\" a", "\"a", "'a",
+                             "a'b c", "\"a\\\"", "\\", "a\\", "\"a\\"}) {
+        Pathname word("before");
+        std::string rest = "before";
+        EXPECT_FALSE(Pathname::splitArgShellQuoted(line, word, rest)) << line;
+        EXPECT_EQ("before", rest) << line;
+    }
+}
+
+TEST(PathnameShellTest, OnlyTheFirstWordMustBeComplete) {
+    Pathname word;
+    std::string rest;
+    EXPECT_TRUE(Pathname::splitArgShellQuoted("a \"b", word, rest));
+    EXPECT_EQ("a", word);
+    EXPECT_EQ(" \"b", rest);
+}
+
+TEST(PathnameShellTest, TakesALineApartWordByWordInPlace) {
+    std::string line = " one 'two 2' \"thr\\\"ee\" fo\\ ur ";
+    std::vector<std::string> words;
+    Pathname word;
+    while (Pathname::splitArgShellQuoted(line, word, line)) {
+        words.push_back(word);
+    }
+    EXPECT_EQ((std::vector<std::string>{"one", "two 2", "thr\"ee", "fo ur"}), words);
+    EXPECT_EQ(" ", line);
+}
+
+TEST(PathnameShellTest, TheWordMayReplaceItsOwnLine) {
+    Pathname line("'a b' c");
+    std::string rest;
+    EXPECT_TRUE(Pathname::splitArgShellQuoted(line, line, rest));
+    EXPECT_EQ("a b", line);
+    EXPECT_EQ(" c", rest);
+}
+
+// One character at a time, a branch for each state.
+bool splitSlowly(const std::string& input, std::string& word, std::string& rest) {
+    word.clear();
+    std::string line = input;
+    while (!line.empty() && (line[0] == ' ' || line[0] == '\t' || line[0] == '\n')) {
+        line.erase(0, 1);
+    }
+    char quote = 0;
+    bool saw_backslash = false;
+    while (!line.empty()) {
+        const char c = line[0];
+        if (saw_backslash) {
+            word += c;
+            saw_backslash = false;
+        } else if (quote == 0) {
+            if (c == ' ' || c == '\t' || c == '\n') {
+                break;
+            }
+            if (c == '\'' || c == '"') {
+                quote = c;
+            } else if (c == '\\') {
+                saw_backslash = true;
+            } else {
+                word += c;
+            }
+        } else if (c == quote) {
+            quote = 0;
+        } else if (c == '\\' && quote == '"') {
+            saw_backslash = true;
+        } else {
+            word += c;
+        }
+        line.erase(0, 1);
+    }
+    if (quote != 0 || saw_backslash || word.empty()) {
+        return false;
+    }
+    rest = line;
+    return true;
+}
+
+TEST(PathnameShellTest, SplitsEveryShortLineAsTheSlowVersion) {
+    const std::size_t compared = forEachString("a \\\"'", 7, [](const std::string& line) {
+        Pathname word("before");
+        std::string rest = "before", slowWord, slowRest = "before";
+        const bool found = Pathname::splitArgShellQuoted(line, word, rest);
+        ASSERT_EQ(splitSlowly(line, slowWord, slowRest), found) << line;
+        ASSERT_EQ(slowWord, word) << line;
+        ASSERT_EQ(slowRest, rest) << line;
+    });
+    EXPECT_EQ(97656u, compared);
+}
+
+// A quoted path with another word behind it comes back; the empty one counts as no word.
+void expectRoundTrip(const std::string& text) {
+    const Pathname path(text);
+    Pathname word;
+    std::string rest = "before";
+    const bool found = Pathname::splitArgShellQuoted(path.shellQuoted() + " next", word, rest);
+    ASSERT_EQ(!text.empty(), found) << text;
+    ASSERT_EQ(text, word);
+    ASSERT_EQ(text.empty() ? "before" : " next", rest) << text;
+}
+
+TEST(PathnameShellTest, QuotedPathsComeBackFromTheSplit) {
+    for (int c = 0; c <= 255; ++c) {
+        expectRoundTrip(std::string(1, static_cast<char>(c)));
+    }
+    // A letter, and two of each class.
+    EXPECT_EQ(299593u, forEachString("a \n\"$\\;'", 6, expectRoundTrip));
+
+    constexpr unsigned seed = 20240608;
+    SCOPED_TRACE(seed);
+    std::mt19937 random(seed);
+    for (int i = 0; i < 20000; ++i) {
+        std::string text(random() % 40, '\0');
+        for (char& c : text) {
+            c = static_cast<char>(random());
+        }
+        expectRoundTrip(text);
+    }
+}
+
+// What the shell makes of words: each followed by a NUL.
+std::string throughShell(const std::string& words) {
+    const TempDir dir;
+    writeFile(dir.file("words.sh"), "printf '%s\\0' " + words + '\n');
+    std::FILE* const shell = ::popen(("/bin/sh " + dir.file("words.sh")).c_str(), "r");
+    if (shell == nullptr) {
+        return "no shell";
+    }
+    std::string output;
+    for (int c = std::getc(shell); c != EOF; c = std::getc(shell)) {
+        output += static_cast<char>(c);
+    }
+    EXPECT_EQ(0, ::pclose(shell));
+    return output;
+}
+
+TEST(PathnameShellTest, TheShellReadsQuotedPathsAsTheyAre) {
+    std::string words, expected;
+    const auto add = [&](const std::string& text) {
+        words += Pathname(text).shellQuoted() + ' ';
+        expected += text + '\0';
+    };
+    EXPECT_EQ(8421u, forEachString("a/.- \t\n\"$\\#&*;=?[]|'", 3, add));
+    EXPECT_EQ(expected, throughShell(words));
+}
+
+}  // namespace
