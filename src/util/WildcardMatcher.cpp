@@ -1,1 +1,265 @@
+#include "util/WildcardMatcher.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <list>
+#include <memory>
+#include <mutex>
+#include <stdexcept>
+
 #include "util/Assert.h"
+#include "util/DCUtils.h"
+
+namespace {
+
+using CharArray = std::unique_ptr<char[]>;
+
+struct RetiredCopies {
+    char* needle;
+    char* buffer;
+};
+
+// Keeps the pattern copies that an assignment left behind reachable until the process ends.
+void retire(std::list<RetiredCopies>& copies) {
+    static std::mutex guard;
+    static auto& retired = *new std::list<RetiredCopies>;
+    const std::lock_guard<std::mutex> lock(guard);
+    retired.splice(retired.end(), copies);
+}
+
+int countSegments(const char* pattern) {
+    int count = 0;
+    bool atStart = true;
+    for (; *pattern != '\0'; ++pattern) {
+        const bool star = *pattern == '*';
+        if (!star && atStart) {
+            ++count;
+        }
+        atStart = star;
+    }
+    return count;
+}
+
+// Returns: the place behind `segment` at the beginning of `text`; null if it does not begin so.
+const char* skipPrefix(const char* text, const char* segment) {
+    if (segment == nullptr) {
+        return nullptr;
+    }
+    const std::size_t length = std::strlen(segment);
+    return std::strncmp(text, segment, length) == 0 ? text + length : nullptr;
+}
+
+// Returns: the first occurrence of `segment` at or after `cursor`; null if there is none.
+const char* findSegment(const char* cursor, const char* segment) {
+    return segment == nullptr ? nullptr : std::strstr(cursor, segment);
+}
+
+const char* printable(const char* segment) {
+    return segment == nullptr ? "(null)" : segment;
+}
+
+}  // namespace
+
+WildcardMatcher::WildcardMatcher(const char* pattern)
+    : _needle(nullptr),
+      _buffer(nullptr),
+      _hardEnd(false),
+      _hardStart(false),
+      _subStringCount(0),
+      _isWord(0) {
+    init(pattern);
+}
+
+WildcardMatcher::WildcardMatcher(const WildcardMatcher& other) : WildcardMatcher(other._needle) {}
+
+WildcardMatcher::WildcardMatcher(WildcardMatcher&& other) noexcept
+    : _needle(other._needle),
+      _buffer(other._buffer),
+      _hardEnd(other._hardEnd),
+      _hardStart(other._hardStart),
+      _subStringCount(other._subStringCount),
+      _isWord(other._isWord) {
+    std::copy_n(other._subStrings, MAX_SUBSTRINGS, _subStrings);
+    other._needle = nullptr;
+    other._buffer = nullptr;
+    other._hardEnd = false;
+    other._hardStart = false;
+    std::fill_n(other._subStrings, MAX_SUBSTRINGS, nullptr);
+    other._subStringCount = 0;
+    other._isWord = 0;
+}
+
+WildcardMatcher& WildcardMatcher::operator=(const WildcardMatcher& other) {
+    if (this != &other) {
+        init(other._needle);
+    }
+    return *this;
+}
+
+WildcardMatcher::~WildcardMatcher() {
+    delete[] _buffer;
+    delete[] _needle;
+}
+
+// Everything that can fail comes first, so that a refusal leaves the object as it was.
+void WildcardMatcher::init(const char* pattern) {
+    if (pattern != nullptr && _subStringCount + countSegments(pattern) > MAX_SUBSTRINGS) {
+        throw std::length_error("WildcardMatcher: too many literal segments in a pattern");
+    }
+    CharArray needle(copystr(pattern));
+    CharArray buffer(copystr(pattern));
+    if (_needle != nullptr) {
+        std::list<RetiredCopies> copies{{_needle, _buffer}};
+        retire(copies);
+    }
+    _needle = needle.release();
+    _buffer = buffer.release();
+    std::fill_n(_subStrings, MAX_SUBSTRINGS, nullptr);
+    if (pattern != nullptr && *pattern != '\0') {
+        compile();
+    }
+}
+
+// Cuts _buffer into segments, behind those that are already counted.
+void WildcardMatcher::compile() {
+    bool atSegmentStart = true;
+    for (char* p = _buffer; *p != '\0'; ++p) {
+        if (*p == '*') {
+            *p = '\0';
+            atSegmentStart = true;
+        } else if (atSegmentStart) {
+            _hardStart = _hardStart || p == _buffer;
+            _subStrings[_subStringCount++] = p;
+            atSegmentStart = false;
+        }
+    }
+    if (!atSegmentStart) {
+        _hardEnd = true;
+        if (_subStringCount == 1 && _hardStart) {
+            _isWord = 1;
+        }
+    }
+}
+
+bool WildcardMatcher::isMatch(const char* haystack) const {
+    QUELTA_ASSERT(haystack != NULL);
+    if (_isWord != 0) {
+        return _subStrings[0] != nullptr && std::strcmp(haystack, _subStrings[0]) == 0;
+    }
+    const char* cursor = haystack;
+    int i = 0;
+    if (_hardStart) {
+        cursor = skipPrefix(cursor, _subStrings[i++]);
+        if (cursor == nullptr) {
+            return false;
+        }
+    }
+    for (const int limit = _subStringCount - (_hardEnd ? 1 : 0); i < limit; ++i) {
+        cursor = findSegment(cursor, _subStrings[i]);
+        if (cursor == nullptr) {
+            return false;
+        }
+        cursor += std::strlen(_subStrings[i]);
+    }
+    if (!_hardEnd) {
+        return true;
+    }
+    const char* const end = _subStrings[_subStringCount - 1];
+    do {
+        cursor = findSegment(cursor, end);
+        if (cursor == nullptr) {
+            return false;
+        }
+        cursor += std::strlen(end);
+    } while (*cursor != '\0');
+    return true;
+}
+
+bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& substrs) {
+    QUELTA_ASSERT(haystack != NULL);
+    substrs.clear();
+    if (_isWord != 0) {
+        return _subStrings[0] != nullptr && std::strcmp(haystack, _subStrings[0]) == 0;
+    }
+    const char* cursor = haystack;
+    int i = 0;
+    bool matched = true;
+    if (_hardStart) {
+        const char* const behind = skipPrefix(cursor, _subStrings[i++]);
+        matched = behind != nullptr;
+        cursor = matched ? behind : cursor;
+    }
+    // Puts the text in front of the next occurrence on record and moves behind it.
+    const auto advance = [&](const char* segment) {
+        const char* const found = findSegment(cursor, segment);
+        if (found == nullptr) {
+            return false;
+        }
+        substrs.emplace_back(cursor, found);
+        cursor = found + std::strlen(segment);
+        return true;
+    };
+    const int limit = _subStringCount - (_hardEnd ? 1 : 0);
+    while (matched && i < limit) {
+        matched = advance(_subStrings[i++]);
+    }
+    if (!_hardEnd) {
+        substrs.emplace_back(cursor);
+        return matched;
+    }
+    do {
+        matched = matched && advance(_subStrings[_subStringCount - 1]);
+    } while (matched && *cursor != '\0');
+    return matched;
+}
+
+const char* WildcardMatcher::getPatternPrefix() const {
+    return _hardStart && _subStrings[0] != nullptr ? _subStrings[0] : "";
+}
+
+// Deliberate: the kinds that ask for a count of zero together with a hard flag never arise from a
+// compiled pattern; every pattern with a letter and a star is a MULTIFIX_MATCHER.
+WildcardMatcher::MatchType WildcardMatcher::getMatcherType() const {
+    if (_isWord != 0) {
+        return SINGLE_WORD_MATCHER;
+    }
+    if (!_hardEnd && _hardStart && _subStringCount == 0) {
+        return PREFIX_MATCHER;
+    }
+    if (_hardEnd && _hardStart && _subStringCount == 0) {
+        return MIDFIX_MATCHER;
+    }
+    if (_hardEnd && !_hardStart && _subStringCount == 0) {
+        return POSTFIX_MATCHER;
+    }
+    return _subStringCount > 0 ? MULTIFIX_MATCHER : ERROR_MATCHER;
+}
+
+char* WildcardMatcher::getHardStart() const {
+    return _hardStart ? _subStrings[0] : nullptr;
+}
+
+char* WildcardMatcher::getHardEnd() const {
+    return _hardEnd ? _subStrings[_subStringCount - 1] : nullptr;
+}
+
+char* WildcardMatcher::getWord() const {
+    return _isWord != 0 ? _subStrings[0] : nullptr;
+}
+
+void WildcardMatcher::debugOpaqueMatcher() const {
+    if (_isWord != 0) {
+        std::printf("Single word = %s\n", printable(_subStrings[0]));
+        return;
+    }
+    if (_hardStart) {
+        std::printf("hard start = %s\n", printable(_subStrings[0]));
+    }
+    for (int i = _hardStart ? 1 : 0; i < _subStringCount - (_hardEnd ? 1 : 0); ++i) {
+        std::printf("substring %d = %s\n", i, printable(_subStrings[i]));
+    }
+    if (_hardEnd) {
+        std::printf("hard end = %s\n", printable(_subStrings[_subStringCount - 1]));
+    }
+}

@@ -1,0 +1,250 @@
+#ifndef QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RETE_H_
+#define QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RETE_H_
+
+// The rule network: named conditions, terms or `*` patterns, feed boolean operators; an operator
+// that has all the matches it needs fires and puts its implications into the caller's set, and
+// takes them out again when it has not.
+//
+// Make operators on the heap, hand them over with addCondition, then resetAll, then setCondition
+// and resetCondition for each term. A term meets the literal condition of that name and all pattern
+// conditions that match; the patterns are found through a trie under their literal prefix.
+//
+// A RuleSystem owns its operators and conditions. Operators and conditions only point at each
+// other; operators must not form a cycle. State changes only along what a change touches.
+//
+// Not thread-safe; one thread at a time per object.
+
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "services/pipeline/indexprocessor/BoolOperator.h"
+#include "util/Assert.h"
+#include "util/TrieNode.h"
+#include "util/WildcardMatcher.h"
+
+class Conditional;
+
+using ConditionMap = std::map<std::string, Conditional*>;
+using PrefixTrie = TrieNode<std::pair<WildcardMatcher, Conditional*>>;
+
+// The term that is always set after RuleSystem::resetAll.
+inline const std::string META_ALL = "meta::all";
+
+// A named condition, set or not, and the operators that it feeds.
+class Conditional {
+public:
+    // Makes a condition that is not set and feeds nothing.
+    explicit Conditional(const std::string& name) : _name(name), _setValue(false) {}
+
+    // Replaces `out` by the name.
+    void getName(std::string& out) { out = _name; }
+
+    // Returns: whether the condition is set.
+    bool isSet() { return _setValue; }
+
+    // Makes the condition feed `op`, which is not owned.
+    void addOperator(BoolOperator& op) { _operators.insert(&op); }
+
+    // Sets or resets the condition: a change is counted by its operators, and all of them are
+    // updated whether there was a change or not.
+    void set(StringSet& implications) { changeState(true, implications); }
+    void reset(StringSet& implications) { changeState(false, implications); }
+
+    // Returns: name, state and number of operators, like "name = set (2 operators)".
+    std::string toString() const;
+
+private:
+    void changeState(bool newState, StringSet& implications);
+
+    std::string _name;  // the term, or the whole pattern
+    bool _setValue;
+    OpSet _operators;  // not owned
+};
+
+// The network as a whole.
+class RuleSystem {
+public:
+    // The candidates of a lookup: pointers into the trie, valid until a condition is added.
+    using Candidates = std::vector<std::pair<WildcardMatcher, Conditional*>*>;
+
+    RuleSystem() = default;
+
+    // Requires: `other` holds no operator, as operators cannot be copied; asserted.
+    RuleSystem(const RuleSystem& other);
+    RuleSystem& operator=(const RuleSystem&) = delete;
+
+    ~RuleSystem() { clearRules(); }
+
+    // Takes ownership of `op`, made with new. Doing so twice is the same as once.
+    void addOperator(BoolOperator& op) { _allOperators.insert(&op); }
+
+    // Makes the condition `keyword` feed `op`, and takes ownership of `op`. A keyword with a `*`
+    // is a pattern, and a candidate once for each time it is added.
+    // Deliberate: each call raises the need, also for an operator that the condition feeds already
+    // and for a condition that is set already; neither is counted before the next set.
+    // Errors: std::length_error for a pattern with more than WildcardMatcher::MAX_SUBSTRINGS
+    // segments, before anything has changed. std::bad_alloc: what was done is kept, nothing
+    // dangles; `op` is owned if it had been recorded by then, so who must know calls addOperator
+    // first.
+    void addCondition(const std::string& keyword, BoolOperator& op);
+
+    // Sets the condition named `term` and all pattern conditions that match it.
+    // `wildcardMatches` is replaced by the candidates, matching or not.
+    // Returns: whether the term met any condition.
+    bool setCondition(const std::string& term, Candidates& wildcardMatches,
+                      StringSet& implications) {
+        return changeCondition(true, term, wildcardMatches, implications);
+    }
+
+    // Resets the conditions that setCondition would set.
+    void resetCondition(const std::string& term, Candidates& wildcardMatches,
+                        StringSet& implications) {
+        changeCondition(false, term, wildcardMatches, implications);
+    }
+
+    // Resets all conditions in the order of their names, then sets META_ALL.
+    void resetAll(StringSet& implications);
+
+    // Resets all conditions in the order of their names, and sets nothing.
+    void reset(StringSet& implications);
+
+    // Deletes all conditions and operators; the system is as new. The caller's implications stay.
+    void clearRules();
+
+    // Returns: a line for each condition, then one for each operator.
+    std::string toString();
+
+private:
+    bool changeCondition(bool newState, const std::string& term, Candidates& wildcardMatches,
+                         StringSet& implications);
+    void changeOneCondition(bool newState, Conditional& cond, StringSet& implications);
+
+    OpSet _allOperators;       // owned
+    ConditionMap _conditions;  // by name; owned
+    PrefixTrie _wildcardTrie;  // pattern conditions, under their literal prefix
+    // Deliberate: names that have ever been set; only clearRules takes any out.
+    StringSet _setConditions;
+};
+
+inline void Conditional::changeState(bool newState, StringSet& implications) {
+    if (_setValue != newState) {
+        _setValue = newState;
+        for (BoolOperator* const op : _operators) {
+            if (newState) {
+                op->incCount();
+            } else {
+                op->decCount();
+            }
+        }
+    }
+    for (BoolOperator* const op : _operators) {
+        op->update(implications);
+    }
+}
+
+inline std::string Conditional::toString() const {
+    return _name + (_setValue ? " = set (" : " = unset (") + std::to_string(_operators.size()) +
+           " operators)";
+}
+
+// The assertion reads this object's own field, which has just been copied.
+inline RuleSystem::RuleSystem(const RuleSystem& other) : _allOperators(other._allOperators) {
+    QUELTA_ASSERT(_allOperators.empty());
+}
+
+// A pattern that is refused must change nothing, so it is compiled first. The operator is recorded
+// as owned before anything points at it.
+inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& op) {
+    std::optional<WildcardMatcher> matcher;
+    if (keyword.find('*') != std::string::npos) {
+        matcher.emplace(keyword.c_str());
+    }
+    addOperator(op);
+    auto place = _conditions.find(keyword);
+    if (place == _conditions.end()) {
+        auto fresh = std::make_unique<Conditional>(keyword);
+        fresh->addOperator(op);
+        place = _conditions.emplace(keyword, fresh.get()).first;
+        fresh.release();
+    } else {
+        place->second->addOperator(op);
+    }
+    op.incNeedMatch();
+    if (matcher) {
+        const std::string prefix = matcher->getPatternPrefix();
+        _wildcardTrie.addData(prefix, std::make_pair(std::move(*matcher), place->second));
+    }
+}
+
+inline bool RuleSystem::changeCondition(bool newState, const std::string& term,
+                                        Candidates& wildcardMatches, StringSet& implications) {
+    const std::string text = term;  // the term may be an implication that is about to be erased
+    bool met = false;
+    const auto literal = _conditions.find(text);
+    if (literal != _conditions.end()) {
+        changeOneCondition(newState, *literal->second, implications);
+        met = true;
+    }
+    _wildcardTrie.findData(text, wildcardMatches);
+    for (const auto* const candidate : wildcardMatches) {
+        if (candidate->first.isMatch(text.c_str())) {
+            changeOneCondition(newState, *candidate->second, implications);
+            met = true;
+        }
+    }
+    return met;
+}
+
+inline void RuleSystem::changeOneCondition(bool newState, Conditional& cond,
+                                           StringSet& implications) {
+    if (!newState) {
+        cond.reset(implications);
+        return;
+    }
+    cond.set(implications);
+    std::string name;
+    cond.getName(name);
+    _setConditions.insert(std::move(name));
+}
+
+inline void RuleSystem::reset(StringSet& implications) {
+    for (const auto& [name, cond] : _conditions) {
+        changeOneCondition(false, *cond, implications);
+    }
+}
+
+inline void RuleSystem::resetAll(StringSet& implications) {
+    reset(implications);
+    Candidates wildcardMatches;
+    setCondition(META_ALL, wildcardMatches, implications);
+}
+
+inline void RuleSystem::clearRules() {
+    for (const auto& [name, cond] : _conditions) {
+        delete cond;
+    }
+    for (BoolOperator* const op : _allOperators) {
+        delete op;
+    }
+    _allOperators.clear();
+    _setConditions.clear();
+    _conditions.clear();
+    _wildcardTrie.clear();
+}
+
+inline std::string RuleSystem::toString() {
+    std::string text;
+    for (const auto& [name, cond] : _conditions) {
+        text += cond->toString() + '\n';
+    }
+    for (const BoolOperator* const op : _allOperators) {
+        text += op->toString() + '\n';
+    }
+    return text;
+}
+
+#endif  // QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RETE_H_

@@ -1,0 +1,591 @@
+#include "services/pipeline/indexprocessor/Rete.h"
+
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "support/SmallStack.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+// A network with its caller's set and scratch space.
+class ReteTest : public testing::Test {
+protected:
+    AndOperator& makeOperator(std::string implication, BoolOperator* parent = nullptr) {
+        auto* const op = new AndOperator(parent, implication);
+        rs.addOperator(*op);
+        return *op;
+    }
+
+    AndOperator& rule(const std::string& keyword, const std::string& implication) {
+        AndOperator& op = makeOperator(implication);
+        rs.addCondition(keyword, op);
+        return op;
+    }
+
+    bool set(const std::string& term) { return rs.setCondition(term, scratch, implied); }
+    void reset(const std::string& term) { rs.resetCondition(term, scratch, implied); }
+
+    RuleSystem rs;
+    StringSet implied;
+    RuleSystem::Candidates scratch;
+};
+
+// Fires while any match is present; counts how often it is asked and destroyed.
+class OrOperator : public BoolOperator {
+public:
+    OrOperator(BoolOperator* parent, std::string& implication, int* destroyed = nullptr)
+        : BoolOperator(parent, implication), _destroyed(destroyed) {}
+    OrOperator(const OrOperator&) = default;
+    ~OrOperator() override {
+        if (_destroyed != nullptr) {
+            ++*_destroyed;
+        }
+    }
+
+    int asked = 0;
+
+protected:
+    bool shouldFire() override {
+        ++asked;
+        return _matchCount > 0;
+    }
+
+private:
+    int* _destroyed;
+};
+
+TEST_F(ReteTest, HasItsConstants) {
+    EXPECT_STREQ("AND", AND_OPERATOR);
+    EXPECT_EQ("meta::all", META_ALL);
+}
+
+TEST_F(ReteTest, ANewOperatorNeedsNothingAndHasNotFired) {
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    EXPECT_EQ(0, op._needMatch);
+    EXPECT_EQ(0, op._matchCount);
+    EXPECT_FALSE(op._fired);
+    EXPECT_FALSE(op.hasFired());
+    EXPECT_THAT(op._implications, ElementsAre("i"));
+    EXPECT_THAT(op._children, IsEmpty());
+    EXPECT_EQ(AND_OPERATOR, op._type);
+    OrOperator plain(nullptr, implication);
+    EXPECT_EQ(nullptr, plain._type);
+}
+
+TEST_F(ReteTest, CountsStayBetweenNoneAndTheNeed) {
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    op.incCount();
+    EXPECT_EQ(0, op._matchCount);
+    op.incNeedMatch();
+    op.incNeedMatch();
+    for (const int expected : {1, 2, 2}) {
+        op.incCount();
+        EXPECT_EQ(expected, op._matchCount);
+    }
+    for (const int expected : {1, 0, 0}) {
+        op.decCount();
+        EXPECT_EQ(expected, op._matchCount);
+    }
+}
+
+TEST_F(ReteTest, AnAndOperatorWithoutNeedsFiresOnItsFirstUpdate) {
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    EXPECT_TRUE(op.shouldFire());
+    EXPECT_TRUE(op.update(implied));
+    EXPECT_TRUE(op.hasFired());
+    EXPECT_THAT(implied, ElementsAre("i"));
+    EXPECT_FALSE(op.update(implied));
+}
+
+TEST_F(ReteTest, AddMatchRetractMatchAndResetCountAndUpdate) {
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    op.incNeedMatch();
+    op.incNeedMatch();
+    EXPECT_FALSE(op.addMatch(implied));
+    EXPECT_TRUE(op.addMatch(implied));
+    EXPECT_THAT(implied, ElementsAre("i"));
+    EXPECT_TRUE(op.retractMatch(implied));
+    EXPECT_THAT(implied, IsEmpty());
+    EXPECT_TRUE(op.addMatch(implied));
+    EXPECT_TRUE(op.reset(implied));
+    EXPECT_EQ(0, op._matchCount);
+    EXPECT_THAT(implied, IsEmpty());
+    EXPECT_FALSE(op.reset(implied));
+}
+
+TEST_F(ReteTest, FiringImpliesAllStringsOnce) {
+    AndOperator& op = rule("a", "i");
+    op.addImplication("j");
+    op.addImplication("i");
+    EXPECT_TRUE(set("a"));
+    EXPECT_THAT(implied, ElementsAre("i", "j"));
+    reset("a");
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, OneConditionFiresAndUnfires) {
+    AndOperator& op = rule("a", "i");
+    EXPECT_EQ(1, op._needMatch);
+    EXPECT_TRUE(set("a"));
+    EXPECT_TRUE(op.hasFired());
+    EXPECT_THAT(implied, ElementsAre("i"));
+    reset("a");
+    EXPECT_FALSE(op.hasFired());
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, AndNeedsAllItsConditions) {
+    AndOperator& op = rule("a", "i");
+    rs.addCondition("b", op);
+    set("a");
+    EXPECT_THAT(implied, IsEmpty());
+    set("b");
+    EXPECT_THAT(implied, ElementsAre("i"));
+    reset("a");
+    EXPECT_THAT(implied, IsEmpty());
+    set("a");
+    EXPECT_THAT(implied, ElementsAre("i"));
+    reset("b");
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, SettingTwiceAndResettingUnsetConditionsCountOnce) {
+    AndOperator& op = rule("a", "i");
+    rs.addCondition("b", op);
+    set("a");
+    set("a");
+    EXPECT_EQ(1, op._matchCount);
+    reset("b");
+    EXPECT_EQ(1, op._matchCount);
+    reset("a");
+    reset("a");
+    EXPECT_EQ(0, op._matchCount);
+}
+
+TEST_F(ReteTest, UpdatesOperatorsEvenWhenNothingChanged) {
+    std::string implication = "i";
+    auto* const op = new OrOperator(nullptr, implication);
+    rs.addCondition("a", *op);
+    reset("a");
+    EXPECT_EQ(1, op->asked);
+    set("a");
+    set("a");
+    EXPECT_EQ(3, op->asked);
+    EXPECT_THAT(implied, ElementsAre("i"));
+}
+
+// A set that already fires does not put back what the caller took out.
+TEST_F(ReteTest, SettingAgainDoesNotFireAgain) {
+    rule("a", "i");
+    set("a");
+    implied.clear();
+    set("a");
+    EXPECT_THAT(implied, IsEmpty());
+    reset("a");
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, AConditionThatIsSetAlreadyCountsOnlyAfterResetAndSet) {
+    AndOperator& first = rule("a", "i");
+    set("a");
+    AndOperator& op = makeOperator("j");
+    rs.addCondition("a", op);
+    EXPECT_EQ(0, op._matchCount);
+    set("a");
+    EXPECT_EQ(0, op._matchCount);
+    EXPECT_THAT(implied, ElementsAre("i"));
+    reset("a");
+    set("a");
+    EXPECT_EQ(1, op._matchCount);
+    EXPECT_THAT(implied, ElementsAre("i", "j"));
+    EXPECT_TRUE(first.hasFired());
+}
+
+// Deliberate: a reset is counted by all operators of the condition, the set was not by those that
+// came later; such an operator loses a match that another condition gave.
+TEST_F(ReteTest, AConditionThatWasSetBeforeRegistrationTakesAMatchWithIt) {
+    rule("a", "i");
+    AndOperator& op = rule("b", "j");
+    set("a");
+    set("b");
+    rs.addCondition("a", op);
+    EXPECT_EQ(1, op._matchCount);
+    reset("a");
+    EXPECT_EQ(0, op._matchCount);
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+// Deliberate: the need counts registrations, the match counts conditions.
+TEST_F(ReteTest, RegisteringTwiceOnOneConditionNeedsTwoMatches) {
+    AndOperator& op = rule("a", "i");
+    rs.addCondition("a", op);
+    EXPECT_EQ(2, op._needMatch);
+    EXPECT_EQ(1u, rs._conditions.at("a")->_operators.size());
+    set("a");
+    EXPECT_EQ(1, op._matchCount);
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, LiteralsLiveInTheMapAlonePatternsInTheTrieToo) {
+    AndOperator& op = rule("abc", "i");
+    rs.addCondition("ab*c", op);
+    rs.addCondition("*x", op);
+    EXPECT_EQ(3u, rs._conditions.size());
+    ASSERT_EQ(1u, rs._wildcardTrie._dataList.size());
+    EXPECT_STREQ("*x", rs._wildcardTrie._dataList[0].first.getOrigPattern());
+    EXPECT_EQ(rs._conditions.at("*x"), rs._wildcardTrie._dataList[0].second);
+    const auto* const a = rs._wildcardTrie._children[int{'a'}];
+    ASSERT_NE(nullptr, a);
+    EXPECT_TRUE(a->_dataList.empty());
+    const auto* const b = a->_children[int{'b'}];
+    ASSERT_NE(nullptr, b);
+    ASSERT_EQ(1u, b->_dataList.size());
+    EXPECT_STREQ("ab*c", b->_dataList[0].first.getOrigPattern());
+    EXPECT_EQ(nullptr, b->_children[int{'c'}]);
+    EXPECT_THAT(rs._allOperators, ElementsAre(&op));
+    EXPECT_EQ(3, op._needMatch);
+}
+
+TEST_F(ReteTest, ATermMeetsOnlyPatternsWhosePrefixItBeginsWith) {
+    for (const char* const pattern : {"*z", "a*", "ab*", "abc*", "b*", "ab*z", "*"}) {
+        rule(pattern, pattern);
+    }
+    EXPECT_TRUE(set("abx"));
+    std::vector<std::string> candidates;
+    for (const auto* const candidate : scratch) {
+        candidates.push_back(candidate->first.getOrigPattern());
+    }
+    EXPECT_THAT(candidates, ElementsAre("*z", "*", "a*", "ab*", "ab*z"));
+    EXPECT_THAT(implied, ElementsAre("*", "a*", "ab*"));
+}
+
+TEST_F(ReteTest, AnEmptyTermMeetsThePatternsAtTheRoot) {
+    rule("*", "all");
+    rule("*a", "a");
+    rule("", "empty");
+    EXPECT_TRUE(set(""));
+    EXPECT_THAT(implied, ElementsAre("all", "empty"));
+    EXPECT_EQ(2u, scratch.size());
+}
+
+TEST_F(ReteTest, TellsWhetherATermMetAnything) {
+    rule("a", "i");
+    rule("b*", "j");
+    EXPECT_TRUE(set("a"));
+    EXPECT_TRUE(set("a"));
+    EXPECT_TRUE(set("bx"));
+    EXPECT_FALSE(set("c"));
+    EXPECT_FALSE(set("ab"));
+}
+
+TEST_F(ReteTest, AddingAPatternAgainMakesItACandidateAgain) {
+    AndOperator& op = rule("a*", "i");
+    AndOperator& other = rule("a*", "j");
+    EXPECT_EQ(1u, rs._conditions.size());
+    set("ab");
+    EXPECT_EQ(2u, scratch.size());
+    EXPECT_EQ(scratch[0]->second, scratch[1]->second);
+    EXPECT_EQ(1, op._matchCount);
+    EXPECT_EQ(1, other._matchCount);
+    EXPECT_THAT(implied, ElementsAre("i", "j"));
+}
+
+TEST_F(ReteTest, APatternsOwnTextSetsItThroughItsNameAndAsACandidate) {
+    std::string implication = "i";
+    auto* const op = new OrOperator(nullptr, implication);
+    rs.addCondition("*a", *op);
+    EXPECT_TRUE(set("*a"));
+    EXPECT_EQ(2, op->asked);
+    EXPECT_THAT(implied, ElementsAre("i"));
+}
+
+TEST_F(ReteTest, APatternsOwnTextSetsItEvenIfTheMatcherDoesNotMatch) {
+    rule("*a", "i");
+    // A matcher that was assigned to matches nothing.
+    rs._wildcardTrie._dataList.at(0).first = WildcardMatcher("b");
+    EXPECT_FALSE(set("xa"));
+    EXPECT_TRUE(set("*a"));
+    EXPECT_THAT(implied, ElementsAre("i"));
+}
+
+TEST_F(ReteTest, TermsWithBytesFrom128) {
+    rule("\xe4*\xff", "i");
+    EXPECT_TRUE(set("\xe4\x80\xff"));
+    EXPECT_THAT(implied, ElementsAre("i"));
+    EXPECT_FALSE(set("\xe5\x80\xff"));
+}
+
+// Deliberate: the record of set conditions only grows.
+TEST_F(ReteTest, RemembersEveryNameThatWasEverSet) {
+    rule("a", "i");
+    rule("b*", "j");
+    EXPECT_THAT(rs._setConditions, IsEmpty());
+    set("a");
+    set("bx");
+    EXPECT_THAT(rs._setConditions, ElementsAre("a", "b*"));
+    reset("a");
+    rs.resetAll(implied);
+    EXPECT_THAT(rs._setConditions, ElementsAre("a", "b*"));
+    rs.clearRules();
+    EXPECT_THAT(rs._setConditions, IsEmpty());
+}
+
+TEST_F(ReteTest, ResetAllLeavesNothingImpliedWithoutAMetaRule) {
+    rule("a", "i");
+    rule("b*", "j");
+    set("a");
+    set("bx");
+    rs.resetAll(implied);
+    EXPECT_THAT(implied, IsEmpty());
+    implied.insert("the caller's own");
+    rs.resetAll(implied);
+    EXPECT_THAT(implied, ElementsAre("the caller's own"));
+}
+
+TEST_F(ReteTest, ResetAllSetsTheMetaTerm) {
+    rule("meta::all", "literal");
+    rule("*", "star");
+    rule("meta*", "meta");
+    rule("a", "a");
+    rs.resetAll(implied);
+    EXPECT_THAT(implied, ElementsAre("literal", "meta", "star"));
+    EXPECT_TRUE(rs._conditions.at("meta::all")->isSet());
+    EXPECT_THAT(rs._setConditions, ElementsAre("*", "meta*", "meta::all"));
+}
+
+TEST_F(ReteTest, ResetAllUpdatesOperatorsOfUnsetConditions) {
+    AndOperator& op = makeOperator("always");
+    auto* const condition = new Conditional("a");
+    condition->addOperator(op);
+    rs._conditions["a"] = condition;
+    rs.resetAll(implied);
+    EXPECT_THAT(implied, ElementsAre("always"));
+}
+
+TEST_F(ReteTest, ResetLeavesTheMetaTermUnset) {
+    rule("meta::all", "literal");
+    rule("a", "a");
+    rs.resetAll(implied);
+    set("a");
+    EXPECT_THAT(implied, ElementsAre("a", "literal"));
+    rs.reset(implied);
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, ChildrenCountTheirParentsFiring) {
+    AndOperator& parent = rule("a", "parent");
+    AndOperator& child = makeOperator("child", &parent);
+    EXPECT_EQ(1, child._needMatch);
+    EXPECT_THAT(parent._children, ElementsAre(&child));
+    rs.addCondition("b", child);
+    set("b");
+    EXPECT_THAT(implied, IsEmpty());
+    set("a");
+    EXPECT_THAT(implied, ElementsAre("child", "parent"));
+    EXPECT_EQ(2, child._matchCount);
+    reset("a");
+    EXPECT_THAT(implied, IsEmpty());
+    EXPECT_EQ(1, child._matchCount);
+}
+
+TEST_F(ReteTest, AddChildLeavesTheChildsNeedAlone) {
+    AndOperator& parent = rule("a", "parent");
+    AndOperator& child = makeOperator("child");
+    parent.addChild(child);
+    EXPECT_EQ(0, child._needMatch);
+    set("a");
+    EXPECT_EQ(0, child._matchCount);
+    EXPECT_THAT(implied, ElementsAre("child", "parent"));
+    reset("a");
+    EXPECT_THAT(implied, ElementsAre("child")) << "without a need it goes on firing";
+}
+
+TEST_F(ReteTest, ASharedChildIsUpdatedOncePerPath) {
+    AndOperator& top = rule("a", "top");
+    AndOperator& left = makeOperator("left", &top);
+    AndOperator& right = makeOperator("right", &top);
+    std::string implication = "shared";
+    auto* const shared = new OrOperator(&left, implication);
+    rs.addOperator(*shared);
+    right.addChild(*shared);
+    shared->incNeedMatch();
+    set("a");
+    EXPECT_EQ(2, shared->asked);
+    EXPECT_THAT(implied, ElementsAre("left", "right", "shared", "top"));
+    reset("a");
+    EXPECT_EQ(4, shared->asked);
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+// Deliberate: implications have no owner.
+TEST_F(ReteTest, ASharedImplicationLeavesWithTheFirstThatCeasesToFire) {
+    rule("a", "same");
+    AndOperator& second = rule("b", "same");
+    set("a");
+    set("b");
+    EXPECT_THAT(implied, ElementsAre("same"));
+    reset("a");
+    EXPECT_THAT(implied, IsEmpty());
+    EXPECT_TRUE(second.hasFired());
+}
+
+TEST_F(ReteTest, ATermMayBelongToTheImplicationsItTakesOut) {
+    rule("a", "a");
+    rule("a*", "a pattern on the same term");
+    set("a");
+    ASSERT_EQ(1u, implied.count("a"));
+    reset(*implied.find("a"));
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, ClearRulesDeletesEverythingAndStartsAfresh) {
+    int destroyed = 0;
+    std::string implication = "i";
+    auto* const op = new OrOperator(nullptr, implication, &destroyed);
+    rs.addCondition("a", *op);
+    rs.addCondition("a*", *op);
+    rs.addOperator(*op);
+    set("a");
+    rs.clearRules();
+    EXPECT_EQ(1, destroyed);
+    EXPECT_THAT(rs._allOperators, IsEmpty());
+    EXPECT_TRUE(rs._conditions.empty());
+    EXPECT_TRUE(rs._wildcardTrie._dataList.empty());
+    EXPECT_EQ(nullptr, rs._wildcardTrie._children[int{'a'}]);
+    EXPECT_THAT(implied, ElementsAre("i")) << "the caller's set is the caller's";
+    implied.clear();
+    EXPECT_FALSE(set("a"));
+    EXPECT_THAT(scratch, IsEmpty());
+    AndOperator& fresh = rule("a*", "j");
+    EXPECT_EQ(1, fresh._needMatch);
+    EXPECT_TRUE(set("a"));
+    EXPECT_THAT(implied, ElementsAre("j"));
+}
+
+TEST_F(ReteTest, DestructionDeletesOperatorsThroughTheirDestructor) {
+    int destroyed = 0;
+    std::string implication = "i";
+    {
+        RuleSystem system;
+        system.addCondition("a", *new OrOperator(nullptr, implication, &destroyed));
+        system.addOperator(*new OrOperator(nullptr, implication, &destroyed));
+    }
+    EXPECT_EQ(2, destroyed);
+}
+
+TEST_F(ReteTest, CopiesOfOperatorsAndConditionsStandAlone) {
+    std::string implication = "i";
+    AndOperator child(nullptr, implication);
+    auto original = std::make_unique<AndOperator>(nullptr, implication);
+    original->addChild(child);
+    original->incNeedMatch();
+    AndOperator copy(*original);
+    original.reset();
+    EXPECT_EQ(1, copy._needMatch);
+    EXPECT_EQ(AND_OPERATOR, copy._type);
+    EXPECT_THAT(copy._children, ElementsAre(&child));
+    EXPECT_THAT(copy._implications, ElementsAre("i"));
+    auto condition = std::make_unique<Conditional>("a");
+    condition->addOperator(copy);
+    Conditional second(*condition);
+    condition.reset();
+    second.set(implied);
+    EXPECT_TRUE(second.isSet());
+    EXPECT_THAT(implied, ElementsAre("i"));
+    std::string name = "stale";
+    second.getName(name);
+    EXPECT_EQ("a", name);
+    second.reset(implied);
+    EXPECT_THAT(implied, IsEmpty());
+}
+
+TEST_F(ReteTest, AnEmptySystemMayBeCopied) {
+    RuleSystem copy(rs);
+    rule("a*", "i");
+    std::string implication = "j";
+    copy.addCondition("a", *new AndOperator(nullptr, implication));
+    EXPECT_TRUE(copy.setCondition("a", scratch, implied));
+    EXPECT_THAT(implied, ElementsAre("j"));
+    rs.clearRules();
+    RuleSystem second(rs);
+    EXPECT_FALSE(second.setCondition("a", scratch, implied));
+}
+
+using ReteDeathTest = ReteTest;
+
+TEST_F(ReteDeathTest, CopyingASystemWithOperatorsIsAsserted) {
+    rule("a", "i");
+    EXPECT_DEATH(RuleSystem copy(rs), "failed assertion `_allOperators.empty\\(\\)'");
+}
+
+TEST_F(ReteTest, ARefusedPatternChangesNothing) {
+    std::string pattern = "a";
+    for (int i = 0; i < 256; ++i) {
+        pattern += "*a";
+    }
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    EXPECT_THROW(rs.addCondition(pattern, op), std::length_error);
+    EXPECT_EQ(0, op._needMatch);
+    EXPECT_THAT(rs._allOperators, IsEmpty());
+    EXPECT_TRUE(rs._conditions.empty());
+    EXPECT_EQ(nullptr, rs._wildcardTrie._children[int{'a'}]);
+    EXPECT_TRUE(rs._wildcardTrie._dataList.empty());
+    pattern.erase(0, 1);
+    EXPECT_NO_THROW(rs.addCondition(pattern, *new AndOperator(nullptr, implication)));
+    EXPECT_TRUE(set(std::string(256, 'a')));
+}
+
+TEST_F(ReteTest, PatternsOfStarsAreStoredAndMatchEveryTerm) {
+    rule("***", "i");
+    EXPECT_EQ(WildcardMatcher::ERROR_MATCHER,
+              rs._wildcardTrie._dataList.at(0).first.getMatcherType());
+    EXPECT_TRUE(set("anything"));
+    EXPECT_THAT(implied, ElementsAre("i"));
+}
+
+TEST_F(ReteTest, ChainsOfAHundredThousandOperatorsNeedNoStack) {
+    onSmallStack([this] {
+        constexpr int LENGTH = 100000;
+        AndOperator* last = &rule("a", "0");
+        for (int i = 1; i < LENGTH; ++i) {
+            last = &makeOperator(std::to_string(i), last);
+        }
+        set("a");
+        EXPECT_EQ(static_cast<std::size_t>(LENGTH), implied.size());
+        EXPECT_TRUE(last->hasFired());
+        reset("a");
+        EXPECT_THAT(implied, IsEmpty());
+        EXPECT_FALSE(last->hasFired());
+        rs.clearRules();
+    });
+}
+
+TEST_F(ReteTest, DescribesItself) {
+    AndOperator& op = rule("a", "i");
+    op.addImplication("j");
+    EXPECT_EQ("AND 0/1 idle [i, j]", op.toString());
+    set("a");
+    EXPECT_EQ("AND 1/1 fired [i, j]", op.toString());
+    EXPECT_EQ("a = set (1 operators)", rs._conditions.at("a")->toString());
+    EXPECT_EQ("a = set (1 operators)\nAND 1/1 fired [i, j]\n", rs.toString());
+    reset("a");
+    EXPECT_EQ("a = unset (1 operators)", rs._conditions.at("a")->toString());
+    EXPECT_EQ("", RuleSystem().toString());
+    std::string implication = "k";
+    EXPECT_EQ("operator 0/0 idle [k]", OrOperator(nullptr, implication).toString());
+}
+
+}  // namespace
