@@ -32,7 +32,7 @@ using bench::PatternSetPeer;
 using Entry = bench::PeerEntry<PatternSetPeer>;
 
 // A child that takes longer than this is ended: the peer cannot hold the set.
-constexpr unsigned CHILD_SECONDS = 120;
+constexpr unsigned CHILD_SECONDS = 60;
 
 // What a child sends back.
 struct Outcome {
@@ -228,8 +228,9 @@ Outcome runChild(const Entry& entry, const Case& what) {
     ::waitpid(pid, &status, 0);
     if (!received) {
         const bool late = WIFSIGNALED(status) && WTERMSIG(status) == SIGALRM;
-        std::snprintf(outcome.error, sizeof(outcome.error), "%s",
-                      late ? "not ready after 120 s" : "ended without an answer");
+        const std::string reason = late ? "not done after " + std::to_string(CHILD_SECONDS) + " s"
+                                        : "ended without an answer";
+        std::snprintf(outcome.error, sizeof(outcome.error), "%s", reason.c_str());
     }
     return outcome;
 }
@@ -287,7 +288,7 @@ void add(PatternSet&& set) {
     bench::progress("checking answers for " + set.name);
     const auto what = std::make_shared<Case>(Case{std::move(set), nullptr});
     what->expected = std::make_shared<Expected>(what->set);
-    const bool large = what->set.patterns.size() > 50000;
+    const bool large = what->set.patterns.size() >= 10000;
     for (const Entry& entry : bench::peerList<PatternSetPeer>()) {
         bench::add("set of " + what->set.name, entry.name,
                    [&entry, what](benchmark::State& state) { run(state, entry, *what); })
