@@ -43,7 +43,7 @@ private:
     const bool _locked;
 };
 
-const time_t IDENTITY_CHECK_SECONDS = 5;
+const std::uint64_t IDENTITY_CHECK_SECONDS = 5;
 const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 
 // Every layout ever made for an appender. A layout that an attribute line has replaced may still be
@@ -252,8 +252,10 @@ void LogAppender::writeLine(const std::string& line, time_t now, Failure& failur
 
 // Closes the file when it is not the one of that name any more: moved or deleted by someone else.
 void LogAppender::checkIdentity(time_t now) {
-    const bool clockWentBack = now < _lastCheck;
-    if (!clockWentBack && now - _lastCheck <= IDENTITY_CHECK_SECONDS) {
+    // Unsigned, so that a clock that went back counts as a long time.
+    const std::uint64_t elapsed =
+        static_cast<std::uint64_t>(now) - static_cast<std::uint64_t>(_lastCheck);
+    if (elapsed <= IDENTITY_CHECK_SECONDS) {
         return;
     }
     struct stat status;

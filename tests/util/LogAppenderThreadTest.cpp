@@ -1,0 +1,237 @@
+// Appenders under several threads.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <cstdio>
+#include <filesystem>
+#include <map>
+#include <sstream>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "support/FileAppender.h"
+#include "support/StderrCapture.h"
+#include "support/TempDir.h"
+#include "util/LogChannel.h"
+#include "util/LogInternal.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr unsigned THREADS = 8;
+
+// Runs body(0) ... body(THREADS - 1), each on a thread of its own, all at once.
+template <typename Body>
+void onAllThreads(Body body) {
+    std::atomic<bool> go = false;
+    std::vector<std::thread> threads;
+    for (unsigned t = 0; t < THREADS; ++t) {
+        threads.emplace_back([&, t] {
+            while (!go) {
+                std::this_thread::yield();
+            }
+            body(t);
+        });
+    }
+    go = true;
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+}
+
+// A line that shows when it is torn: its text follows from its numbers.
+std::string numberedLine(unsigned thread, unsigned number) {
+    return std::to_string(thread) + " " + std::to_string(number) + " " +
+           std::string(number * 7 % 90, static_cast<char>('a' + thread)) + ".";
+}
+
+// The generations of a file, oldest first, in one text.
+std::string allGenerations(const std::string& file) {
+    unsigned oldest = 0;
+    while (fs::exists(file + "." + std::to_string(oldest + 1))) {
+        ++oldest;
+    }
+    std::string all;
+    for (; oldest > 0; --oldest) {
+        all += readFile(file + "." + std::to_string(oldest));
+    }
+    return all + readFile(file);
+}
+
+// Each thread's lines, whole, in its own order, none missing and none twice.
+void expectAllLines(const std::string& text, unsigned perThread) {
+    std::vector<unsigned> next(THREADS, 0);
+    std::istringstream in(text);
+    std::string line;
+    while (std::getline(in, line)) {
+        unsigned thread = THREADS;
+        ASSERT_EQ(1, std::sscanf(line.c_str(), "%u", &thread)) << line;
+        ASSERT_LT(thread, THREADS) << line;
+        ASSERT_EQ(numberedLine(thread, next[thread]), line);
+        ++next[thread];
+    }
+    EXPECT_EQ(std::vector<unsigned>(THREADS, perThread), next);
+}
+
+// Binds loggers to channels, once per process.
+LogChannel& channelOfReports() {
+    LogChannel& channel = *LogChannel::find("Logger", true);
+    if (!logger_initialized) {
+        Logger::initialize();
+    }
+    return channel;
+}
+
+}  // namespace
+
+TEST(LogAppenderThreads, noLineIsLostOrTornThroughRotation) {
+    const unsigned LINES = 4000;
+    const TempDir dir;
+    const StderrCapture err;
+    FileAppender log(dir.file("app.log"), 20000, 1000);
+    onAllThreads([&](unsigned thread) {
+        for (unsigned number = 0; number < LINES; ++number) {
+            log.line(numberedLine(thread, number), 1000);
+        }
+    });
+    EXPECT_TRUE(fs::exists(dir.file("app.log.50")));
+    expectAllLines(allGenerations(dir.file("app.log")), LINES);
+    for (const auto& entry : fs::directory_iterator(dir.path())) {
+        EXPECT_LE(entry.file_size(), 20000U + 200U) << entry.path();
+    }
+    EXPECT_EQ("", err.text());
+}
+
+TEST(LogAppenderThreads, noLineIsLostWhileTheFileIsMovedAway) {
+    const unsigned LINES = 2000;
+    const TempDir dir;
+    const std::string file = dir.file("app.log");
+    const StderrCapture err;
+    FileAppender log(file);
+    std::atomic<bool> done = false;
+    unsigned moves = 0;
+    std::thread mover([&] {
+        while (!done) {
+            std::error_code error;  // there may be no such file at the moment
+            fs::rename(file, file + ".moved" + std::to_string(moves), error);
+            moves += error ? 0 : 1;
+            std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        }
+    });
+    std::atomic<long long> clock = 1000;
+    onAllThreads([&](unsigned thread) {
+        for (unsigned number = 0; number < LINES; ++number) {
+            log.line(numberedLine(thread, number), clock += 2);
+        }
+    });
+    done = true;
+    mover.join();
+    std::string all;
+    for (unsigned move = 0; move < moves; ++move) {
+        all += readFile(file + ".moved" + std::to_string(move));
+    }
+    expectAllLines(all + (fs::exists(file) ? readFile(file) : ""), LINES);
+    EXPECT_GT(moves, 0U);
+    EXPECT_EQ("", err.text());
+}
+
+TEST(LogAppenderThreads, twoAppendersOnOneChannelEachGetEveryLine) {
+    const unsigned LINES = 2000;
+    const TempDir dir;
+    FileAppender a(dir.file("a.log"), 20000, 1000);
+    FileAppender b(dir.file("b.log"));
+    LogChannel channel;
+    channel._appenders = {&a, &b};
+    onAllThreads([&](unsigned thread) {
+        for (unsigned number = 0; number < LINES; ++number) {
+            channel.write(stampedAt(1000), numberedLine(thread, number));
+        }
+    });
+    expectAllLines(allGenerations(dir.file("a.log")), LINES);
+    expectAllLines(allGenerations(dir.file("b.log")), LINES);
+}
+
+TEST(LogAppenderThreads, appendersThatAllFailNeitherDeadlockNorRecurse) {
+    const unsigned LINES = 50;
+    const TempDir dir;
+    StderrCapture err;
+    FileAppender a("/dev/full");
+    FileAppender b(dir.file("missing/b.log"));
+    LogChannel& channel = channelOfReports();
+    channel._appenders = {&a, &b};
+    const std::size_t setupReports = err.text().size();
+    onAllThreads([&](unsigned) {
+        for (unsigned number = 0; number < LINES; ++number) {
+            channel.write(stampedAt(1000), "lost");
+        }
+    });
+    channel._appenders.clear();
+
+    // Each appender hands its report to the other, which fails in turn and is the last.
+    const std::string fromA = "CRIT - Error writing to \"/dev/full\": No space left on device";
+    const std::string fromB =
+        "ERROR - Error opening \"" + dir.file("missing/b.log") + "\": No such file or directory";
+    std::map<std::string, unsigned> counts;
+    std::istringstream in(err.text().substr(setupReports));
+    std::string line;
+    while (std::getline(in, line)) {
+        ++counts[line];
+    }
+    EXPECT_EQ((std::map<std::string, unsigned>{{fromA, THREADS * LINES}, {fromB, THREADS * LINES}}),
+              counts);
+    EXPECT_TRUE(a._mutex.tryLock());
+    a._mutex.NOLOG_unlock();
+    EXPECT_TRUE(b._mutex.tryLock());
+    b._mutex.NOLOG_unlock();
+}
+
+TEST(LogAppenderThreads, aFailingAppenderReportsThroughOneThatOthersAreWritingTo) {
+    const unsigned LINES = 500;
+    const TempDir dir;
+    const StderrCapture err;
+    FileAppender failing("/dev/full");
+    FileAppender working(dir.file("working.log"), 5000, 1000);
+    LogChannel& channel = channelOfReports();
+    channel._appenders = {&failing, &working};
+    onAllThreads([&](unsigned) {
+        for (unsigned number = 0; number < LINES; ++number) {
+            channel.write(stampedAt(1000), "line");
+        }
+    });
+    channel._appenders.clear();
+
+    const std::string report = "Error writing to \"/dev/full\": No space left on device";
+    std::map<std::string, unsigned> counts;
+    std::istringstream in(allGenerations(dir.file("working.log")));
+    std::string line;
+    while (std::getline(in, line)) {
+        ++counts[line];
+    }
+    EXPECT_EQ(
+        (std::map<std::string, unsigned>{{"line", THREADS * LINES}, {report, THREADS * LINES}}),
+        counts);
+    EXPECT_EQ("", err.text());
+}
+
+TEST(LogAppenderThreads, theReportTakesNoLockOfTheFailingAppender) {
+    // Two threads whose failing appenders are each other's only listeners.
+    const TempDir dir;
+    const StderrCapture err;
+    FileAppender a("/dev/full");
+    FileAppender b("/dev/full");
+    LogChannel& channel = channelOfReports();
+    channel._appenders = {&a, &b};
+    onAllThreads([&](unsigned thread) {
+        for (unsigned number = 0; number < 200; ++number) {
+            (thread % 2 == 0 ? a : b).line("lost");
+        }
+    });
+    channel._appenders.clear();
+    const std::string text = err.text();
+    EXPECT_EQ(THREADS * 200, std::count(text.begin(), text.end(), '\n'));
+}
