@@ -311,7 +311,7 @@ const bench::Suite suite([] {
     if (!bench::quick()) {
         add(bench::programSet(bench::PROGRAM_DRAWS, bench::PROGRAM_DRAWS));
     }
-    for (const std::size_t size : {1000, 3000, 10000, 30000}) {
+    for (const std::size_t size : {1000U, 3000U, 10000U, 30000U}) {
         if (!bench::quick() || size <= 1000) {
             add(bench::urlSet(size));
         }

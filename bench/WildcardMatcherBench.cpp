@@ -61,7 +61,7 @@ void add(const Single& what) {
 }
 
 const bench::Suite suite([] {
-    for (const std::size_t length : {100, 10000}) {
+    for (const std::size_t length : {100U, 10000U}) {
         const std::string text = line(length);
         const std::string hit = with(text, length - 20, "connection refused");
         add({"middle found", "*connection refused*", hit});
