@@ -75,13 +75,21 @@ void RecursiveMutex::unlock() {
     _owner_mutex.lock();
     QUELTA_ASSERT(_owner_count > 0);
     --_owner_count;
-    const bool free = _owner_count == 0;
-    if (free) {
-        _owner_valid = false;
+    if (_owner_count > 0) {
+        _owner_mutex.unlock();
+        return;
     }
+    _owner_valid = false;
     _owner_mutex.unlock();
-    if (free) {
+    try {
         _mutex.unlock();
+    } catch (...) {
+        // Still held: let the holder try again.
+        _owner_mutex.lock();
+        _owner_valid = true;
+        _owner_count = 1;
+        _owner_mutex.unlock();
+        throw;
     }
 }
 

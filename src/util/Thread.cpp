@@ -78,8 +78,10 @@ void report(LogLevel level, const std::string& text) {
     }
 }
 
-// Whether the calling thread is registered: keeps every other thread away from the registry.
+// Whether the calling thread is registered: keeps every other thread away from the registry. The
+// name is kept beside it, because a thread left running at the end may outlive its object.
 constinit thread_local bool registeredHere = false;
+constinit thread_local const char* nameHere = nullptr;
 
 }  // namespace
 
@@ -144,6 +146,24 @@ Thread::Thread(const char* thrname)
 
 Thread::~Thread() noexcept(false) {
     QUELTA_ASSERT(_did_join || !checkThreadErrors);
+    if (!_did_join && _token != PthreadToken()) {
+        abandon();
+    }
+}
+
+// Sees to it that the thread, which nobody will join, does not use this object any more on our
+// behalf: when it is still in its start handshake, it leaves that and ends.
+void Thread::abandon() {
+    ready_to_run_lock.lock();
+    if (_start == STARTING) {
+        _start = ABANDONED;
+        _ready_to_run_cond.wake_all();
+        while (_start == ABANDONED) {
+            _ready_to_run_cond.wait(ready_to_run_lock);
+        }
+    }
+    ready_to_run_lock.unlock();
+    ::pthread_detach(_token._token);
 }
 
 void Thread::go() {
@@ -178,8 +198,7 @@ Thread* Thread::current() {
 }
 
 const char* Thread::currentName() {
-    const Thread* const thr = current();
-    return thr != nullptr ? thr->_name : MAIN_THREAD_NAME;
+    return registeredHere ? nameHere : MAIN_THREAD_NAME;
 }
 
 void Thread::mainThreadDying() {
@@ -191,12 +210,19 @@ void* Thread::callMain(void* arg) {
     ActiveThreads::add(thr);
 
     ready_to_run_lock.lock();
-    while (!thr->_ready_to_run) {
+    while (!thr->_ready_to_run && thr->_start == STARTING) {
         thr->_ready_to_run_cond.wait(ready_to_run_lock);
+    }
+    const bool abandoned = thr->_start == ABANDONED;
+    thr->_start = STARTED;
+    if (abandoned) {
+        thr->_ready_to_run_cond.wake_all();
     }
     ready_to_run_lock.unlock();
 
-    thr->main();
+    if (!abandoned) {
+        thr->main();
+    }
     return nullptr;
 }
 
@@ -245,6 +271,7 @@ void ActiveThreads::store(Thread* thrptr) {
         leave();
         throw;
     }
+    nameHere = thrptr->name();
     registeredHere = _ptrs->get() == thrptr;
     if (!registeredHere) {
         leave();  // set() failed, and that was to be ignored

@@ -10,8 +10,8 @@
 //     worker.join();
 // go() and join() are allowed once each; the main thread counts as running and joined.
 //
-// Invariant: `_ready_to_run` is guarded by the one lock of all start handshakes. A worker reads no
-// other field that its creator writes after starting it until that handshake is over.
+// Invariant: `_ready_to_run` and `_start` are guarded by the one lock of all start handshakes. A
+// worker reads nothing that its creator writes after starting it until that handshake is over.
 // Not thread-safe; one thread at a time per object. The static members are safe from any thread.
 
 #include <cstddef>
@@ -77,7 +77,8 @@ public:
     static const char* currentName();
 
     // From now on failed pthread calls are ignored and unjoined objects may be destroyed: for the
-    // end of the process, when other threads may be left running.
+    // end of the process, when other threads may be left running. A worker that is destroyed
+    // before its thread has begun never runs main().
     static void mainThreadDying();
 
     // The start routine of pthread_create; `arg` is the Thread.
@@ -86,12 +87,17 @@ public:
     static constexpr std::size_t s_stackSize = 1048576;  // bytes, of every new thread
 
 private:
+    enum Start { STARTING, ABANDONED, STARTED };
+
+    void abandon();
+
     PthreadToken _token;  // nobody's when the thread could not be created
     const char* _name;
     bool _did_join;
     bool _ready_to_run;
     ConditionWakeAll _ready_to_run_cond;  // signalled by go()
     JoinHelper _jhelp;
+    Start _start = STARTING;  // of a worker; STARTED: past its handshake
 };
 
 #endif  // QUELTA_UTIL_THREADOBJ_H_
