@@ -102,8 +102,8 @@ public:
     // Returns: true when acquired or already the calling thread's, false when another holds it.
     [[nodiscard]] bool tryLock();
 
-    // Requires: the mutex is held (asserted), by whichever thread: the caller is not compared with
-    // the owner.
+    // Requires: the calling thread holds the mutex. Only that it is held is asserted.
+    // Deliberate: the caller is not compared with the owner; that is left to whoever locks.
     void unlock();
 
     // Debugging aid, without effect.

@@ -1,0 +1,149 @@
+// Locks and threads before main and after it, from a unit that is initialized before the library's
+// and destroyed after it.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <atomic>
+#include <cerrno>
+#include <cstddef>
+#include <cstdlib>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "support/ScriptedPthread.h"
+#include "support/Workers.h"
+#include "util/LogInternal.h"
+#include "util/Thread.h"
+
+namespace {
+
+constexpr int IN_ORDER = 42;
+constexpr int NOT_DESTROYED = 43;
+constexpr int OTHERWISE = 44;
+
+const char* const FAILURE = "Main Thread: about to throw a PthreadException: f: Invalid argument";
+
+std::string failure() {
+    return thrownBy([] { PthreadObject::checkPtRes("f", EINVAL); });
+}
+
+// Decides about the exit status of a child after everything else was destroyed.
+struct Judge {
+    ~Judge() {
+        if (!judging) {
+            return;
+        }
+        const auto at = [this](const pthread_mutex_t* mutex) {
+            return std::find(destroyed.begin(), destroyed.end(), mutex) - destroyed.begin();
+        };
+        const auto none = static_cast<std::ptrdiff_t>(destroyed.size());
+        const auto start = at(startLock);
+        const auto registry = at(&ActiveThreads::_mutex._pthread_mutex);
+        int status = OTHERWISE;
+        if (start < registry && registry < none) {
+            status = IN_ORDER;
+        } else if (start == none && registry == none) {
+            status = NOT_DESTROYED;
+        }
+        // The unit's logger is gone by now.
+        ::_exit(failure() == lastFailure && lastWorkerRan ? status : OTHERWISE);
+    }
+
+    bool judging = false;
+    bool lastWorkerRan = false;
+    std::string lastFailure = FAILURE;
+    const pthread_mutex_t* startLock = nullptr;
+    std::vector<const pthread_mutex_t*> destroyed;
+};
+__attribute__((init_priority(102))) Judge judge;
+
+// Uses everything before the library's statics exist, and a worker after main.
+struct Early {
+    Early() : firstOfAll(uninitialized_loggers == nullptr), name(Thread::currentName()) {
+        Mutex mutex;
+        mutex.lock();
+        mutexWorks = !mutex.tryLock();
+        mutex.unlock();
+        {
+            const StderrCapture err;
+            thrown = failure();
+            printed = err.text();
+        }
+        runWorker("Early", [this] { workerName = Thread::currentName(); });
+        onMutexDestroy = [](const pthread_mutex_t* destroyed) {
+            if (judge.judging) {
+                judge.destroyed.push_back(destroyed);
+            }
+        };
+    }
+    ~Early() {
+        runWorker("Late",
+                  [] { judge.lastWorkerRan = std::string("Late") == Thread::currentName(); });
+    }
+
+    bool firstOfAll;
+    std::string name;
+    bool mutexWorks = false;
+    std::string thrown;
+    std::string printed;
+    std::string workerName;
+};
+__attribute__((init_priority(102))) Early early;
+
+TEST(ThreadStaticsTest, EverythingWorksBeforeTheLibraryIsInitialized) {
+    EXPECT_TRUE(early.firstOfAll);
+    EXPECT_EQ("Main Thread", early.name);
+    EXPECT_TRUE(early.mutexWorks);
+    EXPECT_EQ(FAILURE, early.thrown);
+    EXPECT_EQ(std::string(FAILURE) + "\n", early.printed);
+    EXPECT_EQ("Early", early.workerName);
+}
+
+TEST(ThreadStaticsTest, LocksOutliveStaticObjectsAndAreDestroyedAtExit) {
+    EXPECT_EXIT(
+        {
+            Worker worker("Sorter", [] {});
+            worker.go();
+            judge.startLock = seenByPthread.locked;
+            worker.join();
+            judge.judging = true;
+            std::exit(1);
+        },
+        testing::ExitedWithCode(IN_ORDER), "");
+}
+
+TEST(ThreadStaticsTest, LocksStayForWorkersThatNobodyJoined) {
+    EXPECT_EXIT(
+        {
+            static std::atomic<bool> running{false};
+            mainThread();
+            class Endless : public Thread {
+            public:
+                Endless() : Thread("Endless") {}
+                void main() override {
+                    running = true;
+                    while (running) {
+                        std::this_thread::yield();
+                    }
+                }
+            };
+            auto* const endless = new Endless;
+            endless->go();
+            judge.startLock = seenByPthread.locked;
+            while (!running) {
+                std::this_thread::yield();
+            }
+            Thread::mainThreadDying();
+            delete endless;
+            judge.lastFailure = "";
+            judge.judging = true;
+            std::exit(1);
+        },
+        testing::ExitedWithCode(NOT_DESTROYED), "");
+}
+
+}  // namespace
