@@ -28,5 +28,12 @@ function(quelta_test name)
   endif()
   gtest_discover_tests(${name}
     DISCOVERY_TIMEOUT 60
-    PROPERTIES LABELS "${arg_LABELS}" TIMEOUT ${arg_TIMEOUT})
+    PROPERTIES TIMEOUT ${arg_TIMEOUT})
+  # Set apart: as a property of the discovery the list of labels would fall into pieces.
+  set(labels_file "${CMAKE_CURRENT_BINARY_DIR}/${name}_labels.cmake")
+  file(WRITE "${labels_file}"
+    "foreach(test IN LISTS ${name}_TESTS)\n"
+    "  set_tests_properties(\"\${test}\" PROPERTIES LABELS \"${arg_LABELS}\")\n"
+    "endforeach()\n")
+  set_property(DIRECTORY APPEND PROPERTY TEST_INCLUDE_FILES "${labels_file}")
 endfunction()
