@@ -1,0 +1,139 @@
+#!/usr/bin/env python3
+"""Breaks one operator, constant or comparison of a source at a time and sees whether a test fails.
+
+Usage: mutate.py BUILD_DIR [--sample N] [--seed S] [SOURCE...]
+
+Works in a copy of the tree below BUILD_DIR, never in the tree itself. targets.txt names the test
+programs of each source, equivalents.txt the mutants that no test can tell from the original, with
+the reason. Prints each survivor as path:line: before -> after. Exits with 1 when a mutant survives
+that equivalents.txt does not explain, or when an explained one no longer survives.
+"""
+import argparse
+import pathlib
+import random
+import re
+import subprocess
+import sys
+
+HERE = pathlib.Path(__file__).resolve().parent
+ROOT = HERE.parent.parent
+RUN_SECONDS = 60
+
+# What is replaced by what, where the pattern stands outside of comments, texts and directives.
+MUTATIONS = [
+    (r' == ', ' != '), (r' != ', ' == '),
+    (r' < ', ' <= '), (r' <= ', ' < '), (r' > ', ' >= '), (r' >= ', ' > '),
+    (r' && ', ' || '), (r' \|\| ', ' && '),
+    (r' \+ ', ' - '), (r' - ', ' + '), (r' \* (?=\d)', ' / '), (r' / ', ' * '), (r' % ', ' * '),
+    (r'\+\+', '--'), (r'--', '++'), (r' \+= ', ' -= '), (r' -= ', ' += '),
+    (r'\btrue\b', 'false'), (r'\bfalse\b', 'true'),
+    (r'(?<=[(\s])!(?=[\w(*])', ''),
+    (r'(?<![\w.\'"])(\d+)(?![\w.\'])', lambda m: str(int(m.group(1)) + 1)),
+    (r'^(\s+)(break|continue);', r'\1;'),
+]
+HIDDEN = re.compile(r'//.*|"(?:[^"\\]|\\.)*"|\'(?:[^\'\\]|\\.)*\'')
+SKIPPED = re.compile(r'^\s*(#|//|QUELTA_ASSERT|static_assert|template|using|namespace|case .*:$)')
+
+
+def mutants(path):
+    """Yields (line number, line, mutated line)."""
+    for number, line in enumerate(path.read_text().splitlines()):
+        if SKIPPED.match(line):
+            continue
+        code = HIDDEN.sub(lambda m: '\0' * len(m.group()), line)
+        for pattern, replacement in MUTATIONS:
+            for match in re.finditer(pattern, code):
+                new = match.expand(replacement) if isinstance(replacement, str) else replacement(match)
+                yield number, line, line[:match.start()] + new + line[match.end():]
+
+
+def read_table(name):
+    rows = (HERE / name).read_text().splitlines()
+    return [row.split('\t') for row in rows if row and not row.startswith('#')]
+
+
+class Tree:
+    """A copy of the project with a build of its own, in which the mutants live."""
+
+    def __init__(self, folder):
+        self.root = folder / 'tree'
+        self.build = folder / 'build'
+        self.root.mkdir(parents=True, exist_ok=True)
+        subprocess.run(['rsync', '-a', '--delete', '--exclude=/build', '--exclude=/.git',
+                        f'{ROOT}/', f'{self.root}/'], check=True)
+        subprocess.run(['cmake', '-G', 'Ninja', '-S', self.root, '-B', self.build,
+                        '-DCMAKE_BUILD_TYPE=Debug', '-DCMAKE_CXX_FLAGS_DEBUG=-O0'],
+                       check=True, stdout=subprocess.DEVNULL)
+
+    def make(self, targets):
+        return subprocess.run(['ninja', '-C', self.build, *targets], stdout=subprocess.DEVNULL,
+                              stderr=subprocess.DEVNULL).returncode == 0
+
+    def passes(self, target):
+        program = next(p for p in self.build.rglob(target) if p.is_file())
+        try:
+            run = subprocess.run([program, '--gtest_brief=1', '--gtest_break_on_failure=0'],
+                                 cwd=program.parent, stdin=subprocess.DEVNULL,
+                                 stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL,
+                                 timeout=RUN_SECONDS)
+        except subprocess.TimeoutExpired:
+            return False
+        return run.returncode == 0
+
+    def survives(self, source, number, mutated, targets):
+        path = self.root / source
+        original = path.read_text()
+        lines = original.split('\n')
+        lines[number] = mutated
+        path.write_text('\n'.join(lines))
+        try:
+            if not self.make(targets):
+                return None  # does not compile: no mutant
+            return all(self.passes(target) for target in targets)
+        finally:
+            path.write_text(original)
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__.split('\n')[0])
+    parser.add_argument('build_dir', type=pathlib.Path)
+    parser.add_argument('sources', nargs='*')
+    parser.add_argument('--sample', type=int, default=0, help='mutants per source, 0 for all')
+    parser.add_argument('--seed', type=int, default=1)
+    options = parser.parse_args()
+
+    explained = {(row[0], row[1], row[2]) for row in read_table('equivalents.txt')}
+    tree = Tree(options.build_dir.resolve())
+    killed = invalid = 0
+    survivors = set()
+    for source, targets in read_table('targets.txt'):
+        if options.sources and source not in options.sources:
+            continue
+        targets = targets.split()
+        if not tree.make(targets) or not all(tree.passes(t) for t in targets):
+            sys.exit(f'{source}: its tests do not pass unbroken')
+        chosen = list(mutants(ROOT / source))
+        if options.sample and len(chosen) > options.sample:
+            chosen = sorted(random.Random(options.seed).sample(chosen, options.sample))
+        for number, line, mutated in chosen:
+            result = tree.survives(source, number, mutated, targets)
+            if result is None:
+                invalid += 1
+            elif not result:
+                killed += 1
+            else:
+                survivors.add((source, line.strip(), mutated.strip()))
+                known = (source, line.strip(), mutated.strip()) in explained
+                print(f'{source}:{number + 1}: {line.strip()}  ->  {mutated.strip()}'
+                      f'{"  (equivalent)" if known else ""}', flush=True)
+    unexplained = survivors - explained
+    stale = set() if options.sample or options.sources else explained - survivors
+    for row in sorted(stale):
+        print('no longer survives:', *row, sep='\t')
+    print(f'{killed} killed, {len(survivors)} survived ({len(unexplained)} unexplained), '
+          f'{invalid} did not compile')
+    return 1 if unexplained or stale or killed == 0 else 0
+
+
+if __name__ == '__main__':
+    sys.exit(main())
