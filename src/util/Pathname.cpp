@@ -90,14 +90,11 @@ Pathname Pathname::toLeaf() const {
 }
 
 std::string Pathname::ext() const {
-    if (empty() || back() == sep || back() == '.') {
-        return std::string();
-    }
     const size_type found = find_last_of("/.");
     if (found == npos || (*this)[found] == sep) {
         return std::string();
     }
-    return substr(found + 1);
+    return substr(found + 1);  // empty behind a '.' at the end
 }
 
 std::string Pathname::basenameWithoutExt() const {

@@ -436,9 +436,10 @@ TEST(FileDescriptorCallsTest, AFailedCopyKeepsItsErrorWhileTheDestinationCloses)
 TEST(FileDescriptorCallsTest, CopyOpensNoDestinationWithoutASourceOrItsPermissions) {
     const Input in("text");
     const Pathname to = in.dir.file("to");
-    EXPECT_FALSE(FileDescriptor(-1).copyTo(to));
     ScriptedCalls stats("fstat");
     stats.fail(EIO);
+    EXPECT_FALSE(FileDescriptor(-1).copyTo(to));
+    EXPECT_EQ(0u, stats.calls());
     EXPECT_FALSE(in.file.copyTo(to));
     EXPECT_EQ(EIO, errno);
     EXPECT_FALSE(to.exists());
