@@ -6,6 +6,7 @@
 #include <string>
 
 #include "util/Assert.h"
+#include "util/LoaderInfo.h"
 #include "util/WildcardMatcher.h"
 
 // The vocabulary of generateRandomText.
@@ -125,7 +126,9 @@ void testWildCards(RuleSystem* rs, int testcount) {
 }
 
 // Checks the matcher on one known case, then runs the stress test.
-int main(int, char**, char**) {
+int main(int argc, char** argv, char** envp) {
+    LoaderInfo::common_main_setup(argc, argv, envp);
+
     const WildcardMatcher matcher("*ar");
     if (matcher.isMatch("fark")) {
         std::puts("BUG IN WILDCARDMATCHER");
