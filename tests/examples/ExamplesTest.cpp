@@ -1,0 +1,113 @@
+// The example programs, built and run as README.md shows them.
+
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <string>
+
+#include "support/RunProgram.h"
+#include "support/TempDir.h"
+
+namespace {
+
+const std::string sampleRules = std::string(EXAMPLES) + "/rules.txt";
+const std::string sampleConfig = std::string(EXAMPLES) + "/own_log.cfg";
+
+TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
+    const ProgramRun run = Program(RULE_CONSOLE)
+                               .arg(sampleRules)
+                               .input(
+                                   "access-0103.log.gz\n"
+                                   "disk full\n"
+                                   "\n"
+                                   "kernel error 5\n"
+                                   "-disk full\n"
+                                   "nothing known\n"
+                                   "!\n")
+                               .run();
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+    EXPECT_EQ(
+        "+ everything is quiet\n"
+        "+ archive the web log\n"
+        "+ old log\n"
+        "+ web log\n"
+        "+ call somebody\n"
+        "- call somebody\n"
+        "- archive the web log\n"
+        "- old log\n"
+        "- web log\n",
+        run.out);
+}
+
+TEST(RuleConsoleTest, NamesTheLineOfARuleThatItCannotRead) {
+    const TempDir dir;
+    const std::string rules = dir.file("rules");
+    for (const char* bad : {"no colon", ": a", "  : a", "a: b,,c", "a: ,"}) {
+        writeFile(rules, std::string("# first\n\nfine: a\n") + bad + '\n');
+        const ProgramRun run = Program(RULE_CONSOLE).arg(rules).run();
+        EXPECT_EQ(1, run.status) << bad;
+        EXPECT_EQ("", run.out) << bad;
+        EXPECT_EQ(0U, run.err.find("rule_console: " + rules + ":4: ")) << bad << run.err;
+    }
+}
+
+TEST(RuleConsoleTest, RefusesAPatternOfTooManySegments) {
+    const TempDir dir;
+    const std::string rules = dir.file("rules");
+    std::string pattern;
+    for (int i = 0; i < 257; ++i) {
+        pattern += "a*";
+    }
+    writeFile(rules, "many: " + pattern + '\n');
+    const ProgramRun run = Program(RULE_CONSOLE).arg(rules).run();
+    EXPECT_EQ(1, run.status);
+    EXPECT_EQ(0U, run.err.find("rule_console: " + rules + ":1: "));
+}
+
+TEST(RuleConsoleTest, NeedsARulesFile) {
+    EXPECT_EQ(2, Program(RULE_CONSOLE).run().status);
+    const ProgramRun run = Program(RULE_CONSOLE).arg("/nowhere/rules").run();
+    EXPECT_EQ(1, run.status);
+    EXPECT_EQ("rule_console: /nowhere/rules: cannot be read\n", run.err);
+}
+
+TEST(OwnLogTest, LogsThroughItsOwnConfiguration) {
+    const TempDir dir;
+    const ProgramRun run = Program(OWN_LOG).arg(sampleConfig).arg(dir.path()).run();
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.out);
+    EXPECT_EQ("INFO    : logging is configured from " + sampleConfig +
+                  "\n"
+                  "ERROR   : cannot find " +
+                  dir.path() +
+                  "/missing: No such file or directory\n"
+                  "INFO    : items are logged\n",
+              run.err);
+
+    const std::string all = readFile(dir.file("own.log.2")) + readFile(dir.file("own.log.1")) +
+                            readFile(dir.file("own.log"));
+    EXPECT_FALSE(std::filesystem::exists(dir.file("own.log.3")));
+    EXPECT_NE(std::string::npos, all.find("\nWARN  OwnLog.Work - item 20 is round\n"
+                                          "DEBUG OwnLog.Work - item 21\n"));
+    EXPECT_NE(std::string::npos, all.find("ERROR OwnLog - cannot find " + dir.path()));
+    const std::string last = "INFO  OwnLog - items are logged\n";
+    EXPECT_EQ(last, all.substr(all.size() - last.size()));
+}
+
+TEST(OwnLogTest, GoesOnWithoutAConfigurationAndSaysSo) {
+    const ProgramRun run = Program(OWN_LOG).arg("/nowhere/own_log.cfg").arg("/nowhere").run();
+    EXPECT_EQ(1, run.status);
+    EXPECT_EQ(
+        "Couldn't open log file configuration \"/nowhere/own_log.cfg\": No such file or "
+        "directory\n"
+        "logging is configured from /nowhere/own_log.cfg\n"
+        "item 10 is round\n"
+        "item 20 is round\n"
+        "item 30 is round\n"
+        "cannot find /nowhere/missing: No such file or directory\n",
+        run.err);
+    EXPECT_EQ(2, Program(OWN_LOG).run().status);
+}
+
+}  // namespace
