@@ -1,0 +1,62 @@
+# What `cmake --install` lays down, and the Debian package that `cpack` makes of it.
+include(CMakePackageConfigHelpers)
+
+set(quelta_cmake_dir "${CMAKE_INSTALL_LIBDIR}/cmake/quelta")
+set(quelta_pc_dir "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+
+install(TARGETS Rete RUNTIME)
+install(TARGETS quelta_util quelta_loader quelta_rete quelta_xmlwrapp EXPORT queltaTargets ARCHIVE)
+install(DIRECTORY src/util src/services DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta"
+  FILES_MATCHING PATTERN "*.h" PATTERN "LogInternal.h" EXCLUDE)
+if(QUELTA_XMLWRAPP_CHOICE STREQUAL "bundled")
+  install(DIRECTORY src/xmlwrapp-bundled/xmlwrapp
+    DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta" FILES_MATCHING PATTERN "*.h")
+endif()
+
+# find_package(quelta)
+install(EXPORT queltaTargets NAMESPACE quelta:: DESTINATION "${quelta_cmake_dir}")
+configure_package_config_file(cmake/queltaConfig.cmake.in
+  "${PROJECT_BINARY_DIR}/queltaConfig.cmake" INSTALL_DESTINATION "${quelta_cmake_dir}")
+write_basic_package_version_file("${PROJECT_BINARY_DIR}/queltaConfigVersion.cmake"
+  COMPATIBILITY SameMajorVersion)
+install(FILES
+  "${PROJECT_BINARY_DIR}/queltaConfig.cmake"
+  "${PROJECT_BINARY_DIR}/queltaConfigVersion.cmake"
+  cmake/FindXmlwrapp.cmake
+  DESTINATION "${quelta_cmake_dir}")
+
+# pkg-config quelta; the paths are relative to the file, so that the tree can be moved.
+file(RELATIVE_PATH quelta_pc_to_prefix
+  "${CMAKE_INSTALL_PREFIX}/${quelta_pc_dir}" "${CMAKE_INSTALL_PREFIX}")
+if(QUELTA_XMLWRAPP_CHOICE STREQUAL "bundled")
+  set(quelta_pc_requires "popt, libxml-2.0")
+  set(quelta_pc_xmlwrapp "-lquelta_xmlwrapp")
+else()
+  set(quelta_pc_requires "popt, xmlwrapp")
+  set(quelta_pc_xmlwrapp "")
+endif()
+configure_file(cmake/quelta.pc.in "${PROJECT_BINARY_DIR}/quelta.pc" @ONLY)
+install(FILES "${PROJECT_BINARY_DIR}/quelta.pc" DESTINATION "${quelta_pc_dir}")
+
+# Manual pages, and an installation to start from.
+foreach(page Rete.1 log-cmdline.cfg.5)
+  configure_file(man/${page}.in "${PROJECT_BINARY_DIR}/man/${page}" @ONLY)
+  string(REGEX MATCH "[0-9]$" section "${page}")
+  install(FILES "${PROJECT_BINARY_DIR}/man/${page}"
+    DESTINATION "${CMAKE_INSTALL_MANDIR}/man${section}")
+endforeach()
+install(DIRECTORY sample/ DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample")
+install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/etc/myinstall")
+install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/var/log")
+install(FILES README.md CHANGELOG.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+
+set(CPACK_GENERATOR DEB)
+set(CPACK_PACKAGE_CONTACT "The Quelta developers <quelta@localhost>")
+set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
+set(CPACK_STRIP_FILES ON)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_PACKAGE_SECTION utils)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+# For building against the libraries; the program needs none of them.
+set(CPACK_DEBIAN_PACKAGE_SUGGESTS "libpopt-dev, libxml2-dev, pkg-config")
+include(CPack)

@@ -1,0 +1,66 @@
+#!/bin/sh
+# Usage: install_test.sh BUILD-TREE CXX [compiler flags]
+# Installs the build tree into a scratch prefix, and builds and runs one program against what is
+# there by CMake and by pkg-config.
+set -eu
+build=$1
+cxx=$2
+flags=${3-}
+here=$(CDPATH= cd -- "$(dirname -- "$0")" && pwd)
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+prefix=$scratch/prefix
+
+fail() {
+    echo "FAILED: $*" >&2
+    exit 1
+}
+
+cmake --install "$build" --prefix "$prefix" >"$scratch/install.log" ||
+    fail "$(cat "$scratch/install.log")"
+
+for file in bin/Rete include/quelta/util/LoaderInfo.h include/quelta/util/Logger.h \
+    include/quelta/services/pipeline/indexprocessor/Rete.h share/man/man1/Rete.1 \
+    share/man/man5/log-cmdline.cfg.5 share/quelta/sample/etc/log-cmdline.cfg; do
+    [ -s "$prefix/$file" ] || fail "missing: $file"
+done
+for folder in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
+    [ -d "$prefix/$folder" ] || fail "missing: $folder"
+done
+
+# What was installed must not need the place that it was built in.
+source=$(CDPATH= cd -- "$here/../.." && pwd)
+if grep -rIl -e "$source" -e "$build" "$prefix"; then
+    fail "these files name the source or the build tree"
+fi
+
+status=0
+out=$(env -u QUELTA_HOME "$prefix/bin/Rete") || status=$?
+[ "$status" -eq 255 ] || fail "Rete ended with $status"
+[ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete said: $out"
+
+expect_consumer() {
+    home=$scratch/home-$1
+    cp -r "$prefix/share/quelta/sample" "$home"
+    echo "category.Consumer=INFO" >>"$home/etc/log-cmdline.cfg"
+    out=$(QUELTA_HOME=$home "$2" -n consumer) || fail "the program built by $1 ended with $?"
+    expected="Using logging configuration at $home/etc/log-cmdline.cfg.
+consumer settings
+it fired"
+    [ "$out" = "$expected" ] || fail "the program built by $1 said: $out"
+    grep -q 'INFO  Consumer - logged by consumer$' "$home/var/log/cmdline.log" ||
+        fail "the program built by $1 did not log"
+}
+
+cmake -S "$here/consumer" -B "$scratch/consumer" -DCMAKE_PREFIX_PATH="$prefix" \
+    -DCMAKE_CXX_COMPILER="$cxx" -DCMAKE_CXX_FLAGS="$flags" >"$scratch/cmake.log" 2>&1 &&
+    cmake --build "$scratch/consumer" >>"$scratch/cmake.log" 2>&1 ||
+    fail "$(cat "$scratch/cmake.log")"
+expect_consumer cmake "$scratch/consumer/consumer"
+
+PKG_CONFIG_PATH=$(dirname "$(find "$prefix" -name quelta.pc)")
+export PKG_CONFIG_PATH
+# shellcheck disable=SC2046,SC2086  # lists of words on purpose
+"$cxx" -std=c++20 $flags "$here/consumer/consumer.cpp" -o "$scratch/by-pkg-config" \
+    $(pkg-config --cflags --libs quelta) || fail "building by pkg-config"
+expect_consumer pkg-config "$scratch/by-pkg-config"

@@ -1,0 +1,173 @@
+// What the manual page of the configuration file shows is tried: every example of the file is read,
+// every example of a pattern rendered, and the bad file reported.
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <ctime>
+#include <filesystem>
+#include <regex>
+#include <set>
+#include <sstream>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "support/InChild.h"
+#include "support/TempDir.h"
+#include "util/LogFormat.h"
+#include "util/LogInternal.h"
+#include "util/LogMsgMetadata.h"
+#include "util/Logger.h"
+#include "util/Pathname.h"
+
+namespace {
+
+std::string replaced(std::string text, const std::string& what, const std::string& by) {
+    for (std::size_t at = 0; (at = text.find(what, at)) != std::string::npos; at += by.size()) {
+        text.replace(at, what.size(), by);
+    }
+    return text;
+}
+
+// The text between each `begin` line and the next `end` line, with the escapes that it needs in the
+// page's source undone.
+std::vector<std::string> blocks(const std::string& begin, const std::string& end) {
+    std::istringstream page(readFile(MANUAL));
+    std::vector<std::string> found;
+    bool inside = false;
+    for (std::string line; std::getline(page, line);) {
+        if (line == begin) {
+            found.emplace_back();
+            inside = true;
+        } else if (line == end) {
+            inside = false;
+        } else if (inside) {
+            found.back() += replaced(line, "\\-", "-") + '\n';
+        }
+    }
+    return found;
+}
+
+// Examples are lines of the file, or "pattern   what becomes of it".
+bool showsPattern(const std::string& line) {
+    return line.find('%') < line.find('=');
+}
+
+std::vector<std::string> configurations() {
+    std::vector<std::string> found = blocks(".EX", ".EE");
+    std::erase_if(found, showsPattern);
+    return found;
+}
+
+std::vector<std::pair<std::string, std::string>> patterns() {
+    const std::regex columns("(.*?\\S) {2,}(.*)");
+    std::vector<std::pair<std::string, std::string>> found;
+    for (const std::string& block : blocks(".EX", ".EE")) {
+        std::istringstream lines(block);
+        for (std::string line; std::getline(lines, line);) {
+            std::smatch parts;
+            if (showsPattern(line) && std::regex_match(line, parts, columns)) {
+                found.emplace_back(parts[1], parts[2]);
+            }
+        }
+    }
+    return found;
+}
+
+// The message that the page speaks of.
+std::string rendered(const std::string& pattern) {
+    static const Logger rete("Rete");
+    LogMsgMetadata mdata(&rete, WARN);
+    struct tm local = {};
+    local.tm_year = 101;
+    local.tm_mon = 1;
+    local.tm_mday = 3;
+    local.tm_hour = 4;
+    local.tm_min = 5;
+    local.tm_sec = 6;
+    local.tm_isdst = -1;
+    const time_t seconds = std::mktime(&local);
+    mdata.stamp.set(seconds, 7500);
+    epoch_timeval().set(seconds - 4, 551500);
+    std::string line;
+    LogFormat(pattern.c_str()).apply(line, mdata, "disk full");
+    return line;
+}
+
+TEST(ManualTest, ExamplesOfPatternsRenderAsShown) {
+    const auto examples = patterns();
+    std::set<char> shown;
+    for (const auto& [pattern, output] : examples) {
+        std::string line = rendered(pattern);
+        if (pattern.find("%u") != std::string::npos) {
+            // Processor time is different each time.
+            line = std::regex_replace(line, std::regex("^[0-9]+"), "61234");
+        }
+        EXPECT_EQ(output, replaced(line, "\n", "")) << pattern;
+        for (std::size_t at = pattern.find('%'); at != std::string::npos && at + 1 < pattern.size();
+             at = pattern.find('%', at + 2)) {
+            shown.insert(pattern[at + 1]);
+        }
+    }
+    for (const char conversion : std::string("mn%cptrRud")) {
+        EXPECT_TRUE(shown.contains(conversion)) << "no example of %" << conversion;
+    }
+    EXPECT_LE(20U, examples.size());
+}
+
+TEST(ManualTest, ExamplesOfTheFileAreReadWithoutComplaint) {
+    std::string all;
+    for (const std::string& block : configurations()) {
+        all += block;
+        const TempDir dir;
+        std::filesystem::create_directories(dir.file("var/log"));
+        std::string lines = replaced(block, "/tmp/", dir.path() + '/');
+        lines = replaced(lines, "=/var/log/", '=' + dir.path() + "/var/log/");
+        // Examples name appenders that other examples make.
+        writeFile(dir.file("cfg"), "appender.A1=\nappender.A2=\n" + lines);
+        const ChildRun run = inChild([&] {
+            EXPECT_TRUE(Logger::initialize(Pathname(dir.file("cfg")), Pathname(dir.path())));
+        });
+        EXPECT_EQ(0, run.status) << block;
+        EXPECT_EQ(std::string::npos, run.err.find(dir.file("cfg"))) << run.err << block;
+    }
+    for (const char* key :
+         {"\nrootCategory=", "\ncategory.", "\nappender.A1=", ".fileName=", ".maxFileSize=",
+          ".maxBackupIndex=", ".layout=", ".layout.ConversionPattern=", "\nlog4cpp."}) {
+        EXPECT_NE(std::string::npos, ('\n' + all).find(key)) << "no example of " << key;
+    }
+}
+
+TEST(ManualTest, BadFileIsReportedAsShown) {
+    const std::vector<std::string> shown = blocks(".nf", ".fi");
+    ASSERT_EQ(2U, shown.size());
+    const TempDir dir;
+    writeFile(dir.file("log-cmdline.cfg"), shown[0]);
+    const ChildRun run = inChild([&] {
+        EXPECT_EQ(0, ::chdir(dir.path().c_str()));
+        EXPECT_TRUE(Logger::initialize(Pathname("log-cmdline.cfg"), Pathname()));
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ(shown[1], run.err);
+}
+
+TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
+    const TempDir home;
+    std::filesystem::create_directories(home.file("var/log"));
+    const ChildRun run = inChild([&] {
+        EXPECT_TRUE(Logger::initialize(Pathname(SAMPLE_CONFIG), Pathname(home.path())));
+        Logger("Rete").debug("the first line");
+        Logger("other").info("not written");
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+    EXPECT_TRUE(std::regex_match(
+        readFile(home.file("var/log/cmdline.log")),
+        std::regex(
+            "[0-9]{2}-[0-9]{2}-[0-9]{4} [0-9:]{8}\\.[0-9]{3} DEBUG Rete - the first line\n")));
+}
+
+}  // namespace
