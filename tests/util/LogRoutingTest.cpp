@@ -278,6 +278,7 @@ TEST(InternalReportTest, AThirdAppenderHearsOfBothFailures) {
         const RecordedWrites writes([](const RecordedWrites::Message& message) {
             if (message.appender == appender("A2")) {
                 LogFormat::internal(appender("A2"), ERROR, "A2 failed");
+                EXPECT_TRUE(report_in_progress(appender("A1")));
             }
         });
         LogFormat::internal(appender("A1"), ERROR, "A1 failed");
