@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <sstream>
 #include <string>
 
 #include "support/RunProgram.h"
@@ -10,8 +11,19 @@
 
 namespace {
 
-const std::string sampleRules = std::string(EXAMPLES) + "/rules.txt";
-const std::string sampleConfig = std::string(EXAMPLES) + "/own_log.cfg";
+const std::string project = PROJECT;
+const std::string sampleRules = project + "/examples/rules.txt";
+const std::string sampleConfig = project + "/examples/own_log.cfg";
+
+// Whether README.md shows this text, indented as it shows all that is typed and printed.
+bool readmeShows(const std::string& text) {
+    std::string indented;
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line);) {
+        indented += "    " + line + '\n';
+    }
+    return readFile(project + "/README.md").find(indented) != std::string::npos;
+}
 
 TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
     const ProgramRun run = Program(RULE_CONSOLE)
@@ -38,6 +50,21 @@ TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
         "- old log\n"
         "- web log\n",
         run.out);
+}
+
+TEST(RuleConsoleTest, DoesWhatTheReadmeShows) {
+    const ProgramRun run =
+        Program(RULE_CONSOLE)
+            .arg("examples/rules.txt")
+            .in(project)
+            .input("access-0103.log.gz\ndisk full\nkernel error 5\n-disk full\n!\n")
+            .run();
+    EXPECT_TRUE(readmeShows("$ cat examples/rules.txt\n" + readFile(sampleRules)));
+    EXPECT_TRUE(
+        readmeShows("$ printf '%s\\n' access-0103.log.gz 'disk full' 'kernel error 5' '-disk full' "
+                    "'!' |\n"
+                    "      build/dev/examples/rule_console examples/rules.txt\n" +
+                    run.out));
 }
 
 TEST(RuleConsoleTest, NamesTheLineOfARuleThatItCannotRead) {
@@ -93,6 +120,16 @@ TEST(OwnLogTest, LogsThroughItsOwnConfiguration) {
     EXPECT_NE(std::string::npos, all.find("ERROR OwnLog - cannot find " + dir.path()));
     const std::string last = "INFO  OwnLog - items are logged\n";
     EXPECT_EQ(last, all.substr(all.size() - last.size()));
+}
+
+TEST(OwnLogTest, DoesWhatTheReadmeShows) {
+    const TempDir dir;
+    std::string err =
+        Program(OWN_LOG).arg("examples/own_log.cfg").arg(dir.path()).in(project).run().err;
+    err.replace(err.find(dir.path()), dir.path().size(), "/tmp");
+    EXPECT_TRUE(readmeShows("$ build/dev/examples/own_log examples/own_log.cfg /tmp\n" + err))
+        << err;
+    EXPECT_TRUE(readmeShows("/tmp/own.log  /tmp/own.log.1  /tmp/own.log.2\n"));
 }
 
 TEST(OwnLogTest, GoesOnWithoutAConfigurationAndSaysSo) {

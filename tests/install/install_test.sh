@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: install_test.sh BUILD-TREE CXX [compiler flags]
 # Installs the build tree into a scratch prefix, and builds and runs one program against what is
-# there by CMake and by pkg-config.
+# there by CMake and by pkg-config; and configures one that has the sources in a folder of its own.
 set -eu
 build=$1
 cxx=$2
@@ -64,3 +64,17 @@ export PKG_CONFIG_PATH
 "$cxx" -std=c++20 $flags "$here/consumer/consumer.cpp" -o "$scratch/by-pkg-config" \
     $(pkg-config --cflags --libs quelta) || fail "building by pkg-config"
 expect_consumer pkg-config "$scratch/by-pkg-config"
+
+mkdir "$scratch/parent"
+cat >"$scratch/parent/CMakeLists.txt" <<END
+cmake_minimum_required(VERSION 3.25)
+project(parent LANGUAGES CXX)
+add_subdirectory("$source" quelta)
+add_executable(consumer "$here/consumer/consumer.cpp")
+target_link_libraries(consumer PRIVATE quelta::rete quelta::loader quelta::util)
+if(TARGET rule_console OR TARGET ReteTest)
+  message(FATAL_ERROR "a parent is made to build examples or tests")
+endif()
+END
+cmake -S "$scratch/parent" -B "$scratch/parent/build" -DCMAKE_CXX_COMPILER="$cxx" \
+    >"$scratch/cmake.log" 2>&1 || fail "$(cat "$scratch/cmake.log")"
