@@ -3,6 +3,12 @@
 #include <cstdlib>
 #include <new>
 
+#if defined(__has_feature)
+#define QUELTA_HAS_FEATURE(name) __has_feature(name)
+#else
+#define QUELTA_HAS_FEATURE(name) 0
+#endif
+
 namespace {
 
 struct State {
@@ -14,7 +20,7 @@ struct State {
 
 thread_local State state = {};
 
-void* allocate(std::size_t size) {
+[[maybe_unused]] void* allocate(std::size_t size) {
     if (state.counting) {
         if (++state.count == state.failing) {
             throw std::bad_alloc();
@@ -28,7 +34,7 @@ void* allocate(std::size_t size) {
     return block;
 }
 
-void release(void* block) {
+[[maybe_unused]] void release(void* block) {
     if (state.counting && block != nullptr) {
         --state.live;
     }
@@ -37,6 +43,7 @@ void release(void* block) {
 
 }  // namespace
 
+#if !QUELTA_HAS_FEATURE(thread_sanitizer)
 void* operator new(std::size_t size) {
     return allocate(size);
 }
@@ -55,6 +62,14 @@ void operator delete(void* block, std::size_t) noexcept {
 void operator delete[](void* block, std::size_t) noexcept {
     release(block);
 }
+bool AllocationProbe::available() {
+    return true;
+}
+#else
+bool AllocationProbe::available() {
+    return false;
+}
+#endif
 
 AllocationProbe::AllocationProbe(std::size_t failing) {
     state = {true, failing, 0, 0};

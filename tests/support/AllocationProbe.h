@@ -5,11 +5,14 @@
 // and lets a chosen one fail. A program that uses it lists support/AllocationProbe.cpp, which
 // replaces operator new and delete, among its sources.
 //
-//     AllocationProbe probe(3);   // the third allocation from here on throws std::bad_alloc
+//     REQUIRE_ALLOCATION_PROBE();  // first in the case
+//     AllocationProbe probe(3);    // the third allocation from here on throws std::bad_alloc
 //     ...
 //     EXPECT_EQ(0, probe.live());
 //
 // Not thread-safe; one probe at a time, used by the thread that made it.
+
+#include <gtest/gtest.h>
 
 #include <cstddef>
 
@@ -27,6 +30,16 @@ public:
     long live() const;
     // Stops counting and failing.
     void stop();
+
+    // False where a program cannot replace operator new: clang's thread sanitizer brings its own.
+    static bool available();
 };
+
+// Skips the case where there is nothing to be counted.
+#define REQUIRE_ALLOCATION_PROBE()                              \
+    if (!AllocationProbe::available()) {                        \
+        GTEST_SKIP() << "operator new cannot be replaced here"; \
+    }                                                           \
+    static_assert(true, "takes the semicolon")
 
 #endif  // QUELTA_TESTS_SUPPORT_ALLOCATIONPROBE_H_

@@ -45,7 +45,8 @@ long openFiles() {
 
 }  // namespace
 
-TEST(LogAllocation, aLineIsEitherWrittenOrRefusedAndTheLockIsFree) {
+TEST(LogAllocation, ALineIsEitherWrittenOrRefusedAndTheLockIsFree) {
+    REQUIRE_ALLOCATION_PROBE();
     bool refused = false;
     bool failed = true;
     for (std::size_t n = 1; failed; ++n) {
@@ -77,7 +78,8 @@ TEST(LogAllocation, aLineIsEitherWrittenOrRefusedAndTheLockIsFree) {
     EXPECT_TRUE(refused);
 }
 
-TEST(LogAllocation, aMessageReachesTheFileOrStandardErrorExactlyOnce) {
+TEST(LogAllocation, AMessageReachesTheFileOrStandardErrorExactlyOnce) {
+    REQUIRE_ALLOCATION_PROBE();
     std::size_t n = 1;
     for (bool failed = true; failed; ++n) {
         const TempDir dir;
@@ -109,7 +111,8 @@ TEST(LogAllocation, aMessageReachesTheFileOrStandardErrorExactlyOnce) {
     EXPECT_GT(n, 2U);
 }
 
-TEST(LogAllocation, theReportOfALostLineIsGivenUpWithoutHarm) {
+TEST(LogAllocation, TheReportOfALostLineIsGivenUpWithoutHarm) {
+    REQUIRE_ALLOCATION_PROBE();
     bool failed = true;
     for (std::size_t n = 1; failed; ++n) {
         const StderrCapture err;
@@ -131,7 +134,8 @@ TEST(LogAllocation, theReportOfALostLineIsGivenUpWithoutHarm) {
     }
 }
 
-TEST(LogAllocation, attributesAndAppendersCanBeTriedAgain) {
+TEST(LogAllocation, AttributesAndAppendersCanBeTriedAgain) {
+    REQUIRE_ALLOCATION_PROBE();
     const struct {
         const char* key;
         const char* value;
@@ -176,7 +180,8 @@ TEST(LogAllocation, attributesAndAppendersCanBeTriedAgain) {
     }
 }
 
-TEST(LogAllocation, readingTheConfigurationCanBeTriedAgain) {
+TEST(LogAllocation, ReadingTheConfigurationCanBeTriedAgain) {
+    REQUIRE_ALLOCATION_PROBE();
     const TempDir dir;
     const std::string cfg = dir.file("log.cfg");
     writeFile(cfg,

@@ -93,7 +93,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogAppenderFault, anOpenThatFailsLosesTheLineAndIsTriedAgain) {
+TEST_F(LogAppenderFault, AnOpenThatFailsLosesTheLineAndIsTriedAgain) {
     for (const int error : {ENFILE, EACCES, EROFS, ENOSPC}) {
         ScriptedCalls opens("open");
         opens.fail(error);
@@ -106,7 +106,7 @@ TEST_F(LogAppenderFault, anOpenThatFailsLosesTheLineAndIsTriedAgain) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderFault, anFstatThatFailsClosesTheFileAgain) {
+TEST_F(LogAppenderFault, AnFstatThatFailsClosesTheFileAgain) {
     ScriptedCalls fstats("fstat");
     fstats.fail(EIO);
     ScriptedCalls closes("close");
@@ -118,7 +118,7 @@ TEST_F(LogAppenderFault, anFstatThatFailsClosesTheFileAgain) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderFault, theReportTellsTheFailureAndNotWhatClosingDid) {
+TEST_F(LogAppenderFault, TheReportTellsTheFailureAndNotWhatClosingDid) {
     ScriptedCalls fstats("fstat");
     fstats.fail(EIO);
     ScriptedCalls closes("close");
@@ -127,7 +127,7 @@ TEST_F(LogAppenderFault, theReportTellsTheFailureAndNotWhatClosingDid) {
     EXPECT_EQ(report("Error calling fstat on", EIO), _err.text());
 }
 
-TEST_F(LogAppenderFault, aStatThatFailsOpensTheFileAnew) {
+TEST_F(LogAppenderFault, AStatThatFailsOpensTheFileAnew) {
     line("one", 1000);
     ScriptedCalls stats("stat");
     stats.fail(EACCES);
@@ -138,7 +138,7 @@ TEST_F(LogAppenderFault, aStatThatFailsOpensTheFileAnew) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogAppenderFault, aWriteThatFailsLosesTheLineAndClosesTheFile) {
+TEST_F(LogAppenderFault, AWriteThatFailsLosesTheLineAndClosesTheFile) {
     line("one");
     for (const int error : {ENOSPC, EIO, EFBIG, EPIPE}) {
         ScriptedCalls writes("write");
@@ -153,7 +153,7 @@ TEST_F(LogAppenderFault, aWriteThatFailsLosesTheLineAndClosesTheFile) {
     EXPECT_EQ(8, _log._curSize);
 }
 
-TEST_F(LogAppenderFault, aWriteThatTakesNothingIsAFullDevice) {
+TEST_F(LogAppenderFault, AWriteThatTakesNothingIsAFullDevice) {
     ScriptedCalls writes("write");
     writes.give(0);
     line("lost");
@@ -162,7 +162,7 @@ TEST_F(LogAppenderFault, aWriteThatTakesNothingIsAFullDevice) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderFault, aLineCutShortCountsWithTheBytesThatWentOut) {
+TEST_F(LogAppenderFault, ALineCutShortCountsWithTheBytesThatWentOut) {
     ScriptedCalls writes("write");
     writes.limit(3).fail(ENOSPC);
     line("12345");
@@ -174,7 +174,7 @@ TEST_F(LogAppenderFault, aLineCutShortCountsWithTheBytesThatWentOut) {
     EXPECT_EQ(8, _log._curSize);
 }
 
-TEST_F(LogAppenderFault, interruptionsAndShortWritesLoseNothing) {
+TEST_F(LogAppenderFault, InterruptionsAndShortWritesLoseNothing) {
     ScriptedCalls writes("write");
     writes.fail(EINTR, 3).limit(1).fail(EINTR).limit(2).limit(1).fail(EINTR);
     line("12345678");
@@ -182,7 +182,7 @@ TEST_F(LogAppenderFault, interruptionsAndShortWritesLoseNothing) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogAppenderFault, aRotationThatCannotOpenTheNewFileKeepsTheLine) {
+TEST_F(LogAppenderFault, ARotationThatCannotOpenTheNewFileKeepsTheLine) {
     _log._maxSize = 1;
     _log._maxBackupIndex = 1;
     ScriptedCalls opens("open");
@@ -196,7 +196,7 @@ TEST_F(LogAppenderFault, aRotationThatCannotOpenTheNewFileKeepsTheLine) {
     EXPECT_EQ("two\n", readFile(_file));
 }
 
-TEST_F(LogAppenderFault, aRotationThatCannotExamineTheNewFileKeepsTheLine) {
+TEST_F(LogAppenderFault, ARotationThatCannotExamineTheNewFileKeepsTheLine) {
     _log._maxSize = 1;
     _log._maxBackupIndex = 1;
     ScriptedCalls fstats("fstat");
@@ -207,7 +207,7 @@ TEST_F(LogAppenderFault, aRotationThatCannotExamineTheNewFileKeepsTheLine) {
     EXPECT_FALSE(_log._fd.valid());
 }
 
-TEST_F(LogAppenderFault, renamesThatFailLeaveTheFilesAndLoseNothing) {
+TEST_F(LogAppenderFault, RenamesThatFailLeaveTheFilesAndLoseNothing) {
     for (unsigned failing = 0; failing < 4; ++failing) {
         const TempDir dir;
         FileAppender log(dir.file("app.log"), 1, 4);
@@ -230,7 +230,7 @@ TEST_F(LogAppenderFault, renamesThatFailLeaveTheFilesAndLoseNothing) {
     }
 }
 
-TEST_F(LogAppenderFault, aDeletionThatFailsLeavesTheFileToGoOnWith) {
+TEST_F(LogAppenderFault, ADeletionThatFailsLeavesTheFileToGoOnWith) {
     _log._maxSize = 1;
     ScriptedCalls unlinks("unlink");
     unlinks.fail(EPERM);
@@ -242,7 +242,7 @@ TEST_F(LogAppenderFault, aDeletionThatFailsLeavesTheFileToGoOnWith) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogAppenderFault, withoutTheLockTheLineIsWrittenAndNothingUnlocked) {
+TEST_F(LogAppenderFault, WithoutTheLockTheLineIsWrittenAndNothingUnlocked) {
     {
         ScriptedCalls locks("pthread_mutex_lock");
         locks.give(EINVAL);
@@ -256,7 +256,7 @@ TEST_F(LogAppenderFault, withoutTheLockTheLineIsWrittenAndNothingUnlocked) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogAppenderFault, theLockIsTakenAndLeftOncePerLine) {
+TEST_F(LogAppenderFault, TheLockIsTakenAndLeftOncePerLine) {
     ScriptedCalls locks("pthread_mutex_lock");
     ScriptedCalls unlocks("pthread_mutex_unlock");
     _log.line("one");
@@ -264,7 +264,7 @@ TEST_F(LogAppenderFault, theLockIsTakenAndLeftOncePerLine) {
     EXPECT_EQ(1U, unlocks.calls());
 }
 
-TEST_F(LogAppenderFault, aLineCostsOneWriteAndAnIdentityCheckEveryFiveSeconds) {
+TEST_F(LogAppenderFault, ALineCostsOneWriteAndAnIdentityCheckEveryFiveSeconds) {
     line("first", 1000);
     ScriptedCalls writes("write");
     ScriptedCalls stats("stat");
@@ -279,7 +279,7 @@ TEST_F(LogAppenderFault, aLineCostsOneWriteAndAnIdentityCheckEveryFiveSeconds) {
     EXPECT_EQ(0U, opens.calls());
 }
 
-TEST_F(LogAppenderFault, standardErrorIsNeverExamined) {
+TEST_F(LogAppenderFault, StandardErrorIsNeverExamined) {
     LogAppender appender;
     appender.finalSetup("E");
     ScriptedCalls stats("stat");
@@ -290,7 +290,7 @@ TEST_F(LogAppenderFault, standardErrorIsNeverExamined) {
     EXPECT_EQ(0U, fstats.calls());
 }
 
-TEST_F(LogAppenderFault, theSetupLeavesNoDescriptorOpenWhateverHappens) {
+TEST_F(LogAppenderFault, TheSetupLeavesNoDescriptorOpenWhateverHappens) {
     ScriptedCalls opens("open");
     opens.fail(EMFILE).pass();
     ScriptedCalls closes("close");

@@ -30,7 +30,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogAppenderIdentity, aMoveIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentity, AMoveIsNoticedAfterSixSecondsNotAfterFive) {
     fs::rename(_file, _moved);
     _log.line("at 1005", 1005);
     EXPECT_FALSE(fs::exists(_file));
@@ -39,7 +39,7 @@ TEST_F(LogAppenderIdentity, aMoveIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, aDeletionIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentity, ADeletionIsNoticedAfterSixSecondsNotAfterFive) {
     fs::remove(_file);
     _log.line("at 1005", 1005);
     EXPECT_FALSE(fs::exists(_file));
@@ -47,7 +47,7 @@ TEST_F(LogAppenderIdentity, aDeletionIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, aReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentity, AReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
     fs::rename(_file, _moved);
     writeFile(_file, "someone else's\n");
     _log.line("at 1005", 1005);
@@ -57,14 +57,14 @@ TEST_F(LogAppenderIdentity, aReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("first\nat 1005\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, aClockThatStepsBackLeadsToACheckAtOnce) {
+TEST_F(LogAppenderIdentity, AClockThatStepsBackLeadsToACheckAtOnce) {
     fs::rename(_file, _moved);
     _log.line("at 999", 999);
     EXPECT_EQ("at 999\n", readFile(_file));
     EXPECT_EQ("first\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, afterTheClockSteppedBackTheSecondsCountFromThere) {
+TEST_F(LogAppenderIdentity, AfterTheClockSteppedBackTheSecondsCountFromThere) {
     _log.line("at 500", 500);
     fs::rename(_file, _moved);
     _log.line("at 505", 505);
@@ -74,7 +74,7 @@ TEST_F(LogAppenderIdentity, afterTheClockSteppedBackTheSecondsCountFromThere) {
     EXPECT_EQ("first\nat 500\nat 505\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, aConfirmedFileIsTrustedForAnotherFiveSeconds) {
+TEST_F(LogAppenderIdentity, AConfirmedFileIsTrustedForAnotherFiveSeconds) {
     _log.line("at 1006", 1006);
     fs::rename(_file, _moved);
     _log.line("at 1011", 1011);
@@ -84,7 +84,7 @@ TEST_F(LogAppenderIdentity, aConfirmedFileIsTrustedForAnotherFiveSeconds) {
     EXPECT_EQ("at 1012\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, linesInBetweenDoNotPutTheCheckOff) {
+TEST_F(LogAppenderIdentity, LinesInBetweenDoNotPutTheCheckOff) {
     fs::rename(_file, _moved);
     for (long long second = 1001; second <= 1005; ++second) {
         _log.line("between", second);
@@ -93,7 +93,7 @@ TEST_F(LogAppenderIdentity, linesInBetweenDoNotPutTheCheckOff) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, aTruncatedFileIsStillTheSameFile) {
+TEST_F(LogAppenderIdentity, ATruncatedFileIsStillTheSameFile) {
     ASSERT_EQ(0, ::truncate(_file.c_str(), 0));
     _log.line("next", 1010);
     EXPECT_EQ("next\n", readFile(_file));
@@ -101,7 +101,7 @@ TEST_F(LogAppenderIdentity, aTruncatedFileIsStillTheSameFile) {
     EXPECT_EQ(11, _log._curSize);
 }
 
-TEST_F(LogAppenderIdentity, aLinkToTheMovedFileIsTheSameFile) {
+TEST_F(LogAppenderIdentity, ALinkToTheMovedFileIsTheSameFile) {
     fs::rename(_file, _moved);
     fs::create_symlink(_moved, _file);
     _log.line("next", 1010);
@@ -109,14 +109,14 @@ TEST_F(LogAppenderIdentity, aLinkToTheMovedFileIsTheSameFile) {
     EXPECT_TRUE(fs::is_symlink(_file));
 }
 
-TEST_F(LogAppenderIdentity, theSizeCountsAnewInTheNewFile) {
+TEST_F(LogAppenderIdentity, TheSizeCountsAnewInTheNewFile) {
     fs::rename(_file, _moved);
     writeFile(_file, "0123456789");
     _log.line("next", 1010);
     EXPECT_EQ(15, _log._curSize);
 }
 
-TEST_F(LogAppenderIdentity, whatStandsInTheWayIsReportedUntilItIsGone) {
+TEST_F(LogAppenderIdentity, WhatStandsInTheWayIsReportedUntilItIsGone) {
     const std::string prefix = "Error opening \"" + _file + "\": ";
     const StderrCapture err;
     fs::rename(_file, _moved);
@@ -133,7 +133,7 @@ TEST_F(LogAppenderIdentity, whatStandsInTheWayIsReportedUntilItIsGone) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, aFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
+TEST_F(LogAppenderIdentity, AFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
     const TempDir dir;
     fs::create_directory(dir.file("logs"));
     FileAppender log(dir.file("logs/app.log"));
@@ -148,7 +148,7 @@ TEST_F(LogAppenderIdentity, aFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
     EXPECT_EQ("written\n", readFile(dir.file("logs/app.log")));
 }
 
-TEST_F(LogAppenderIdentity, theFarthestStampsAreNoTrouble) {
+TEST_F(LogAppenderIdentity, TheFarthestStampsAreNoTrouble) {
     const StderrCapture err;
     const long long stamps[] = {2147483647, 0, -2147483648LL, 2147483647, 1000};
     std::string expected = "first\n";

@@ -29,7 +29,7 @@ std::string formatted(const LogFormat* layout, const std::string& message) {
 
 }  // namespace
 
-TEST(LogAppender, startsClosedWithoutFileLimitBackupsAndLayout) {
+TEST(LogAppender, StartsClosedWithoutFileLimitBackupsAndLayout) {
     const LogAppender appender;
     EXPECT_FALSE(appender._fd.valid());
     EXPECT_EQ("", appender._filename);
@@ -39,7 +39,7 @@ TEST(LogAppender, startsClosedWithoutFileLimitBackupsAndLayout) {
     EXPECT_EQ(nullptr, appender._fmt);
 }
 
-TEST(LogAppender, rootAppenderWritesTheBareMessageToStandardError) {
+TEST(LogAppender, RootAppenderWritesTheBareMessageToStandardError) {
     const LogAppender& root = rootAppender();
     EXPECT_EQ(STDERR_FILENO, root._fd._osdep);
     EXPECT_EQ("", root._filename);
@@ -52,7 +52,7 @@ TEST(LogAppender, rootAppenderWritesTheBareMessageToStandardError) {
     EXPECT_EQ("a message\n", err.text());
 }
 
-TEST(LogAppender, rootAppenderIsNotRotatedOnStandardError) {
+TEST(LogAppender, RootAppenderIsNotRotatedOnStandardError) {
     const StderrCapture err;
     ASSERT_TRUE(rootAppender().setAttribute("maxFileSize", "1", NO_HOME));
     rootAppender().write(stampedAt(0), "one");
@@ -62,7 +62,7 @@ TEST(LogAppender, rootAppenderIsNotRotatedOnStandardError) {
     EXPECT_EQ(STDERR_FILENO, rootAppender()._fd._osdep);
 }
 
-TEST(LogAppender, rootAppenderGivenAFileLeavesStandardErrorForIt) {
+TEST(LogAppender, RootAppenderGivenAFileLeavesStandardErrorForIt) {
     const TempDir dir;
     const std::string file = dir.file("root.log");
     const ChildRun run = inChild([&] {
@@ -74,7 +74,7 @@ TEST(LogAppender, rootAppenderGivenAFileLeavesStandardErrorForIt) {
     EXPECT_EQ("to the file\n", readFile(file));
 }
 
-TEST(LogAppender, findMakesAnAppenderOnlyWhenAskedTo) {
+TEST(LogAppender, FindMakesAnAppenderOnlyWhenAskedTo) {
     EXPECT_EQ(nullptr, LogAppender::find("find.A", false));
     EXPECT_EQ(0U, appenders().count("find.A"));
     LogAppender* const made = LogAppender::find("find.A", true);
@@ -87,13 +87,13 @@ TEST(LogAppender, findMakesAnAppenderOnlyWhenAskedTo) {
     EXPECT_EQ(nullptr, LogAppender::find("find.a", false));
 }
 
-TEST(LogAppender, findKnowsTheRootAppenderWithoutAnEntry) {
+TEST(LogAppender, FindKnowsTheRootAppenderWithoutAnEntry) {
     EXPECT_EQ(&rootAppender(), LogAppender::find("rootAppender", false));
     EXPECT_EQ(&rootAppender(), LogAppender::find("rootAppender", true));
     EXPECT_EQ(0U, appenders().count("rootAppender"));
 }
 
-TEST(LogAppender, fileNameTakesTheHomeDirectoryForItsVariable) {
+TEST(LogAppender, FileNameTakesTheHomeDirectoryForItsVariable) {
     const struct {
         const char* value;
         const char* home;
@@ -119,21 +119,21 @@ TEST(LogAppender, fileNameTakesTheHomeDirectoryForItsVariable) {
     }
 }
 
-TEST(LogAppender, fileNameGivenTwiceJoinsBothValues) {
+TEST(LogAppender, FileNameGivenTwiceJoinsBothValues) {
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("fileName", "/tmp/a", NO_HOME));
     ASSERT_TRUE(appender.setAttribute("fileName", "/b.log", NO_HOME));
     EXPECT_EQ("/tmp/a/b.log", appender._filename);
 }
 
-TEST(LogAppender, fileNameWithTheHomeVariableBeginsAnew) {
+TEST(LogAppender, FileNameWithTheHomeVariableBeginsAnew) {
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("fileName", "/tmp/a", Pathname("/srv/q")));
     ASSERT_TRUE(appender.setAttribute("fileName", "${QUELTA_HOME}/b", Pathname("/srv/q")));
     EXPECT_EQ("/srv/q/b", appender._filename);
 }
 
-TEST(LogAppender, numbersArePlainDecimalsThatFit) {
+TEST(LogAppender, NumbersArePlainDecimalsThatFit) {
     const struct {
         const char* text;
         bool size;
@@ -176,7 +176,7 @@ TEST(LogAppender, numbersArePlainDecimalsThatFit) {
     }
 }
 
-TEST(LogAppender, layoutsAreSelectedByName) {
+TEST(LogAppender, LayoutsAreSelectedByName) {
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("layout", "PatternLayout", NO_HOME));
     EXPECT_EQ(nullptr, appender._fmt);
@@ -192,7 +192,7 @@ TEST(LogAppender, layoutsAreSelectedByName) {
     EXPECT_EQ("", formatted(appender._fmt, "text"));
 }
 
-TEST(LogAppender, namedLayoutsAreShared) {
+TEST(LogAppender, NamedLayoutsAreShared) {
     LogAppender a;
     LogAppender b;
     for (const char* const name : {"BasicLayout", "SimpleLayout"}) {
@@ -202,7 +202,7 @@ TEST(LogAppender, namedLayoutsAreShared) {
     }
 }
 
-TEST(LogAppender, unknownKeysAndLayoutsChangeNothing) {
+TEST(LogAppender, UnknownKeysAndLayoutsChangeNothing) {
     const struct {
         const char* key;
         const char* value;
@@ -232,7 +232,7 @@ TEST(LogAppender, unknownKeysAndLayoutsChangeNothing) {
     }
 }
 
-TEST(LogAppender, setupWithoutFileTurnsToStandardErrorAndSaysWhatItIgnores) {
+TEST(LogAppender, SetupWithoutFileTurnsToStandardErrorAndSaysWhatItIgnores) {
     const struct {
         long long maxSize;
         unsigned backups;
@@ -266,7 +266,7 @@ TEST(LogAppender, setupWithoutFileTurnsToStandardErrorAndSaysWhatItIgnores) {
     }
 }
 
-TEST(LogAppender, setupWithADescriptorButNoFileDoesNotComplainAboutIt) {
+TEST(LogAppender, SetupWithADescriptorButNoFileDoesNotComplainAboutIt) {
     const StderrCapture err;
     LogAppender appender;
     appender._fd = FileDescriptor(STDOUT_FILENO);
@@ -275,7 +275,7 @@ TEST(LogAppender, setupWithADescriptorButNoFileDoesNotComplainAboutIt) {
     EXPECT_EQ(STDOUT_FILENO, appender._fd._osdep);
 }
 
-TEST(LogAppender, setupIgnoresBackupsWithoutALimit) {
+TEST(LogAppender, SetupIgnoresBackupsWithoutALimit) {
     const TempDir dir;
     const StderrCapture err;
     const FileAppender log(dir.file("a.log"), 0, 3);
@@ -284,14 +284,14 @@ TEST(LogAppender, setupIgnoresBackupsWithoutALimit) {
     EXPECT_EQ(0U, log._maxBackupIndex);
 }
 
-TEST(LogAppender, setupCreatesTheFileAndClosesItAgain) {
+TEST(LogAppender, SetupCreatesTheFileAndClosesItAgain) {
     const TempDir dir;
     const FileAppender log(dir.file("a.log"), 10, 1);
     EXPECT_EQ("", readFile(dir.file("a.log")));
     EXPECT_FALSE(log._fd.valid());
 }
 
-TEST(LogAppender, setupKeepsItsOwnLayout) {
+TEST(LogAppender, SetupKeepsItsOwnLayout) {
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("layout", "SimpleLayout", NO_HOME));
     const LogFormat* const layout = appender._fmt;
@@ -300,7 +300,7 @@ TEST(LogAppender, setupKeepsItsOwnLayout) {
     EXPECT_EQ(layout, appender._fmt);
 }
 
-TEST(LogAppender, setupReportsAPathThatCannotBeOpenedAndTriesAgainWithEachLine) {
+TEST(LogAppender, SetupReportsAPathThatCannotBeOpenedAndTriesAgainWithEachLine) {
     const TempDir dir;
     const std::string file = dir.file("missing/a.log");
     const std::string report = "Error opening \"" + file + "\": No such file or directory\n";
@@ -315,7 +315,7 @@ TEST(LogAppender, setupReportsAPathThatCannotBeOpenedAndTriesAgainWithEachLine) 
     EXPECT_EQ("written\n", readFile(file));
 }
 
-TEST(LogAppender, setupClosesAFileThatAReportHasAlreadyOpened) {
+TEST(LogAppender, SetupClosesAFileThatAReportHasAlreadyOpened) {
     const TempDir dir;
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("fileName", dir.file("a.log").c_str(), NO_HOME));
@@ -329,7 +329,7 @@ TEST(LogAppender, setupClosesAFileThatAReportHasAlreadyOpened) {
     EXPECT_EQ("before the setup\n", readFile(dir.file("a.log")));
 }
 
-TEST(LogAppender, appendsToAnExistingFile) {
+TEST(LogAppender, AppendsToAnExistingFile) {
     const TempDir dir;
     writeFile(dir.file("a.log"), "old\n");
     FileAppender log(dir.file("a.log"));
@@ -338,7 +338,7 @@ TEST(LogAppender, appendsToAnExistingFile) {
     EXPECT_EQ(8, log._curSize);
 }
 
-TEST(LogAppender, writesTheMessageAsItStands) {
+TEST(LogAppender, WritesTheMessageAsItStands) {
     const TempDir dir;
     FileAppender log(dir.file("a.log"));
     const std::string message("%s %n \0 \x80\xff\n\x1b[0m", 16);
@@ -346,7 +346,7 @@ TEST(LogAppender, writesTheMessageAsItStands) {
     EXPECT_EQ(message + "\n", readFile(dir.file("a.log")));
 }
 
-TEST(LogAppender, aLineWithoutTextIsNoFailure) {
+TEST(LogAppender, ALineWithoutTextIsNoFailure) {
     const TempDir dir;
     const StderrCapture err;
     LogAppender appender;
@@ -359,7 +359,7 @@ TEST(LogAppender, aLineWithoutTextIsNoFailure) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppender, createsFilesWithTheUsualPermissionsLessTheMask) {
+TEST(LogAppender, CreatesFilesWithTheUsualPermissionsLessTheMask) {
     const TempDir dir;
     for (const mode_t mask : {0U, 022U, 027U, 077U}) {
         const std::string file = dir.file("mask" + std::to_string(mask));
@@ -375,7 +375,7 @@ TEST(LogAppender, createsFilesWithTheUsualPermissionsLessTheMask) {
     }
 }
 
-TEST(LogAppender, aWriteErrorOnStandardErrorKeepsTheDescriptor) {
+TEST(LogAppender, AWriteErrorOnStandardErrorKeepsTheDescriptor) {
     LogAppender appender;
     appender._fmt = &defaultFormat();
     appender._fd = FileDescriptor(::open("/dev/full", O_WRONLY));
@@ -387,7 +387,7 @@ TEST(LogAppender, aWriteErrorOnStandardErrorKeepsTheDescriptor) {
     appender._fd.close();
 }
 
-TEST(LogAppender, aFullDeviceIsReportedForEachLineThatIsLost) {
+TEST(LogAppender, AFullDeviceIsReportedForEachLineThatIsLost) {
     const StderrCapture err;
     FileAppender log("/dev/full");
     errno = EDOM;
@@ -399,7 +399,7 @@ TEST(LogAppender, aFullDeviceIsReportedForEachLineThatIsLost) {
     EXPECT_EQ(report + report, err.text());
 }
 
-TEST(LogAppender, theSizeNeverOverflows) {
+TEST(LogAppender, TheSizeNeverOverflows) {
     const TempDir dir;
     FileAppender log(dir.file("a.log"));
     log.line("1");
@@ -410,7 +410,7 @@ TEST(LogAppender, theSizeNeverOverflows) {
     EXPECT_EQ(std::numeric_limits<file_offset_t>::max(), log._curSize);
 }
 
-TEST(LogAppender, destructionClosesTheFileButNotStandardError) {
+TEST(LogAppender, DestructionClosesTheFileButNotStandardError) {
     const TempDir dir;
     int descriptor = -1;
     {

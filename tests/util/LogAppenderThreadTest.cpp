@@ -89,7 +89,7 @@ LogChannel& channelOfReports() {
 
 }  // namespace
 
-TEST(LogAppenderThreads, noLineIsLostOrTornThroughRotation) {
+TEST(LogAppenderThreads, NoLineIsLostOrTornThroughRotation) {
     const unsigned LINES = 4000;
     const TempDir dir;
     const StderrCapture err;
@@ -107,7 +107,7 @@ TEST(LogAppenderThreads, noLineIsLostOrTornThroughRotation) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppenderThreads, noLineIsLostWhileTheFileIsMovedAway) {
+TEST(LogAppenderThreads, NoLineIsLostWhileTheFileIsMovedAway) {
     const unsigned LINES = 2000;
     const TempDir dir;
     const std::string file = dir.file("app.log");
@@ -140,7 +140,7 @@ TEST(LogAppenderThreads, noLineIsLostWhileTheFileIsMovedAway) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppenderThreads, twoAppendersOnOneChannelEachGetEveryLine) {
+TEST(LogAppenderThreads, TwoAppendersOnOneChannelEachGetEveryLine) {
     const unsigned LINES = 2000;
     const TempDir dir;
     FileAppender a(dir.file("a.log"), 20000, 1000);
@@ -156,7 +156,7 @@ TEST(LogAppenderThreads, twoAppendersOnOneChannelEachGetEveryLine) {
     expectAllLines(allGenerations(dir.file("b.log")), LINES);
 }
 
-TEST(LogAppenderThreads, appendersThatAllFailNeitherDeadlockNorRecurse) {
+TEST(LogAppenderThreads, AppendersThatAllFailNeitherDeadlockNorRecurse) {
     const unsigned LINES = 50;
     const TempDir dir;
     StderrCapture err;
@@ -190,7 +190,7 @@ TEST(LogAppenderThreads, appendersThatAllFailNeitherDeadlockNorRecurse) {
     b._mutex.NOLOG_unlock();
 }
 
-TEST(LogAppenderThreads, aFailingAppenderReportsThroughOneThatOthersAreWritingTo) {
+TEST(LogAppenderThreads, AFailingAppenderReportsThroughOneThatOthersAreWritingTo) {
     const unsigned LINES = 500;
     const TempDir dir;
     const StderrCapture err;
@@ -218,7 +218,7 @@ TEST(LogAppenderThreads, aFailingAppenderReportsThroughOneThatOthersAreWritingTo
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppenderThreads, theReportTakesNoLockOfTheFailingAppender) {
+TEST(LogAppenderThreads, TheReportTakesNoLockOfTheFailingAppender) {
     // Two threads whose failing appenders are each other's only listeners.
     const TempDir dir;
     const StderrCapture err;

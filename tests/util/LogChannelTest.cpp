@@ -82,6 +82,7 @@ TEST_F(LogChannelTest, ANewChannelCopiesTheRootChannelOfThatMoment) {
 }
 
 TEST_F(LogChannelTest, AFailedCreationLeavesNothingBehind) {
+    REQUIRE_ALLOCATION_PROBE();
     rootChannel()._appenders = {&_a1};
     const std::string name(100, 'n');
     // The map's entry, its name, the channel and its list of appenders.

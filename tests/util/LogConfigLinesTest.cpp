@@ -64,7 +64,7 @@ Skipped skip(const char* behindOpening, const std::string& contents) {
 
 }  // namespace
 
-TEST(ReadLine, splitsEveryShortTextAtItsLineFeeds) {
+TEST(ReadLine, SplitsEveryShortTextAtItsLineFeeds) {
     const char alphabet[] = {'a', '\0', '\n', '\r'};
     for (unsigned length = 0; length <= 6; ++length) {
         for (unsigned code = 0; code < 1U << (2 * length); ++code) {
@@ -77,7 +77,7 @@ TEST(ReadLine, splitsEveryShortTextAtItsLineFeeds) {
     }
 }
 
-TEST(ReadLine, joinsThePiecesOfLongLines) {
+TEST(ReadLine, JoinsThePiecesOfLongLines) {
     for (const std::size_t middle : {127U, 254U, 381U, 1270U, 10000U}) {
         for (std::size_t length = middle - 3; length <= middle + 3; ++length) {
             const std::string line(length, 'x');
@@ -91,7 +91,7 @@ TEST(ReadLine, joinsThePiecesOfLongLines) {
     }
 }
 
-TEST(ReadLine, keepsEveryByteButTheLineFeed) {
+TEST(ReadLine, KeepsEveryByteButTheLineFeed) {
     std::string line;
     for (int byte = 0; byte < 256; ++byte) {
         if (byte != '\n') {
@@ -101,7 +101,7 @@ TEST(ReadLine, keepsEveryByteButTheLineFeed) {
     EXPECT_EQ((Lines{line, line}), linesOf(line + "\n" + line));
 }
 
-TEST(ReadLine, afterTheEndThereAreNoMoreLines) {
+TEST(ReadLine, AfterTheEndThereAreNoMoreLines) {
     const File file = fileWith("only");
     std::string line;
     EXPECT_TRUE(read_line(line, file.get()));
@@ -109,7 +109,7 @@ TEST(ReadLine, afterTheEndThereAreNoMoreLines) {
     EXPECT_FALSE(read_line(line, file.get()));
 }
 
-TEST(HandleXmlComment, appendsWhatFollowsTheEnd) {
+TEST(HandleXmlComment, AppendsWhatFollowsTheEnd) {
     const struct {
         const char* behindOpening;
         const char* contents;
@@ -136,7 +136,7 @@ TEST(HandleXmlComment, appendsWhatFollowsTheEnd) {
     }
 }
 
-TEST(HandleXmlComment, failsAtTheEndOfTheFileWithTheResultAsItWas) {
+TEST(HandleXmlComment, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
     for (const char* const contents : {"", "one\ntwo\n", "->", "--\n>"}) {
         const Skipped skipped = skip(" open", contents);
         EXPECT_FALSE(skipped.closed) << contents;
@@ -145,7 +145,7 @@ TEST(HandleXmlComment, failsAtTheEndOfTheFileWithTheResultAsItWas) {
     }
 }
 
-TEST(HandleXmlComment, nulBytesDoNotHideTheEnd) {
+TEST(HandleXmlComment, NulBytesDoNotHideTheEnd) {
     using namespace std::string_literals;
     const Skipped skipped = skip("", "a\0b\0-->x\0y\nnext\n"s);
     EXPECT_TRUE(skipped.closed);

@@ -80,7 +80,7 @@ std::vector<LogAppender*> appendersNamed(const std::vector<std::string>& names) 
 
 }  // namespace
 
-TEST_F(LogConfig, exampleRunsEndToEnd) {
+TEST_F(LogConfig, ExampleRunsEndToEnd) {
     fs::create_directories(_dir.file("var/log"));
     const char* const config =
         "# logging for the command-line tools\n"
@@ -116,7 +116,7 @@ TEST_F(LogConfig, exampleRunsEndToEnd) {
                                       time + "FATAL Rete - the end\n"));
 }
 
-TEST_F(LogConfig, anEmptyFileLeavesTheDefaults) {
+TEST_F(LogConfig, AnEmptyFileLeavesTheDefaults) {
     for (const char* const config : {"", "\n\n", "# nothing\n \t \n", "<!-- a -->\n"}) {
         const ChildRun run = configured(config, [](bool complete) {
             EXPECT_TRUE(complete);
@@ -131,7 +131,7 @@ TEST_F(LogConfig, anEmptyFileLeavesTheDefaults) {
     }
 }
 
-TEST_F(LogConfig, aMissingFileIsReportedAndLeavesLoggingUsable) {
+TEST_F(LogConfig, AMissingFileIsReportedAndLeavesLoggingUsable) {
     const struct {
         std::string file;
         const char* error;
@@ -158,7 +158,7 @@ TEST_F(LogConfig, aMissingFileIsReportedAndLeavesLoggingUsable) {
     }
 }
 
-TEST_F(LogConfig, aFolderReadsLikeAnEmptyFile) {
+TEST_F(LogConfig, AFolderReadsLikeAnEmptyFile) {
     const ChildRun run = inChild([&] {
         EXPECT_TRUE(Logger::initialize(Pathname(_dir.path()), Pathname()));
         Logger("any").info("usable");
@@ -167,7 +167,7 @@ TEST_F(LogConfig, aFolderReadsLikeAnEmptyFile) {
     EXPECT_EQ("usable\n", run.err);
 }
 
-TEST_F(LogConfig, aPipeIsReadAsItComes) {
+TEST_F(LogConfig, APipeIsReadAsItComes) {
     ASSERT_EQ(0, ::mkfifo(_cfg.c_str(), 0600));
     const pid_t writer = ::fork();
     if (writer == 0) {
@@ -187,7 +187,7 @@ TEST_F(LogConfig, aPipeIsReadAsItComes) {
     EXPECT_EQ(parseError(2, "bad"), run.err);
 }
 
-TEST_F(LogConfig, initializingTwiceIsAnError) {
+TEST_F(LogConfig, InitializingTwiceIsAnError) {
     writeFile(_cfg, "");
     EXPECT_DEATH(
         {
@@ -197,7 +197,7 @@ TEST_F(LogConfig, initializingTwiceIsAnError) {
         "src/util/LogConfig.cpp:[0-9]+: failed assertion `!logger_initialized'");
 }
 
-TEST_F(LogConfig, keysMayCarryThePrefixOnce) {
+TEST_F(LogConfig, KeysMayCarryThePrefixOnce) {
     const ChildRun run = configured(
         "  log4cpp.rootCategory = DEBUG\n"
         "log4cpp.category.X=ERROR\n"
@@ -223,7 +223,7 @@ TEST_F(LogConfig, keysMayCarryThePrefixOnce) {
               run.err);
 }
 
-TEST_F(LogConfig, everyBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
+TEST_F(LogConfig, EveryBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
     const std::vector<std::string> bad = {
         "rootCategory",
         "rootCategory WARN",
@@ -291,7 +291,7 @@ TEST_F(LogConfig, everyBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
     EXPECT_EQ(expected, run.err);
 }
 
-TEST_F(LogConfig, anAppenderIsMadeByEachLineThatNamesOne) {
+TEST_F(LogConfig, AnAppenderIsMadeByEachLineThatNamesOne) {
     const ChildRun run = configured(
         "appender.A=FileAppender\n"
         "appender.B = \n"
@@ -307,7 +307,7 @@ TEST_F(LogConfig, anAppenderIsMadeByEachLineThatNamesOne) {
     EXPECT_THAT(run.err, testing::HasSubstr("Appender \"E\" has no filename, assuming stderr\n"));
 }
 
-TEST_F(LogConfig, blanksAroundNamesAndValuesAreDropped) {
+TEST_F(LogConfig, BlanksAroundNamesAndValuesAreDropped) {
     const ChildRun run = configured(
         " \trootCategory \t= \tWARN , A \t\n"
         "category. X = DEBUG\n"
@@ -327,7 +327,7 @@ TEST_F(LogConfig, blanksAroundNamesAndValuesAreDropped) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, theLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
+TEST_F(LogConfig, TheLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
     const ChildRun run = configured(
         "rootCategory=BOGUS\n"
         "rootCategory=ERROR,nobody\n"
@@ -342,7 +342,7 @@ TEST_F(LogConfig, theLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
     EXPECT_EQ(parseErrors({{3, "rootCategory"}, {2, "rootCategory=ERROR,nobody"}}), run.err);
 }
 
-TEST_F(LogConfig, errorsAreReportedLinesFirstThenRootThenCategories) {
+TEST_F(LogConfig, ErrorsAreReportedLinesFirstThenRootThenCategories) {
     EXPECT_EQ(parseErrors({{2, "first"},
                            {5, "second"},
                            {3, "rootCategory = WARN nobody"},
@@ -359,7 +359,7 @@ TEST_F(LogConfig, errorsAreReportedLinesFirstThenRootThenCategories) {
                         "category.\n"));
 }
 
-TEST_F(LogConfig, anUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppenders) {
+TEST_F(LogConfig, AnUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppenders) {
     const ChildRun run = configured("rootCategory=WARN,A\n" + fileLine("A") + "category.X=INFO,B\n",
                                     [&](bool complete) {
                                         EXPECT_TRUE(complete);
@@ -372,7 +372,7 @@ TEST_F(LogConfig, anUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppend
     EXPECT_EQ(parseError(3, "X=INFO,B"), readFile(logFile("A")));
 }
 
-TEST_F(LogConfig, theOrderOfTheLinesDoesNotMatter) {
+TEST_F(LogConfig, TheOrderOfTheLinesDoesNotMatter) {
     std::vector<std::string> lines = {"rootCategory=WARN,A,B\n",
                                       "category.X=DEBUG\n",
                                       "category.Y=ERROR,B\n",
@@ -413,7 +413,7 @@ TEST_F(LogConfig, theOrderOfTheLinesDoesNotMatter) {
     }
 }
 
-TEST_F(LogConfig, attributesTakeEffectInTheOrderOfTheFile) {
+TEST_F(LogConfig, AttributesTakeEffectInTheOrderOfTheFile) {
     const ChildRun run = configured("appender.A.fileName=" + _dir.file("one") + "\n" +
                                         "appender.A.fileName=.two\n"
                                         "appender.A.layout=BasicLayout\n"
@@ -430,7 +430,7 @@ TEST_F(LogConfig, attributesTakeEffectInTheOrderOfTheFile) {
     EXPECT_EQ("", readFile(_dir.file("one.two")));
 }
 
-TEST_F(LogConfig, setupsAreReportedInNameOrderBeforeBadLines) {
+TEST_F(LogConfig, SetupsAreReportedInNameOrderBeforeBadLines) {
     EXPECT_EQ(
         "Appender \"A\" has no filename, assuming stderr\n"
         "Error opening \"" +
@@ -444,7 +444,7 @@ TEST_F(LogConfig, setupsAreReportedInNameOrderBeforeBadLines) {
                   "appender.A=x\n"));
 }
 
-TEST_F(LogConfig, theRootAppenderTakesAttributesButNoSetup) {
+TEST_F(LogConfig, TheRootAppenderTakesAttributesButNoSetup) {
     const ChildRun run = configured(
         "appender.rootAppender=x\n"
         "appender.rootAppender.layout=SimpleLayout\n"
@@ -460,7 +460,7 @@ TEST_F(LogConfig, theRootAppenderTakesAttributesButNoSetup) {
     EXPECT_EQ("WARN    : " + parseError(5, "bad") + "DEBUG   : text\n", run.err);
 }
 
-TEST_F(LogConfig, appendersWithoutALayoutTakeTheRootAppenders) {
+TEST_F(LogConfig, AppendersWithoutALayoutTakeTheRootAppenders) {
     const ChildRun run = configured(
         "rootCategory=DEBUG,A\n" + fileLine("A") + "appender.rootAppender.layout=SimpleLayout\n",
         [&](bool) { Logger("any").info("text"); });
@@ -468,7 +468,7 @@ TEST_F(LogConfig, appendersWithoutALayoutTakeTheRootAppenders) {
     EXPECT_EQ("INFO    : text\n", readFile(logFile("A")));
 }
 
-TEST_F(LogConfig, reportsReachTheChannelOfThatName) {
+TEST_F(LogConfig, ReportsReachTheChannelOfThatName) {
     const ChildRun run = configured("rootCategory=WARN,A\n" + fileLine("A") + fileLine("L") +
                                         "category.Logger=WARN,L\n"
                                         "appender.L.layout.ConversionPattern=%p %c %m%n\n"
@@ -480,7 +480,7 @@ TEST_F(LogConfig, reportsReachTheChannelOfThatName) {
     EXPECT_EQ("WARN Logger " + parseError(6, "bad"), readFile(logFile("L")));
 }
 
-TEST_F(LogConfig, reportsBelowTheLevelOfTheirChannelAreDropped) {
+TEST_F(LogConfig, ReportsBelowTheLevelOfTheirChannelAreDropped) {
     const ChildRun run = configured(
         "category.Logger=ERROR\n"
         "bad\n"
@@ -490,7 +490,7 @@ TEST_F(LogConfig, reportsBelowTheLevelOfTheirChannelAreDropped) {
     EXPECT_EQ(_cfg + ":3: Unterminated XML comment started\n", run.err);
 }
 
-TEST_F(LogConfig, aBadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
+TEST_F(LogConfig, ABadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
     const ChildRun run = configured(
         "rootCategory=WARN,A,B\n"
         "appender.A.fileName=" +
@@ -505,7 +505,7 @@ TEST_F(LogConfig, aBadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
               readFile(logFile("B")));
 }
 
-TEST_F(LogConfig, aBadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardError) {
+TEST_F(LogConfig, ABadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardError) {
     const std::string report =
         "Error opening \"" + _dir.file("missing/a.log") + "\": No such file or directory\n";
     const ChildRun run = configured(
@@ -518,7 +518,7 @@ TEST_F(LogConfig, aBadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardEr
     EXPECT_EQ("ERROR   : " + report + "ERROR - " + report, run.err);
 }
 
-TEST_F(LogConfig, loggersMadeBeforeAreBoundToTheChannels) {
+TEST_F(LogConfig, LoggersMadeBeforeAreBoundToTheChannels) {
     writeFile(_cfg, "rootCategory=WARN\ncategory.X=DEBUG\n");
     const ChildRun run = inChild([&] {
         Logger x("X");
@@ -533,7 +533,7 @@ TEST_F(LogConfig, loggersMadeBeforeAreBoundToTheChannels) {
     EXPECT_EQ("x\n", run.err);
 }
 
-TEST_F(LogConfig, commentsAreRemovedAndLinesKeepTheirNumbers) {
+TEST_F(LogConfig, CommentsAreRemovedAndLinesKeepTheirNumbers) {
     const struct {
         const char* config;
         std::vector<std::pair<unsigned, std::string>> errors;
@@ -575,7 +575,7 @@ TEST_F(LogConfig, commentsAreRemovedAndLinesKeepTheirNumbers) {
     }
 }
 
-TEST_F(LogConfig, aCommentInAValueIsCutOutOfIt) {
+TEST_F(LogConfig, ACommentInAValueIsCutOutOfIt) {
     const ChildRun run = configured(
         "appender.A.fileName=" + _dir.file("a") + "<!-- not\nany\nmore -->.log # note\nbad\n",
         [&](bool) { EXPECT_EQ(logFile("a"), LogAppender::find("A", false)->_filename); });
@@ -583,7 +583,7 @@ TEST_F(LogConfig, aCommentInAValueIsCutOutOfIt) {
     EXPECT_EQ(parseError(4, "bad"), run.err);
 }
 
-TEST_F(LogConfig, anOpenCommentIsReportedWithTheLineWhereItBegan) {
+TEST_F(LogConfig, AnOpenCommentIsReportedWithTheLineWhereItBegan) {
     const struct {
         const char* config;
         unsigned lineno;
@@ -606,7 +606,7 @@ TEST_F(LogConfig, anOpenCommentIsReportedWithTheLineWhereItBegan) {
     }
 }
 
-TEST_F(LogConfig, theLastLineNeedsNoLineFeed) {
+TEST_F(LogConfig, TheLastLineNeedsNoLineFeed) {
     EXPECT_EQ(parseError(2, "bad"), reportsOf("\nbad"));
     const ChildRun run = configured("rootCategory=ALERT", [](bool complete) {
         EXPECT_TRUE(complete);
@@ -615,7 +615,7 @@ TEST_F(LogConfig, theLastLineNeedsNoLineFeed) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST_F(LogConfig, linesMayBeLong) {
+TEST_F(LogConfig, LinesMayBeLong) {
     const std::string longText(10000, 'x');
     const std::string blanks(10000, ' ');
     EXPECT_EQ(parseErrors({{1, longText}, {3, longText}, {4, "last"}}),
@@ -628,7 +628,7 @@ TEST_F(LogConfig, linesMayBeLong) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, manyCommentsOnOneLineTakeLinearTime) {
+TEST_F(LogConfig, ManyCommentsOnOneLineTakeLinearTime) {
     std::string config;
     for (int i = 0; i < 200000; ++i) {
         config += "<!---->";
@@ -636,7 +636,7 @@ TEST_F(LogConfig, manyCommentsOnOneLineTakeLinearTime) {
     EXPECT_EQ(parseError(1, "bad"), reportsOf(config + "bad\n"));
 }
 
-TEST_F(LogConfig, aCarriageReturnIsNoBlank) {
+TEST_F(LogConfig, ACarriageReturnIsNoBlank) {
     const ChildRun run = configured(
         "rootCategory=WARN\r\n"
         "\r\n"
@@ -656,7 +656,7 @@ TEST_F(LogConfig, aCarriageReturnIsNoBlank) {
               run.err);
 }
 
-TEST_F(LogConfig, nulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
+TEST_F(LogConfig, NulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
     const ChildRun run = configured(
         "category.X\0Y=DEBUG\n"
         "# \0 -->\n"
@@ -672,7 +672,7 @@ TEST_F(LogConfig, nulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, bytesBeyondAsciiAreOrdinary) {
+TEST_F(LogConfig, BytesBeyondAsciiAreOrdinary) {
     const ChildRun run = configured(
         "category.\xff\xfe\x80=DEBUG\n"
         "\xc3\n",
@@ -681,7 +681,7 @@ TEST_F(LogConfig, bytesBeyondAsciiAreOrdinary) {
     EXPECT_EQ(parseError(2, "\xc3"), run.err);
 }
 
-TEST_F(LogConfig, valuesMayHoldEqualsSignsAndPoints) {
+TEST_F(LogConfig, ValuesMayHoldEqualsSignsAndPoints) {
     const ChildRun run = configured(fileLine("A") +
                                         "appender.A.layout.ConversionPattern=a=b.c = %m\n"
                                         "category.a.b.c=DEBUG\n"
@@ -695,7 +695,7 @@ TEST_F(LogConfig, valuesMayHoldEqualsSignsAndPoints) {
     EXPECT_EQ(parseError(4, "a=b=DEBUG"), run.err);
 }
 
-TEST_F(LogConfig, twoHundredThousandLinesAreCounted) {
+TEST_F(LogConfig, TwoHundredThousandLinesAreCounted) {
     std::string config;
     for (int i = 1; i < 200000; ++i) {
         config += i % 2 == 0 ? "category.X=DEBUG\n" : "# note\n";

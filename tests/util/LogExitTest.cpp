@@ -34,7 +34,7 @@ struct LogsAtExit {
 
 }  // namespace
 
-TEST(LogExit, standardErrorIsClosedAfterTheLastMessage) {
+TEST(LogExit, StandardErrorIsClosedAfterTheLastMessage) {
     const TempDir dir;
     const ChildRun run = inChild([&] {
         static const LogsAtExit logsAtExit;
@@ -47,7 +47,7 @@ TEST(LogExit, standardErrorIsClosedAfterTheLastMessage) {
     EXPECT_EQ("closed", readFile(dir.file("verdict")));
 }
 
-TEST(LogExit, appendersAndTheirLayoutsServeDestructors) {
+TEST(LogExit, AppendersAndTheirLayoutsServeDestructors) {
     const struct {
         const char* layout;
         const char* expected;

@@ -164,6 +164,7 @@ TEST(LogFormatCalls, AShortDateNeedsOneCallPerPiece) {
 }
 
 TEST(LogFormatCalls, ALineAllocatesAtMostOnce) {
+    REQUIRE_ALLOCATION_PROBE();
     for (const char* const pattern :
          {"%m%n", "%d{%m-%d-%Y %H:%M:%S.%l} %-5p %c - %m%n", "%d %m%n", "%d{DATE} [%t] %p %m%n",
           "%R %p %c %m%n", "%-8p: %m%n", "%30d{ABSOLUTE} %.20c %.3d%n"}) {
@@ -175,12 +176,14 @@ TEST(LogFormatCalls, ALineAllocatesAtMostOnce) {
 }
 
 TEST(LogFormatCalls, ALineIntoARoomyStringDoesNotAllocate) {
+    REQUIRE_ALLOCATION_PROBE();
     std::string out;
     out.reserve(1000);
     EXPECT_EQ(0u, allocationsFor("%30d %d{%H%l} %-5p %08r %t %c - %m%n", "hello", out));
 }
 
 TEST(LogFormatCalls, ManyLinesInOneStringReallocateSeldom) {
+    REQUIRE_ALLOCATION_PROBE();
     const LogFormat layout("%m%n");
     const LogMsgMetadata mdata = stampedAt(logger, INFO, STAMP);
     std::string out;
@@ -194,6 +197,7 @@ TEST(LogFormatCalls, ManyLinesInOneStringReallocateSeldom) {
 }
 
 TEST(LogFormatCalls, AFailedAllocationLeavesTheOutputAsItWas) {
+    REQUIRE_ALLOCATION_PROBE();
     const TimeZone utc("UTC0");
     const LogFormat layout(
         "%m %c %200p %d{%H:%M:%S %A %A %A %A %A %A %A %A %A %A %A %A %A %A %A} %400d%n");
@@ -221,6 +225,7 @@ TEST(LogFormatCalls, AFailedAllocationLeavesTheOutputAsItWas) {
 }
 
 TEST(LogFormatCalls, AFailedAllocationWhileCompilingLeaksNothing) {
+    REQUIRE_ALLOCATION_PROBE();
     std::string pattern;
     for (int i = 0; i < 9; ++i) {
         pattern += "%d{%H:%M a long piece that is stored outside the string %l and another one} ";

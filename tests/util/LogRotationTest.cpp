@@ -48,7 +48,7 @@ const std::string LINE_OF_30(29, 'x');
 
 }  // namespace
 
-TEST(LogRotation, rotatesAfterTheLineThatPassesTheLimit) {
+TEST(LogRotation, RotatesAfterTheLineThatPassesTheLimit) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 100, 2);
     const std::string line = LINE_OF_30 + "\n";
@@ -65,7 +65,7 @@ TEST(LogRotation, rotatesAfterTheLineThatPassesTheLimit) {
     EXPECT_EQ((Files{{"app.log", line}, {"app.log.1", full}, {"app.log.2", full}}), filesIn(dir));
 }
 
-TEST(LogRotation, movesOnlyTheBackupsBelowTheFirstGap) {
+TEST(LogRotation, MovesOnlyTheBackupsBelowTheFirstGap) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 1, 3);
     writeFile(dir.file("app.log.1"), "one");
@@ -78,7 +78,7 @@ TEST(LogRotation, movesOnlyTheBackupsBelowTheFirstGap) {
               filesIn(dir));
 }
 
-TEST(LogRotation, everyPatternOfBackupsFollowsTheRule) {
+TEST(LogRotation, EveryPatternOfBackupsFollowsTheRule) {
     for (unsigned backups = 0; backups <= 5; ++backups) {
         for (unsigned present = 0; present < 32; ++present) {
             const TempDir dir;
@@ -99,7 +99,7 @@ TEST(LogRotation, everyPatternOfBackupsFollowsTheRule) {
     }
 }
 
-TEST(LogRotation, withoutBackupsTheFileIsDeletedAndBegunAnew) {
+TEST(LogRotation, WithoutBackupsTheFileIsDeletedAndBegunAnew) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 5, 0);
     log.line("12345");
@@ -108,7 +108,7 @@ TEST(LogRotation, withoutBackupsTheFileIsDeletedAndBegunAnew) {
     EXPECT_EQ((Files{{"app.log", "67\n"}}), filesIn(dir));
 }
 
-TEST(LogRotation, aLimitOfZeroIsNone) {
+TEST(LogRotation, ALimitOfZeroIsNone) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 0, 0);
     for (int i = 0; i < 100; ++i) {
@@ -118,7 +118,7 @@ TEST(LogRotation, aLimitOfZeroIsNone) {
     EXPECT_EQ(1U, filesIn(dir).size());
 }
 
-TEST(LogRotation, aLimitOfOneRotatesAfterEachLineThatHasAnyText) {
+TEST(LogRotation, ALimitOfOneRotatesAfterEachLineThatHasAnyText) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 1, 5);
     log.line("");
@@ -129,7 +129,7 @@ TEST(LogRotation, aLimitOfOneRotatesAfterEachLineThatHasAnyText) {
     EXPECT_EQ((Files{{"app.log", ""}, {"app.log.1", "a\n"}, {"app.log.2", "\n\n"}}), filesIn(dir));
 }
 
-TEST(LogRotation, aFileAtItsLimitExactlyIsNotRotated) {
+TEST(LogRotation, AFileAtItsLimitExactlyIsNotRotated) {
     const TempDir dir;
     for (const long long lines : {1LL, 2LL, 7LL}) {
         const std::string file = dir.file("exact" + std::to_string(lines));
@@ -144,7 +144,7 @@ TEST(LogRotation, aFileAtItsLimitExactlyIsNotRotated) {
     }
 }
 
-TEST(LogRotation, theSizeOfAnExistingFileCounts) {
+TEST(LogRotation, TheSizeOfAnExistingFileCounts) {
     const TempDir dir;
     writeFile(dir.file("app.log"), std::string(95, 'o'));
     FileAppender log(dir.file("app.log"), 100, 1);
@@ -156,7 +156,7 @@ TEST(LogRotation, theSizeOfAnExistingFileCounts) {
     EXPECT_EQ(0, log._curSize);
 }
 
-TEST(LogRotation, anExistingFileBeyondTheLimitTakesOneMoreLine) {
+TEST(LogRotation, AnExistingFileBeyondTheLimitTakesOneMoreLine) {
     const TempDir dir;
     writeFile(dir.file("app.log"), std::string(1000, 'o'));
     FileAppender log(dir.file("app.log"), 100, 1);
@@ -165,7 +165,7 @@ TEST(LogRotation, anExistingFileBeyondTheLimitTakesOneMoreLine) {
     EXPECT_EQ(1005U, readFile(dir.file("app.log.1")).size());
 }
 
-TEST(LogRotation, theNewFileIsTheOneThatIsWatched) {
+TEST(LogRotation, TheNewFileIsTheOneThatIsWatched) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 5, 2);
     log.line("12345", 1000);
@@ -177,7 +177,7 @@ TEST(LogRotation, theNewFileIsTheOneThatIsWatched) {
     EXPECT_EQ("9\n", readFile(dir.file("app.log")));
 }
 
-TEST(LogRotation, aBaseFileThatWasMovedAwayLeavesTheBackupsAlone) {
+TEST(LogRotation, ABaseFileThatWasMovedAwayLeavesTheBackupsAlone) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 5, 2);
     writeFile(dir.file("app.log.1"), "one");
@@ -187,7 +187,7 @@ TEST(LogRotation, aBaseFileThatWasMovedAwayLeavesTheBackupsAlone) {
     EXPECT_EQ((Files{{"app.log", ""}, {"app.log.1", "one"}, {"moved", "12\n345\n"}}), filesIn(dir));
 }
 
-TEST(LogRotation, theLargestNumberOfBackupsIsNoTrouble) {
+TEST(LogRotation, TheLargestNumberOfBackupsIsNoTrouble) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 1, UINT_MAX);
     log.line("1");
@@ -195,7 +195,7 @@ TEST(LogRotation, theLargestNumberOfBackupsIsNoTrouble) {
     EXPECT_EQ((Files{{"app.log", ""}, {"app.log.1", "2\n"}, {"app.log.2", "1\n"}}), filesIn(dir));
 }
 
-TEST(LogRotation, backupNamesAreTheFileNameAPointAndTheNumber) {
+TEST(LogRotation, BackupNamesAreTheFileNameAPointAndTheNumber) {
     LogAppender appender;
     ASSERT_TRUE(appender.setAttribute("fileName", "a/app.log", Pathname()));
     const struct {
@@ -212,7 +212,7 @@ TEST(LogRotation, backupNamesAreTheFileNameAPointAndTheNumber) {
     }
 }
 
-TEST(LogRotation, aFolderInTheWayOfABackupLeavesTheFilesAsTheyAre) {
+TEST(LogRotation, AFolderInTheWayOfABackupLeavesTheFilesAsTheyAre) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 1, 1);
     fs::create_directories(dir.file("app.log.1/occupied"));

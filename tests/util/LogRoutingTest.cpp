@@ -120,6 +120,7 @@ TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted)
 // Every allocation of a call fails once; whatever it is for, the message or its format comes out,
 // except when the fallback itself has no room.
 TEST(FallbackTest, ExhaustedMemoryLosesAMessageAtMost) {
+    REQUIRE_ALLOCATION_PROBE();
     Logger logger("name");
     Logger copy(logger);
     const std::string text(500, 'x');
@@ -144,6 +145,7 @@ TEST(FallbackTest, ExhaustedMemoryLosesAMessageAtMost) {
 }
 
 TEST(FallbackTest, AMessageThatItHasNoRoomForIsLost) {
+    REQUIRE_ALLOCATION_PROBE();
     const Logger logger("name");
     Logger copy(logger);
     const std::string longText(2000, 'y');
