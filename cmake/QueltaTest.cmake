@@ -14,6 +14,11 @@ function(quelta_test name)
     ${PROJECT_SOURCE_DIR}/src ${PROJECT_SOURCE_DIR}/tests)
   target_link_libraries(${name} PRIVATE ${arg_LIBS} quelta_util GTest::gmock GTest::gtest_main)
   target_compile_options(${name} PRIVATE -fno-access-control)
+  # The bulk of a build is the compilation of tests. Only the oracles, which compute, are worth
+  # optimizing; the library under test keeps the flags of its preset.
+  if(NOT "oracle" IN_LIST arg_LABELS)
+    target_compile_options(${name} PRIVATE -O0 -g1)
+  endif()
   target_compile_definitions(${name} PRIVATE ${arg_DEFINES})
   foreach(function ${arg_WRAP})
     target_link_options(${name} PRIVATE -Wl,--wrap=${function})
