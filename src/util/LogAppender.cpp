@@ -1,10 +1,12 @@
 #include "util/LogAppender.h"
 
+#include <pthread.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <charconv>
-#include <cstring>
 #include <limits>
 #include <memory>
 #include <new>
@@ -91,6 +93,8 @@ LogAppender& rootAppender() {
         Root() {
             appender->_fd = FileDescriptor(STDERR_FILENO);
             appender->_fmt = &defaultFormat();
+            ::pthread_atfork(&LogAppender::lockAll, &LogAppender::unlockAll,
+                             &LogAppender::unlockAll);
         }
         ~Root() { appender->closeFd(); }
     };
@@ -109,6 +113,21 @@ LogAppender::~LogAppender() noexcept {
     if (!_filename.empty()) {
         closeFd();
     }
+}
+
+// Around a fork: the child has only the forking thread, so no other may hold a lock then.
+void LogAppender::lockAll() {
+    rootAppender()._mutex.NOLOG_lock();
+    for (const auto& [name, appender] : appenders()) {
+        appender->_mutex.NOLOG_lock();
+    }
+}
+
+void LogAppender::unlockAll() {
+    for (const auto& [name, appender] : appenders()) {
+        appender->_mutex.NOLOG_unlock();
+    }
+    rootAppender()._mutex.NOLOG_unlock();
 }
 
 LogAppender* LogAppender::find(const std::string& name, bool create) {

@@ -21,6 +21,9 @@
 // describe the file behind `_fd` and mean nothing while it is closed. An appender without a file
 // name writes to the descriptor that it has and is never rotated.
 //
+// A fork waits for the lines that named appenders are writing, so the child finds them unlocked and
+// may log, too.
+//
 // Configured before other threads start; safe from any thread afterwards (serialised by `_mutex`).
 
 #include <sys/types.h>
@@ -87,6 +90,9 @@ private:
     friend LogAppender& rootAppender();
     struct Failure;
     enum class Problem { NONE, OPEN, FSTAT, WRITE };
+
+    static void lockAll();
+    static void unlockAll();
 
     void setFileName(std::string_view value, const Pathname& queltaHome);
     bool setLayout(std::string_view name);

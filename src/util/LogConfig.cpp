@@ -1,5 +1,6 @@
 #include "util/LogConfig.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <memory>

@@ -1,6 +1,8 @@
 // Appenders under several threads.
 
 #include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
@@ -234,4 +236,48 @@ TEST(LogAppenderThreads, TheReportTakesNoLockOfTheFailingAppender) {
     channel._appenders.clear();
     const std::string text = err.text();
     EXPECT_EQ(THREADS * 200, std::count(text.begin(), text.end(), '\n'));
+}
+
+TEST(LogAppenderThreads, AChildOfAForkLogsWhileOtherThreadsDo) {
+    const unsigned FORKS = 60;
+    const TempDir dir;
+    LogAppender& log = *LogAppender::find("fork", true);
+    ASSERT_TRUE(log.setAttribute("fileName", dir.file("app.log").c_str(), Pathname()));
+    log.finalSetup("fork");
+    std::atomic<bool> done = false;
+    std::vector<std::thread> threads;
+    for (unsigned t = 0; t < 4; ++t) {
+        threads.emplace_back([&] {
+            while (!done) {
+                log.write(stampedAt(1000), "parent");
+            }
+        });
+    }
+    for (unsigned number = 0; number < FORKS; ++number) {
+        const pid_t child = ::fork();
+        if (child == 0) {
+            ::alarm(10);  // ends a child that waits for a lock that nobody will free
+            log.write(stampedAt(1000), "child " + std::to_string(number));
+            ::_exit(0);
+        }
+        int status = -1;
+        EXPECT_EQ(child, ::waitpid(child, &status, 0));
+        EXPECT_EQ(0, status);
+        if (status != 0) {
+            break;
+        }
+    }
+    done = true;
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    std::istringstream in(readFile(dir.file("app.log")));
+    unsigned next = 0;
+    for (std::string line; std::getline(in, line);) {
+        if (line != "parent") {
+            EXPECT_EQ("child " + std::to_string(next), line);
+            ++next;
+        }
+    }
+    EXPECT_EQ(FORKS, next);
 }
