@@ -129,7 +129,9 @@ TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifferen
     for (const auto& row : rows) {
         for (const bool home : {true, false}) {
             const char* const name = home ? "QUELTA_HOME" : "QUELTA_DB";
-            ASSERT_EQ(0, ::setenv(name, row.value, 1));
+            // The very text that the environment points at, to tell it from an equal one.
+            std::string setting = std::string(name) + '=' + row.value;
+            ASSERT_EQ(0, ::putenv(setting.data()));
             const char* const before = std::getenv(name);
             LoaderInfo info;
             info._queltaHome = "/old";
