@@ -31,7 +31,7 @@ constexpr std::size_t ERROR_TEXT_SIZE = 1000;
 
 // A C library that does not tell the length it needs is given up at this buffer size: the format
 // is at fault then (a wide character that has no multibyte form, say), and no size would do.
-constexpr std::size_t MAX_GUESSED_SIZE = 1024 * 1024;
+constexpr std::size_t MAX_GUESSED_SIZE = std::size_t{1024} * 1024;
 
 // The format with every "%m" replaced by the text of `errnum`.
 std::string withErrorText(const char* fmt, int errnum) {
@@ -97,9 +97,11 @@ Logger::Logger(const Logger& other)
 
 // The link stays: it belongs to this logger's place in the list, if it has one.
 Logger& Logger::operator=(const Logger& other) {
-    _channel_name = other._channel_name;
-    _channel_name_len = other._channel_name_len;
-    _channel = other._channel;
+    if (this != &other) {
+        _channel_name = other._channel_name;
+        _channel_name_len = other._channel_name_len;
+        _channel = other._channel;
+    }
     return *this;
 }
 
