@@ -10,7 +10,6 @@
 #include <memory>
 
 #include "util/ErrnoKeeper.h"
-#include "util/Pathname.h"
 
 static_assert(sizeof(off_t) == 8, "offsets need 64 bits; build with -D_FILE_OFFSET_BITS=64");
 

@@ -1,7 +1,8 @@
 #ifndef QUELTA_UTIL_FILEDESCRIPTOR_H_
 #define QUELTA_UTIL_FILEDESCRIPTOR_H_
 
-// A POSIX file descriptor as a value. Files are opened by the open operations of Pathname.
+// A POSIX file descriptor as a value. Files are opened by the open operations of Pathname, which
+// is why this header brings paths along.
 //
 // The plain class copies the number, owns nothing and never closes by itself; the two scoped
 // classes close at the end of their scope. Any negative number means "no file". Every failure is a
@@ -17,7 +18,7 @@
 #include <cstdarg>
 #include <string>
 
-class Pathname;
+#include "util/Pathname.h"
 
 class FileDescriptor {
 public:

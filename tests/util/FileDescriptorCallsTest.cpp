@@ -16,7 +16,6 @@
 
 #include "support/ScriptedCalls.h"
 #include "support/TempDir.h"
-#include "util/Pathname.h"
 
 namespace {
 
@@ -515,6 +514,15 @@ TYPED_TEST(ScopedFileDescriptorTest, ClosesAtTheEndOfItsScopeAndKeepsErrno) {
     }
     EXPECT_EQ(1u, this->closes());
     EXPECT_EQ(ENOENT, errno);
+}
+
+TYPED_TEST(ScopedFileDescriptorTest, ClosesNothingThatIsClosedAlready) {
+    {
+        TypeParam owner(FileDescriptor(5000));
+        EXPECT_TRUE(owner.close());
+        EXPECT_EQ(-1, owner._osdep);
+    }
+    EXPECT_EQ(1u, this->closes());
 }
 
 TYPED_TEST(ScopedFileDescriptorTest, CopiesShareTheNumberAndEachCloses) {

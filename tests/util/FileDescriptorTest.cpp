@@ -7,12 +7,12 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdarg>
 #include <string>
 #include <thread>
 #include <type_traits>
 
 #include "support/TempDir.h"
-#include "util/Pathname.h"
 
 namespace {
 
@@ -65,6 +65,33 @@ TEST(FileDescriptorTest, IsValidUnlessNegative) {
     EXPECT_TRUE(FileDescriptor(7).valid());
     EXPECT_FALSE(FileDescriptor(-1).valid());
     EXPECT_FALSE(FileDescriptor(-7).valid());
+}
+
+TEST(FileDescriptorTest, ANumberServesForADescriptor) {
+    EXPECT_TRUE((std::is_convertible_v<int, FileDescriptor>));
+    FileDescriptor file = -1;
+    EXPECT_FALSE(file.valid());
+    file = 7;
+    EXPECT_EQ(7, file._osdep);
+}
+
+TEST(FileDescriptorTest, ResultsHaveTheirTypes) {
+    const FileDescriptor none(-1);
+    const Pathname path;
+    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.read(nullptr, 0))>));
+    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.write(nullptr, 0))>));
+    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.write(std::string()))>));
+    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.writev(nullptr, 0u))>));
+    EXPECT_TRUE((std::is_same_v<void, decltype(none.format("x"))>));
+    EXPECT_TRUE((std::is_same_v<void, decltype(none.setCloseOnExec(true))>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(none.seek_set(0))>));
+    EXPECT_TRUE((std::is_same_v<long long, decltype(none.seekEof())>));
+    EXPECT_TRUE((std::is_same_v<long long, decltype(none.curPos())>));
+    EXPECT_TRUE((std::is_same_v<void, decltype(none.sync())>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(none.copyTo(none))>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(none.copyTo(path))>));
+    EXPECT_TRUE((std::is_same_v<FileDescriptor, decltype(path.openReadOnly())>));
+    EXPECT_TRUE((std::is_same_v<int, decltype(none._osdep)>));
 }
 
 TEST(FileDescriptorTest, CopiesTheNumberAndClosesNothing) {
@@ -316,6 +343,26 @@ TEST(FileDescriptorTest, FormatsAllItsArgumentsOnEveryPass) {
     EXPECT_EQ("42|" + text + "|x" + std::string(1, '\0') + "| 2.50", readFile(path));
 }
 
+// As a wrapper of the caller's own would use it; writes the text twice.
+__attribute__((format(printf, 2, 3))) void formatTwice(const FileDescriptor& file, const char* fmt,
+                                                       ...) {
+    std::va_list args;
+    va_start(args, fmt);
+    file.vformat(fmt, args);
+    file.vformat(fmt, args);
+    va_end(args);
+}
+
+TEST(FileDescriptorTest, VformatLeavesTheArgumentsToItsCaller) {
+    const TempDir dir;
+    const Pathname path = dir.file("a");
+    const std::string text = pattern(300);
+    const ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
+    formatTwice(file, "%d %s;", 5, "short");
+    formatTwice(file, "%s", text.c_str());
+    EXPECT_EQ("5 short;5 short;" + text + text, readFile(path));
+}
+
 TEST(FileDescriptorTest, CopiesFromTheOffsetToTheEnd) {
     const TempDir dir;
     const Pathname from = dir.file("from"), to = dir.file("to");
@@ -331,6 +378,29 @@ TEST(FileDescriptorTest, CopiesFromTheOffsetToTheEnd) {
         EXPECT_TRUE(in.copyTo(to)) << size;
         EXPECT_EQ(text.substr(size / 2), readFile(to));
     }
+}
+
+TEST(FileDescriptorTest, CopiesToADestinationOfAnyKind) {
+    const TempDir dir;
+    const Pathname from = dir.file("from"), to = dir.file("to");
+    writeFile(from, "text");
+    const ScopedFileDescriptor out = to.openCreateOnly(Pathname::CREATE_NORMAL);
+    const FileDescriptor plain(out);
+    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(out));
+    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(plain));
+    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(out._osdep));
+    EXPECT_EQ("texttexttext", readFile(to));
+    for (const char* name : {"literal", "string", "path"}) {
+        const std::string copy = dir.file(name);
+        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(copy.c_str()));
+        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(copy));
+        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(Pathname(copy)));
+        EXPECT_EQ("text", readFile(copy));
+    }
+}
+
+TEST(FileDescriptorTest, CopyingNothingNeedsNoDestination) {
+    EXPECT_TRUE(ScopedFileDescriptor(Pathname("/dev/null")).copyTo(FileDescriptor(-1)));
 }
 
 TEST(FileDescriptorTest, CopiesThroughPipes) {
@@ -424,6 +494,30 @@ TEST(ScopedFileDescriptorTest, OpensForReading) {
     const ScopedSaferFileDescriptor safer(path);
     EXPECT_EQ(O_RDONLY, ::fcntl(plain._osdep, F_GETFL) & (O_ACCMODE | O_NONBLOCK));
     EXPECT_EQ(O_RDONLY | O_NONBLOCK, ::fcntl(safer._osdep, F_GETFL) & (O_ACCMODE | O_NONBLOCK));
+    EXPECT_TRUE(ScopedFileDescriptor(path.c_str()).valid());
+    EXPECT_TRUE(ScopedSaferFileDescriptor(dir.file("a")).valid());
+}
+
+TEST(ScopedFileDescriptorTest, HoldsNoFileWhenItCannotBeOpened) {
+    const TempDir dir;
+    const Pathname absent = dir.file("absent");
+    errno = 0;
+    EXPECT_EQ(-1, ScopedFileDescriptor(absent)._osdep);
+    EXPECT_EQ(ENOENT, errno);
+    errno = 0;
+    EXPECT_EQ(-1, ScopedSaferFileDescriptor(absent)._osdep);
+    EXPECT_EQ(ENOENT, errno);
+}
+
+TEST(ScopedFileDescriptorTest, TakesWhatAnOpenReturns) {
+    const TempDir dir;
+    const Pathname path = dir.file("a");
+    ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
+    const int first = file._osdep;
+    EXPECT_TRUE(isOpen(first));
+    file = path.openReadOnly();
+    EXPECT_FALSE(isOpen(first)) << "the new file is open before the old one is closed";
+    EXPECT_TRUE(isOpen(file._osdep));
 }
 
 }  // namespace
