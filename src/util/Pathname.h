@@ -177,8 +177,10 @@ public:
 
     PathList() = default;
     // The elements of a separated list; see push_back_separated.
-    explicit PathList(const char* list, char separator = listSep);
-    explicit PathList(const std::string& list, char separator = listSep);
+    PathList(const char* list, char separator);
+    PathList(const std::string& list, char separator);
+    explicit PathList(const char* list) : PathList(list, listSep) {}
+    explicit PathList(const std::string& list) : PathList(list, listSep) {}
     // The elements of an ordered set, in its order.
     PathList(std::set<Pathname>::const_iterator first, std::set<Pathname>::const_iterator last);
 

@@ -30,6 +30,11 @@ TEST(PathnameTest, NamesTheSpecialPaths) {
     EXPECT_EQ("/", Pathname::root);
     EXPECT_EQ(".", Pathname::cur);
     EXPECT_EQ("..", Pathname::parent);
+    for (const Pathname* path : {&Pathname::root, &Pathname::cur, &Pathname::parent}) {
+        EXPECT_FALSE(path->empty());
+    }
+    const char& separator = Pathname::sep;
+    EXPECT_EQ('/', separator);
 }
 
 TEST(PathnameTest, IsBuiltFromStrings) {
@@ -45,6 +50,35 @@ TEST(PathnameTest, IsBuiltFromStrings) {
     EXPECT_EQ("a/b", assigned);
     assigned = "c";
     EXPECT_EQ("c", assigned);
+    EXPECT_TRUE((std::is_convertible_v<const char*, Pathname>));
+    EXPECT_TRUE((std::is_convertible_v<std::string, Pathname>));
+}
+
+TEST(PathnameTest, ComparesAsTheStringItIs) {
+    const Pathname path("a/b"), later("a/c");
+    const std::string text = "a/b";
+    EXPECT_TRUE(path == "a/b" && "a/b" == path && path == text && text == path);
+    EXPECT_TRUE(path != later && path < later && path < "b" && later > text);
+    EXPECT_EQ("a/b.c", path + ".c");
+    EXPECT_EQ(3u, path.length());
+    EXPECT_STREQ("a/b", path.c_str());
+}
+
+TEST(PathnameTest, PathsComeBackAsPathsAndTextsAsTexts) {
+    const Pathname path("a/b.c");
+    Pathname changed;
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(path / "x")>));
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(path / std::string())>));
+    EXPECT_TRUE((std::is_same_v<Pathname&, decltype(changed /= "x")>));
+    EXPECT_TRUE((std::is_same_v<Pathname&, decltype(changed /= std::string())>));
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(path.toParent())>));
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(path.toLeaf())>));
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(Pathname::removeDoubleSeps("x"))>));
+    EXPECT_TRUE((std::is_same_v<Pathname, decltype(Pathname::removeDoubleSeps(path))>));
+    EXPECT_TRUE((std::is_same_v<std::string, decltype(path.ext())>));
+    EXPECT_TRUE((std::is_same_v<std::string, decltype(path.basenameWithoutExt())>));
+    EXPECT_TRUE((std::is_same_v<std::string, decltype(path.shellQuoted())>));
+    EXPECT_TRUE((std::is_same_v<const Pathname, decltype(Pathname::root)>));
 }
 
 TEST(PathnameTest, IsAKeyOfOrderedContainers) {
@@ -128,6 +162,17 @@ TEST(PathnameTest, JoinsWithItself) {
         path = row.path;
         EXPECT_EQ(row.expected, path / path);
     }
+}
+
+TEST(PathnameTest, JoinsPathsAndGoesOn) {
+    const Pathname base("a"), elem("/b");
+    EXPECT_EQ("a/b", base / elem);
+    EXPECT_EQ("a/b/c/d", base / elem / "c" / std::string("d"));
+    Pathname path(base);
+    (path /= elem) /= "c";
+    EXPECT_EQ("a/b/c", path);
+    EXPECT_EQ("/x", Pathname::root / "x");
+    EXPECT_EQ("../x", Pathname::parent / "x");
 }
 
 TEST(PathnameTest, AddsAndRemovesTrailingSeparators) {
@@ -259,6 +304,7 @@ TEST(PathnameTest, CollapsesRunsOfSeparators) {
         Pathname path(row.path);
         EXPECT_EQ(row.expected, Pathname::removeDoubleSeps(path)) << row.path;
         EXPECT_EQ(row.expected, Pathname::removeDoubleSeps(row.path)) << row.path;
+        EXPECT_EQ(row.expected, Pathname::removeDoubleSeps(std::string(row.path))) << row.path;
         EXPECT_EQ(row.path, path);
         path.removeDoubleSeps();
         EXPECT_EQ(row.expected, path) << row.path;
@@ -323,6 +369,24 @@ TEST(PathListTest, IsAVectorAndNoMore) {
     EXPECT_TRUE((std::is_same_v<const char, decltype(PathList::listSep)>));
     EXPECT_EQ(':', PathList::listSep);
     EXPECT_TRUE(PathList().empty());
+    const char& separator = PathList::listSep;
+    EXPECT_EQ(':', separator);
+}
+
+TEST(PathListTest, UsesTheUsualSeparatorWhenNoneIsGiven) {
+    const std::vector<Pathname> expected = {"a", "b,c"};
+    EXPECT_EQ(expected, PathList("a:b,c"));
+    EXPECT_EQ(expected, PathList(std::string("a:b,c")));
+    PathList list;
+    list.push_back_separated("a:b,c");
+    EXPECT_EQ(expected, list);
+}
+
+TEST(PathListTest, MayBeWrittenInBracesWithItsSeparator) {
+    const PathList fromLiteral = {"a,b", ','};
+    const PathList fromString = {std::string("a,b"), ','};
+    EXPECT_EQ((std::vector<Pathname>{"a", "b"}), fromLiteral);
+    EXPECT_EQ(fromLiteral, fromString);
 }
 
 }  // namespace
