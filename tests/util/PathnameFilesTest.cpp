@@ -19,11 +19,13 @@
 
 namespace {
 
-// While it lives, each wrapped call is noted as text and fails with EIO.
+// While it lives, each wrapped call is noted as text and fails with EIO, or returns a chosen
+// number.
 struct CallLog {
-    CallLog() { current = this; }
+    explicit CallLog(int number = -1) : result(number) { current = this; }
     ~CallLog() { current = nullptr; }
 
+    const int result;
     std::vector<std::string> calls;
     static CallLog* current;
 };
@@ -48,7 +50,7 @@ auto logged(const std::string& call, Real real) -> decltype(real()) {
     if constexpr (std::is_pointer_v<Result>) {
         return nullptr;
     } else {
-        return -1;
+        return CallLog::current->result;
     }
 }
 
@@ -172,6 +174,47 @@ TEST(PathnameFilesTest, EachOperationMakesItsOneCallWithThePathUnchanged) {
     }
     EXPECT_EQ(7, mtime);
     EXPECT_EQ(7, size);
+}
+
+TEST(PathnameFilesTest, AnOperationIsTrueExactlyWhenItsCallReturnedZero) {
+    struct stat info;
+    char buf[8];
+    using Operation = std::function<bool()>;
+    const Operation operations[] = {
+        [&] { return odd.stat(&info); },
+        [&] { return odd.exists(); },
+        [&] { return odd.r_ok(); },
+        [&] { return odd.w_ok(); },
+        [&] { return odd.rw_ok(); },
+        [&] { return odd.mkdir(Pathname::MKDIR_PUBLIC); },
+        [&] { return odd.rmdir(); },
+        [&] { return odd.unlink(); },
+        [&] { return odd.remove(); },
+        [&] { return odd.truncate(0); },
+        // An empty link text is the only one that is true: see there.
+        [&] { return odd.readlink(buf, sizeof buf); },
+        [&] { return odd.symlinkTo("a"); },
+        [&] { return odd.renameTo("a"); },
+    };
+    for (const int result : {-1, 0, 1}) {
+        for (const Operation& operation : operations) {
+            CallLog log(result);
+            EXPECT_EQ(result == 0, operation()) << result;
+            ASSERT_EQ(1u, log.calls.size());
+        }
+    }
+}
+
+TEST(PathnameFilesTest, AnOpenHoldsWhateverNumberItGot) {
+    for (const int number : {0, 5000}) {
+        CallLog log(number);
+        EXPECT_EQ(number, odd.openReadOnly()._osdep);
+        EXPECT_EQ(number, odd.openReadOnlySafer()._osdep);
+        EXPECT_EQ(number, odd.openCreateOnly(Pathname::CREATE_NORMAL)._osdep);
+        EXPECT_EQ(number, odd.openCreateOrReplace(Pathname::CREATE_NORMAL)._osdep);
+        EXPECT_EQ(number, odd.openCreateOrAppend(Pathname::CREATE_NORMAL)._osdep);
+        EXPECT_EQ(number, odd.openReadWriteOrCreate(Pathname::CREATE_NORMAL)._osdep);
+    }
 }
 
 TEST(PathnameFilesTest, EachOpenUsesItsFlagsAndPermissions) {
