@@ -19,7 +19,11 @@ int __wrap_gettimeofday(struct timeval* now, void* zone) {
     return scriptedCall("gettimeofday", [&] { return __real_gettimeofday(now, zone); });
 }
 struct tm* __real_localtime_r(const time_t* seconds, struct tm* result);
+struct tm* anotherLocalTime = nullptr;  // what localtime_r returns instead, when set
 struct tm* __wrap_localtime_r(const time_t* seconds, struct tm* result) {
+    if (anotherLocalTime != nullptr) {
+        return anotherLocalTime;
+    }
     return scriptedCall("localtime_r", [&] { return __real_localtime_r(seconds, result); });
 }
 }
@@ -382,6 +386,40 @@ TEST(TimevalTest, LocaltimeAbortsWhenThereIsNoLocalTime) {
         testing::KilledBySignal(SIGABRT), "^$");
 }
 
+TEST(TimevalTest, LocaltimeAbortsWhenItIsGivenAnotherStructure) {
+    struct tm broken, other = {};
+    EXPECT_EXIT(
+        {
+            anotherLocalTime = &other;
+            at(0, 0).localtime(broken);
+        },
+        testing::KilledBySignal(SIGABRT), "^$");
+}
+
+TEST(TimevalTest, OperationsHaveTheirTypes) {
+    using Difference = long long (*)(const Timeval&, const Timeval&);
+    using Description = std::string (*)(const Timeval&, const Timeval&);
+    const Difference msecs = &Timeval::msecDifference, usecs = &Timeval::usecDifference;
+    const Description words = &Timeval::describeDifference;
+    void (Timeval::*const addSec)(unsigned int) = &Timeval::addSec;
+    void (Timeval::*const addMsec)(unsigned long long) = &Timeval::addMsec;
+    Timeval a = at(4, 500001);
+    const Timeval b = at(5, 0);
+    (a.*addSec)(1);
+    (a.*addMsec)(1500);
+    EXPECT_EQ("7:1", str(a));
+    EXPECT_EQ(2001, msecs(a, b));
+    EXPECT_EQ(2000000, usecs(a, b));
+    EXPECT_EQ("2000.0 milliseconds", words(a, b));
+    EXPECT_TRUE((std::is_same_v<Timeval, decltype(Timeval::now())>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(a < b)>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(a <= b)>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(a > b)>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(a >= b)>));
+    EXPECT_TRUE((std::is_same_v<struct timeval, decltype(a._tv)>));
+    EXPECT_TRUE(std::is_trivially_copyable_v<Timeval>);
+}
+
 TEST(CurrentTimevalTest, StartsAtTheCurrentTime) {
     const Timeval before = Timeval::now();
     const CurrentTimeval current;
@@ -392,7 +430,7 @@ TEST(CurrentTimevalTest, StartsAtTheCurrentTime) {
 
 TEST(CurrentTimevalTest, TakesBothFieldsOfATimeval) {
     CurrentTimeval current;
-    current = at(5, 7);
+    EXPECT_EQ(&current, &(current = at(5, 7)));
     EXPECT_EQ("5:7", str(current));
     const CurrentTimeval copy(current);
     EXPECT_EQ("5:7", str(copy));
