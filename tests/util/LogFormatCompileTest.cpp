@@ -2,10 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <cstdint>
+#include <ctime>
 #include <ostream>
 #include <string>
 #include <string_view>
+#include <type_traits>
 #include <vector>
 
 #include "util/LogFormat.h"
@@ -71,6 +74,45 @@ TEST(LogFormatCompile, KindsHaveTheirFixedValues) {
     EXPECT_EQ(8u, Atom::TIME_FMT);
     EXPECT_EQ(0u, LogFormattedDate::Atom::STRFTIME);
     EXPECT_EQ(1u, LogFormattedDate::Atom::MSEC);
+}
+
+TEST(LogFormatCompile, FieldsStandInTheirOrder) {
+    EXPECT_EQ(0u, offsetof(Atom, what));
+    EXPECT_LT(offsetof(Atom, what), offsetof(Atom, arg));
+    EXPECT_LT(offsetof(Atom, arg), offsetof(Atom, slen));
+    EXPECT_LT(offsetof(Atom, slen), offsetof(Atom, minw));
+    EXPECT_LT(offsetof(Atom, minw), offsetof(Atom, maxw));
+    EXPECT_LT(offsetof(Atom, maxw), offsetof(Atom, justify));
+
+    EXPECT_EQ(0u, offsetof(LogFormat, _fmt));
+    EXPECT_LT(offsetof(LogFormat, _fmt), offsetof(LogFormat, _atoms));
+    EXPECT_LT(offsetof(LogFormat, _atoms), offsetof(LogFormat, _atom_end));
+    EXPECT_LT(offsetof(LogFormat, _atom_end), offsetof(LogFormat, _max_atoms));
+
+    EXPECT_EQ(0u, offsetof(LogFormattedDate, _atoms));
+    EXPECT_LT(offsetof(LogFormattedDate, _atoms), offsetof(LogFormattedDate, _atom_end));
+    EXPECT_LT(offsetof(LogFormattedDate, _atom_end), offsetof(LogFormattedDate, _max_atoms));
+    EXPECT_LT(offsetof(LogFormattedDate, _max_atoms), offsetof(LogFormattedDate, _sstor));
+
+    EXPECT_EQ(0u, offsetof(CachedTm, _stamp));
+    EXPECT_LT(offsetof(CachedTm, _stamp), offsetof(CachedTm, _stampSet));
+}
+
+TEST(LogFormatCompile, FieldsHaveTheirTypes) {
+    Atom atom;
+    EXPECT_TRUE((std::is_same_v<const char*, decltype(atom.arg.str)>));
+    EXPECT_TRUE((std::is_same_v<const LogFormattedDate*, decltype(atom.arg.fdate)>));
+    EXPECT_TRUE((std::is_same_v<std::size_t, decltype(atom.slen)>));
+    EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(atom.minw)>));
+    EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(atom.maxw)>));
+    EXPECT_TRUE((std::is_same_v<char, decltype(atom.justify)>));
+    EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(LogFormat::_max_atoms)>));
+    EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(LogFormattedDate::_max_atoms)>));
+    EXPECT_TRUE((std::is_same_v<struct tm, decltype(CachedTm::_stamp)>));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(CachedTm::_stampSet)>));
+    EXPECT_TRUE((std::is_same_v<std::size_t (CachedTm::*)(char*, std::size_t, const char*,
+                                                          const LogMsgMetadata&),
+                                decltype(&CachedTm::ftime)>));
 }
 
 TEST(LogFormatCompile, EveryConversionCharacterHasItsKind) {

@@ -173,6 +173,10 @@ TEST(LogFormat, TheCategoryIsTheNameOfTheLoggerThatWrote) {
     const Logger unnamed("");
     EXPECT_EQ("[]", lineOf("[%c]", stampedAt(unnamed, INFO, STAMP), ""));
     EXPECT_EQ("[   ]", lineOf("[%3c]", stampedAt(unnamed, INFO, STAMP), ""));
+    Logger shortened("net.Http");
+    shortened._channel_name_len = 3;
+    EXPECT_EQ("[net]", lineOf("[%c]", stampedAt(shortened, INFO, STAMP), ""))
+        << "of the length that the logger knows";
 }
 
 TEST(LogFormat, ThreadsAreNamed) {

@@ -67,6 +67,16 @@ TEST(LogFormattedDate, ANullFormatSelectsIso8601WhateverItsLength) {
     }
 }
 
+TEST(LogFormattedDate, AppendsToWhatIsThere) {
+    const TimeZone utc("UTC0");
+    const LogFormattedDate date("%H%l", 4);
+    CachedTm tm;
+    std::string out = "at ";
+    date.fmt(out, tm, stampedAt(logger, INFO, STAMP, 7000));
+    date.fmt(out, tm, stampedAt(logger, INFO, STAMP, 8000));
+    EXPECT_EQ("at 0400704008", out);
+}
+
 TEST(LogFormattedDate, OnlyAWholeNameInItsOwnCaseIsAName) {
     for (const char* const text : {"absolute", "Date", "iso8601", "DAT", "DATES", " DATE", "DATE ",
                                    "ISO860", "ABSOLUTELY", "ISO8601,DATE"}) {
