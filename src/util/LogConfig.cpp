@@ -21,6 +21,7 @@
 namespace {
 
 const char* const BLANKS = " \t";
+const std::string_view KEY_PREFIX = "log4cpp.";
 const std::string_view COMMENT_START = "<!--";
 const std::string_view COMMENT_END = "-->";
 
@@ -48,10 +49,9 @@ void trimBlanks(std::string& line) {
 }
 
 // Takes the word up to the first character out of `ends` off the text.
-std::string takeUntil(std::string_view& text, const char* ends) {
-    const std::size_t length = std::min(text.find_first_of(ends), text.size());
-    std::string word(text.substr(0, length));
-    text.remove_prefix(length);
+std::string_view takeUntil(std::string_view& text, const char* ends) {
+    const std::string_view word = text.substr(0, text.find_first_of(ends));
+    text.remove_prefix(word.size());
     return word;
 }
 
@@ -108,8 +108,8 @@ void ConfigReader::readLines() {
         if (line.empty()) {
             continue;
         }
-        if (line.starts_with("log4cpp.")) {
-            line.erase(0, std::strlen("log4cpp."));
+        if (line.starts_with(KEY_PREFIX)) {
+            line.erase(0, KEY_PREFIX.size());
         }
         if (!parse(line)) {
             _errors.push_back({_lineno, line});
@@ -127,15 +127,14 @@ bool ConfigReader::dropComments(std::string& line) {
     if (line.find(COMMENT_START) == std::string::npos) {
         return true;
     }
-    const std::string_view start = COMMENT_START;
     std::string rest;
     rest.swap(line);
     for (std::size_t next = 0; next < rest.size();) {
         line.push_back(rest[next++]);
-        if (!line.ends_with(start)) {
+        if (!line.ends_with(COMMENT_START)) {
             continue;
         }
-        line.resize(line.size() - start.size());
+        line.resize(line.size() - COMMENT_START.size());
         const std::size_t end = rest.find(COMMENT_END, next);
         if (end != std::string::npos) {
             next = end + COMMENT_END.size();
@@ -156,7 +155,7 @@ bool ConfigReader::dropComments(std::string& line) {
 // Returns: false for a parse error.
 bool ConfigReader::parse(const std::string& line) {
     std::string_view rest = line;
-    const std::string key = takeUntil(rest, ".= \t");
+    const std::string_view key = takeUntil(rest, ".= \t");
     if (key == "rootCategory") {
         return parseRoot(line, rest);
     }
@@ -183,7 +182,7 @@ bool ConfigReader::parseRoot(const std::string& line, std::string_view rest) {
 
 // "NAME = anything" or "NAME.ATTRIBUTE = value". The appender is made as soon as it has a name.
 bool ConfigReader::parseAppender(std::string_view rest) {
-    const std::string name = takeUntil(rest, ".= \t");
+    const std::string name(takeUntil(rest, ".= \t"));
     if (name.empty()) {
         return false;
     }
@@ -192,7 +191,7 @@ bool ConfigReader::parseAppender(std::string_view rest) {
         return takeEquals(rest);
     }
     rest.remove_prefix(1);
-    const std::string attribute = takeUntil(rest, "= \t");
+    const std::string attribute(takeUntil(rest, "= \t"));
     return takeEquals(rest) &&
            appender->setAttribute(attribute, std::string(rest).c_str(), _queltaHome);
 }
