@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -22,8 +23,8 @@ using Text = std::unique_ptr<char[]>;
 // A longer array with the first `used` bytes of `text`; null when memory is exhausted.
 Text enlarged(const Text& text, std::size_t used, std::size_t capacity) {
     Text larger(new (std::nothrow) char[capacity]);
-    if (larger != nullptr && used > 0) {
-        std::memcpy(larger.get(), text.get(), used);
+    if (larger != nullptr) {
+        std::copy_n(text.get(), used, larger.get());
     }
     return larger;
 }
@@ -54,9 +55,7 @@ Text readToEnd(FILE* f, std::size_t capacity) {
 }  // namespace
 
 bool readLine(FILE* f, char* linebuf, int bufSize) {
-    if (bufSize > 0) {
-        std::memset(linebuf, 0, static_cast<std::size_t>(bufSize));
-    }
+    std::fill_n(linebuf, bufSize, '\0');
     if (bufSize < 3 || std::fgets(linebuf, bufSize - 1, f) == nullptr) {
         return false;
     }

@@ -89,6 +89,8 @@ TEST(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
     for (const int bufSize : {2, 1, 0, -1}) {
         char buf[] = "xyz";
         EXPECT_FALSE(readLine(file.get(), buf, bufSize)) << bufSize;
+        EXPECT_EQ(bufSize < 1 ? 'x' : '\0', buf[0]) << bufSize;
+        EXPECT_EQ(bufSize < 2 ? 'y' : '\0', buf[1]) << bufSize;
         EXPECT_EQ('z', buf[2]) << bufSize;
     }
     EXPECT_EQ('a', std::getc(file.get()));
@@ -172,6 +174,23 @@ TEST(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
     const std::unique_ptr<char[]> status(readText(Pathname("/proc/self/status")));
     ASSERT_NE(nullptr, status);
     EXPECT_TRUE(startsWith(status.get(), "Name:"));
+}
+
+TEST(DCUtilsFilesTest, DoublesTheArrayWheneverTheFileFillsIt) {
+    const TempDir dir;
+    const Pathname fifo(dir.file("fifo"));
+    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
+    const struct {
+        std::size_t size;
+        unsigned arrays;  // the first has room for the NUL alone
+    } rows[] = {{0, 1}, {1, 2}, {2, 3}, {3, 3}, {4, 4}, {7, 4}, {8, 5}};
+    for (const auto& row : rows) {
+        std::thread writer([&] { writeFile(fifo, std::string(row.size, 'z')); });
+        const ScriptedCalls allocations("new[]");
+        expectText(std::string(row.size, 'z'), fifo);
+        EXPECT_EQ(row.arrays, allocations.calls()) << row.size;
+        writer.join();
+    }
 }
 
 TEST(DCUtilsFilesTest, TellsWhenAFileDoesNotFitIntoMemory) {
