@@ -1,0 +1,54 @@
+// Descriptors 0, 1 and 2 closed at the start, in every combination.
+
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "support/NumberedLines.h"
+#include "support/TempDir.h"
+#include "util/Logger.h"
+#include "util/Pathname.h"
+
+namespace {
+
+constexpr unsigned LINES = 200;
+
+// What a program does: configure, log, say something to people, end.
+[[noreturn]] void runProgram(const TempDir& dir, unsigned closed) {
+    for (int fd = 0; fd < 3; ++fd) {
+        if ((closed >> fd & 1U) != 0) {
+            ::close(fd);
+        }
+    }
+    const bool configured = Logger::initialize(Pathname(dir.file("log.cfg")), Pathname(dir.path()));
+    static Logger logger("Closed");
+    for (unsigned number = 0; number < LINES; ++number) {
+        logger.info(numberedLine(0, number));
+    }
+    std::exit(configured ? 7 : 8);
+}
+
+}  // namespace
+
+TEST(LogClosedDescriptors, TheStatusIsAsEverAndEveryLineIsWhole) {
+    for (unsigned closed = 0; closed < 8; ++closed) {
+        const TempDir dir;
+        writeFile(dir.file("log.cfg"),
+                  "rootCategory=INFO,A\n"
+                  "appender.A.fileName=${QUELTA_HOME}/app.log\n"
+                  "appender.A.maxFileSize=4000\n"
+                  "appender.A.maxBackupIndex=50\n"
+                  "appender.A.layout.ConversionPattern=%m%n\n");
+        const pid_t child = ::fork();
+        if (child == 0) {
+            runProgram(dir, closed);
+        }
+        int status = 0;
+        ASSERT_EQ(child, ::waitpid(child, &status, 0));
+        EXPECT_TRUE(WIFEXITED(status)) << "closed: " << closed;
+        EXPECT_EQ(7, WEXITSTATUS(status)) << "closed: " << closed;
+        expectEveryLine(textOfGenerations(dir.file("app.log")), 1, LINES);
+    }
+}

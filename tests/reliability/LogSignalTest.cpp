@@ -1,0 +1,105 @@
+// Signals that interrupt system calls all the time.
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/time.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <csignal>
+#include <fstream>
+#include <string>
+#include <thread>
+
+#include "support/FileAppender.h"
+#include "support/NumberedLines.h"
+#include "support/StderrCapture.h"
+#include "support/TempDir.h"
+
+namespace {
+
+std::atomic<unsigned> signals{0};
+
+void countSignal(int) {
+    ++signals;
+}
+
+// SIGALRM every fifty microseconds while the object lives; calls that it meets fail with EINTR.
+class SignalStorm {
+public:
+    SignalStorm() {
+        struct sigaction action {};
+        action.sa_handler = countSignal;
+        EXPECT_EQ(0, ::sigaction(SIGALRM, &action, nullptr));
+        setInterval(50);
+    }
+    ~SignalStorm() {
+        setInterval(0);
+        ::signal(SIGALRM, SIG_IGN);
+    }
+    SignalStorm(const SignalStorm&) = delete;
+    SignalStorm& operator=(const SignalStorm&) = delete;
+
+private:
+    static void setInterval(int microseconds) {
+        itimerval timer{};
+        timer.it_interval.tv_usec = timer.it_value.tv_usec = microseconds;
+        EXPECT_EQ(0, ::setitimer(ITIMER_REAL, &timer, nullptr));
+    }
+};
+
+}  // namespace
+
+TEST(LogSignal, NoLineIsLostThroughRotation) {
+    const unsigned LINES = 20000;
+    const TempDir dir;
+    const StderrCapture err;
+    FileAppender log(dir.file("app.log"), 50000, 1000);
+    {
+        const SignalStorm storm;
+        for (unsigned number = 0; number < LINES; ++number) {
+            log.line(numberedLine(0, number));
+        }
+    }
+    EXPECT_GT(signals, 10U);
+    expectEveryLine(textOfGenerations(dir.file("app.log")), 1, LINES);
+    EXPECT_EQ("", err.text());
+}
+
+TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
+    const unsigned LINES = 40;
+    const TempDir dir;
+    const StderrCapture err;
+    ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
+    std::string got;
+    std::thread reader([&] {
+        // Signals are for the writer.
+        sigset_t all;
+        sigfillset(&all);
+        ::pthread_sigmask(SIG_BLOCK, &all, nullptr);
+        std::ifstream in(dir.file("pipe"), std::ios::binary);
+        char buf[3000];
+        while (in.read(buf, sizeof buf) || in.gcount() > 0) {
+            got.append(buf, static_cast<std::size_t>(in.gcount()));
+            std::this_thread::sleep_for(std::chrono::microseconds(200));
+        }
+    });
+    std::string expected;
+    {
+        LogAppender log;
+        ASSERT_TRUE(log.setAttribute("fileName", dir.file("pipe").c_str(), Pathname()));
+        log._fmt = &defaultFormat();
+        log.write(stampedAt(1000), "opened before the storm");
+        expected = "opened before the storm\n";
+        const SignalStorm storm;
+        for (unsigned number = 0; number < LINES; ++number) {
+            const std::string line(100000, static_cast<char>('a' + number % 26));
+            log.write(stampedAt(1000), line);
+            expected += line + "\n";
+        }
+    }
+    reader.join();
+    EXPECT_GT(signals, 10U);
+    EXPECT_TRUE(expected == got) << expected.size() << " bytes expected, " << got.size() << " came";
+    EXPECT_EQ("", err.text());
+}
