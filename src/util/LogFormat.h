@@ -25,11 +25,11 @@
 #include <string>
 
 #include "util/LogLevel.h"
+#include "util/LogMsgMetadata.h"
 
 class LogAppender;
 class LogFormattedDate;
 class Logger;
-struct LogMsgMetadata;
 
 // The local time of one message, converted when the first date of the line asks for it.
 class CachedTm {

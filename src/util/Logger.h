@@ -15,6 +15,9 @@
 // copy, or a static one whose constructor has not run yet) can promise nothing about levels: its
 // messages go to standard error as "LEVEL - message", whatever the level.
 //
+// This header brings the whole of logging along: channels, appenders, layouts and the paths that
+// name the configuration.
+//
 // No entry point reports an error to its caller, throws, or changes errno.
 //
 // Loggers may be used before main and in destructors at exit: what a logger needs is
@@ -26,11 +29,11 @@
 #include <exception>
 #include <string>
 
+#include "util/LogAppender.h"
 #include "util/LogChannel.h"
+#include "util/LogFormat.h"
 #include "util/LogLevel.h"
-
-class LogFormat;
-class Pathname;
+#include "util/Pathname.h"
 
 class Logger {
 public:

@@ -7,6 +7,7 @@
 #include <cstring>
 #include <stdexcept>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 #include "support/ScriptedCalls.h"
@@ -178,6 +179,16 @@ TEST_F(LoggerFormatTest, ReadsItsArgumentsBeforeItReplacesTheString) {
     std::string longer(300, 'x');
     Logger::format(longer, "<%s>", longer.c_str());
     EXPECT_EQ("<" + std::string(300, 'x') + ">", longer);
+}
+
+// Nothing but Logger.h is included here.
+TEST(LoggerHeader, BringsTheWholeOfLoggingAlong) {
+    const Logger logger("net.Http");
+    std::string line;
+    LogFormat("%p %c %m").apply(line, LogMsgMetadata(&logger, WARN), "hello");
+    EXPECT_EQ("WARN net.Http hello", line);
+    EXPECT_EQ(nullptr, LogAppender::find("absent", false));
+    EXPECT_TRUE((std::is_same_v<bool, decltype(Logger::initialize("log.cfg", "/home"))>));
 }
 
 TEST_F(LoggerFormatTest, KeepsCharactersBehindANul) {
