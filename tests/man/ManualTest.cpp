@@ -141,6 +141,19 @@ TEST(ManualTest, ExamplesOfTheFileAreReadWithoutComplaint) {
     }
 }
 
+TEST(ManualTest, NamesEveryReport) {
+    const std::string page = replaced(readFile(MANUAL), "\\-", "-");
+    for (const char* report :
+         {"Couldn't open log file configuration \"", ": Parse error at \"",
+          ": Unterminated XML comment started", "\" has no filename, assuming stderr",
+          "\" has maxBackupIndex set without specifying a filename, ignoring",
+          "\" has maxSize set without specifying a filename, ignoring",
+          "\" has maxBackupIndex set without specifying maxSize, ignoring", "Error opening \"",
+          "Error calling fstat on \"", "Error writing to \""}) {
+        EXPECT_NE(std::string::npos, page.find(report)) << report;
+    }
+}
+
 TEST(ManualTest, BadFileIsReportedAsShown) {
     const std::vector<std::string> shown = blocks(".nf", ".fi");
     ASSERT_EQ(2U, shown.size());

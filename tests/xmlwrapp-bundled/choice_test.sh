@@ -4,6 +4,8 @@
 # stand-in's header, and looks at what is announced and what LoaderInfo is compiled with.
 set -eu
 cxx=$1
+# A compiler cache that makes paths relative would hide which header was taken.
+unset CMAKE_CXX_COMPILER_LAUNCHER CCACHE_BASEDIR
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
