@@ -6,7 +6,6 @@
 #include <memory>
 #include <string_view>
 #include <utility>
-#include <vector>
 
 #include "util/Assert.h"
 #include "util/LogAppender.h"
@@ -24,11 +23,6 @@ const char* const BLANKS = " \t";
 const std::string_view KEY_PREFIX = "log4cpp.";
 const std::string_view COMMENT_START = "<!--";
 const std::string_view COMMENT_END = "-->";
-
-struct NumberedText {
-    unsigned lineno;
-    std::string text;
-};
 
 // Removes everything from the first "#" on.
 void cutRemark(std::string& line) {
@@ -66,36 +60,11 @@ bool takeEquals(std::string_view& text) {
     return true;
 }
 
-// Reads one configuration file. Appenders are made and filled while their lines are read; channels
-// are set up afterwards, because they name appenders and inherit from the root channel. Problems
-// are kept until there are appenders to report them to.
-class ConfigReader {
-public:
-    ConfigReader(std::FILE* file, const Pathname& queltaHome)
-        : _file(file), _queltaHome(queltaHome) {}
-
-    void readLines();
-    void setUpChannels();
-    void report(const Pathname& cfgFile) const;
-
-    // Returns: false when the file ended inside a comment.
-    bool complete() const { return _openComment == 0; }
-
-private:
-    bool dropComments(std::string& line);
-    bool parse(const std::string& line);
-    bool parseRoot(const std::string& line, std::string_view rest);
-    bool parseAppender(std::string_view rest);
-
-    std::FILE* const _file;
-    const Pathname& _queltaHome;
-    unsigned _lineno = 0;                   // of the last line read
-    unsigned _openComment = 0;              // line of the comment that has no end; 0: none
-    NumberedText _root = {0, {}};           // the last rootCategory line; 0: none
-    std::string _rootValue;                 // what it sets
-    std::vector<NumberedText> _categories;  // category lines, without "category."
-    std::vector<NumberedText> _errors;      // in the order in which they are reported
+struct FileCloser {
+    void operator()(std::FILE* file) const { std::fclose(file); }
 };
+
+}  // namespace
 
 void ConfigReader::readLines() {
     std::string line;
@@ -218,12 +187,6 @@ void ConfigReader::report(const Pathname& cfgFile) const {
                             error.lineno, error.text.c_str());
     }
 }
-
-struct FileCloser {
-    void operator()(std::FILE* file) const { std::fclose(file); }
-};
-
-}  // namespace
 
 bool read_line(std::string& result, std::FILE* ifile) {
     char buf[128];

@@ -1,12 +1,16 @@
 #ifndef QUELTA_UTIL_LOGCONFIG_H_
 #define QUELTA_UTIL_LOGCONFIG_H_
 
-// Internal header: how the lines of a logging configuration file are read. The reader itself is
-// Logger::initialize(cfgFile, home); it is the only caller.
+// Internal header: how a logging configuration file is read. Logger::initialize(cfgFile, home) is
+// the only caller; the tests reach the parts from here, as that one runs once per process.
 // Not thread-safe; one thread at a time per file.
 
 #include <cstdio>
 #include <string>
+#include <string_view>
+#include <vector>
+
+class Pathname;
 
 // Reads one line of any length; `result` is replaced by it, without its line feed. A NUL byte is
 // a character like any other.
@@ -21,5 +25,47 @@ bool read_line(std::string& result, std::FILE* ifile);
 // `lineno` counts them. The text behind the closing "-->" is appended to `result`.
 // Returns: false, with `result` as it was, when the file ends inside the comment.
 bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile);
+
+// Reads one configuration file. Appenders are made and filled while their lines are read; channels
+// are set up afterwards, because they name appenders and inherit from the root channel. Problems
+// are kept until there are appenders to report them to.
+//
+// Order of calls: `readLines`, `setUpChannels`, `report`.
+class ConfigReader {
+public:
+    // `file` (not null, not owned) is open for reading; `queltaHome` must outlive the reader.
+    ConfigReader(std::FILE* file, const Pathname& queltaHome)
+        : _file(file), _queltaHome(queltaHome) {}
+
+    // Reads to the end of the file, or to a comment that has none.
+    void readLines();
+    // Applies the root channel's setting, then those of the others.
+    void setUpChannels();
+    // Reports what was wrong, in terms of the file's name and line numbers.
+    void report(const Pathname& cfgFile) const;
+
+    // Returns: false when the file ended inside a comment.
+    bool complete() const { return _openComment == 0; }
+
+private:
+    struct NumberedText {
+        unsigned lineno;
+        std::string text;
+    };
+
+    bool dropComments(std::string& line);
+    bool parse(const std::string& line);
+    bool parseRoot(const std::string& line, std::string_view rest);
+    bool parseAppender(std::string_view rest);
+
+    std::FILE* const _file;
+    const Pathname& _queltaHome;
+    unsigned _lineno = 0;                   // of the last line read
+    unsigned _openComment = 0;              // line of the comment that has no end; 0: none
+    NumberedText _root = {0, {}};           // the last rootCategory line; 0: none
+    std::string _rootValue;                 // what it sets
+    std::vector<NumberedText> _categories;  // category lines, without "category."
+    std::vector<NumberedText> _errors;      // in the order in which they are reported
+};
 
 #endif  // QUELTA_UTIL_LOGCONFIG_H_
