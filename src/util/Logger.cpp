@@ -66,7 +66,8 @@ __attribute__((format(printf, 2, 0))) void formatInto(std::string& out, const ch
             out.assign(buf, static_cast<std::size_t>(length));
             return;
         }
-        if (length < 0 && size >= MAX_GUESSED_SIZE) {
+        // A text longer than an int can tell has cost seconds already; every further attempt would.
+        if (length < 0 && (errno == EOVERFLOW || size >= MAX_GUESSED_SIZE)) {
             throw std::runtime_error("cannot format a log message");
         }
         size = length < 0 ? 2 * size : static_cast<std::size_t>(length) + 1;

@@ -25,9 +25,7 @@ int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
     __attribute__((format(printf, 3, 0)));
 int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
     bufferSizes.push_back(size);
-    const ScriptedCalls::Step step = ScriptedCalls::next("vsnprintf");
-    return step.kind == ScriptedCalls::GIVE ? static_cast<int>(step.value)
-                                            : __real_vsnprintf(buf, size, fmt, ap);
+    return scriptedCall("vsnprintf", [&] { return __real_vsnprintf(buf, size, fmt, ap); });
 }
 // The strerror_r that reports failures.
 int __real___xpg_strerror_r(int errnum, char* buf, std::size_t size);
@@ -164,6 +162,15 @@ TEST_F(LoggerFormatTest, GivesUpOnAFormatThatNoBufferHelps) {
     EXPECT_EQ(256u, bufferSizes.front());
     EXPECT_EQ(1024u * 1024, bufferSizes.back());
     EXPECT_EQ(13u, bufferSizes.size());
+}
+
+TEST_F(LoggerFormatTest, GivesUpAtOnceOnATextLongerThanAnIntCanTell) {
+    ScriptedCalls calls("vsnprintf");
+    calls.fail(EOVERFLOW);
+    std::string out = "before";
+    EXPECT_THROW(Logger::format(out, "%d", 1), std::runtime_error);
+    EXPECT_EQ("before", out);
+    EXPECT_EQ(std::vector<std::size_t>{256}, bufferSizes);
 }
 
 TEST_F(LoggerFormatTest, GivesUpOnAWideCharacterWithoutAForm) {
