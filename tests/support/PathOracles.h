@@ -136,6 +136,69 @@ inline std::string removeDoubleSeps(std::string path) {
     return path;
 }
 
+// Takes one shell word off: one character at a time, a branch for each state.
+inline bool splitArg(const std::string& input, std::string& word, std::string& rest) {
+    word.clear();
+    std::string line = input;
+    while (!line.empty() && (line[0] == ' ' || line[0] == '\t' || line[0] == '\n')) {
+        line.erase(0, 1);
+    }
+    char quote = 0;
+    bool saw_backslash = false;
+    while (!line.empty()) {
+        const char c = line[0];
+        if (saw_backslash) {
+            word += c;
+            saw_backslash = false;
+        } else if (quote == 0) {
+            if (c == ' ' || c == '\t' || c == '\n') {
+                break;
+            }
+            if (c == '\'' || c == '"') {
+                quote = c;
+            } else if (c == '\\') {
+                saw_backslash = true;
+            } else {
+                word += c;
+            }
+        } else if (c == quote) {
+            quote = 0;
+        } else if (c == '\\' && quote == '"') {
+            saw_backslash = true;
+        } else {
+            word += c;
+        }
+        line.erase(0, 1);
+    }
+    if (quote != 0 || saw_backslash || word.empty()) {
+        return false;
+    }
+    rest = line;
+    return true;
+}
+
+// Quotes by trying the ways in turn, each over the whole path.
+inline std::string shellQuoted(const std::string& path) {
+    const auto has = [&path](const std::string& characters) {
+        return path.find_first_of(characters) != std::string::npos;
+    };
+    const std::string always = "\"$\\";
+    const std::string special = "#&*;=?[]|";
+    if (path.empty() || !has("\t\n '" + always + special)) {
+        return path.empty() ? "\"\"" : path;
+    }
+    if (!has("'") && has(always)) {
+        return '\'' + path + '\'';
+    }
+    const std::string escaped = has("\t\n ") ? always : always + special + '\'';
+    std::string result;
+    for (const char c : path) {
+        result += escaped.find(c) == std::string::npos ? "" : "\\";
+        result += c;
+    }
+    return has("\t\n ") ? '"' + result + '"' : result;
+}
+
 }  // namespace path_oracle
 
 #endif  // QUELTA_TESTS_SUPPORT_PATHORACLES_H_

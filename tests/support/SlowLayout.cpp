@@ -9,6 +9,28 @@
 
 namespace {
 
+// Takes the leading characters that are among `letters`, at most `limit` of them.
+std::string take(std::string& rest, const char* letters, std::size_t limit = std::string::npos) {
+    const std::size_t run = std::min(rest.find_first_not_of(letters), rest.size());
+    const std::string taken = rest.substr(0, std::min(run, limit));
+    rest.erase(0, taken.size());
+    return taken;
+}
+
+// Whether a piece is nothing but "%p" in any spelling.
+bool isAmPm(std::string piece) {
+    while (!piece.empty()) {
+        const bool conversion = !take(piece, "%", 1).empty();
+        take(piece, "-_^#", 1);
+        take(piece, "0123456789");
+        take(piece, "EO", 1);
+        if (!conversion || take(piece, "p", 1).empty()) {
+            return false;
+        }
+    }
+    return true;
+}
+
 // The patterns are made at run time: no compiler can check them.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
@@ -19,7 +41,9 @@ std::string strftimeOf(const std::string& piece, const struct tm& local) {
     if (len == 0) {
         throw std::length_error("date too long for the slow renderer");
     }
-    return std::string(buf.data() + 1, len - 1);
+    const std::string text(buf.data() + 1, len - 1);
+    // What may be without text is not tried again when it does not fit.
+    return text.size() >= 64 && isAmPm(piece) ? "" : text;
 }
 #pragma GCC diagnostic pop
 
@@ -66,14 +90,6 @@ std::optional<std::string> textOf(char conversion, const std::optional<std::stri
         default:
             return std::nullopt;
     }
-}
-
-// Takes the leading characters that are among `letters`, at most `limit` of them.
-std::string take(std::string& rest, const char* letters, std::size_t limit = std::string::npos) {
-    const std::size_t run = std::min(rest.find_first_not_of(letters), rest.size());
-    const std::string taken = rest.substr(0, std::min(run, limit));
-    rest.erase(0, taken.size());
-    return taken;
 }
 
 struct Widths {

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "support/AllStrings.h"
+#include "support/PathOracles.h"
 #include "support/TempDir.h"
 
 namespace {
@@ -129,53 +130,12 @@ TEST(PathnameShellTest, TheWordMayReplaceItsOwnLine) {
     EXPECT_EQ(" c", rest);
 }
 
-// One character at a time, a branch for each state.
-bool splitSlowly(const std::string& input, std::string& word, std::string& rest) {
-    word.clear();
-    std::string line = input;
-    while (!line.empty() && (line[0] == ' ' || line[0] == '\t' || line[0] == '\n')) {
-        line.erase(0, 1);
-    }
-    char quote = 0;
-    bool saw_backslash = false;
-    while (!line.empty()) {
-        const char c = line[0];
-        if (saw_backslash) {
-            word += c;
-            saw_backslash = false;
-        } else if (quote == 0) {
-            if (c == ' ' || c == '\t' || c == '\n') {
-                break;
-            }
-            if (c == '\'' || c == '"') {
-                quote = c;
-            } else if (c == '\\') {
-                saw_backslash = true;
-            } else {
-                word += c;
-            }
-        } else if (c == quote) {
-            quote = 0;
-        } else if (c == '\\' && quote == '"') {
-            saw_backslash = true;
-        } else {
-            word += c;
-        }
-        line.erase(0, 1);
-    }
-    if (quote != 0 || saw_backslash || word.empty()) {
-        return false;
-    }
-    rest = line;
-    return true;
-}
-
 TEST(PathnameShellTest, SplitsEveryShortLineAsTheSlowVersion) {
     const std::size_t compared = forEachString("a \\\"'", 7, [](const std::string& line) {
         Pathname word("before");
         std::string rest = "before", slowWord, slowRest = "before";
         const bool found = Pathname::splitArgShellQuoted(line, word, rest);
-        ASSERT_EQ(splitSlowly(line, slowWord, slowRest), found) << line;
+        ASSERT_EQ(path_oracle::splitArg(line, slowWord, slowRest), found) << line;
         ASSERT_EQ(slowWord, word) << line;
         ASSERT_EQ(slowRest, rest) << line;
     });

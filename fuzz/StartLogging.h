@@ -1,0 +1,15 @@
+#ifndef QUELTA_FUZZ_STARTLOGGING_H_
+#define QUELTA_FUZZ_STARTLOGGING_H_
+
+#include <string>
+
+namespace fuzz {
+
+// Starts logging from a configuration, in a child with a folder of its own as the installation, and
+// checks result, channels and reports against the slow reader. A configuration that names a file
+// outside of that folder is left alone.
+void startLogging(const std::string& contents);
+
+}  // namespace fuzz
+
+#endif  // QUELTA_FUZZ_STARTLOGGING_H_
