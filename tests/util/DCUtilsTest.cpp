@@ -314,9 +314,11 @@ TEST(DCUtilsTest, ReservesRoomForTheWholeOutline) {
 }
 
 TEST(DCUtilsTest, AHugeOutlineLimitCostsNoMemory) {
-    std::string out;
-    getPunct("a,b", out, UINT_MAX);
-    EXPECT_GT(1u << 20, out.capacity());
+    for (const char* const text : {"", "a,b"}) {
+        std::string out;
+        getPunct(text, out, UINT_MAX);
+        EXPECT_GT(1u << 20, out.capacity()) << text;
+    }
 }
 
 TEST(DCUtilsTest, NamesTruthValues) {
