@@ -10,6 +10,7 @@
 #include <string>
 
 #include "support/InChild.h"
+#include "support/RootLayout.h"
 #include "support/ScriptedCalls.h"
 #include "support/StderrCapture.h"
 #include "util/DCUtils.h"
@@ -85,8 +86,9 @@ TEST(DCUtilsCopyTest, ReportsAFailedAllocationAndThrows) {
     ScriptedCalls allocations("new[]");
     allocations.fail(ENOMEM);
     const StderrCapture capture;
+    const RootLayout layout("%p %c %m%n");
     EXPECT_TRUE(copyThrows("four"));
-    EXPECT_EQ("Could not allocate space for string of size 5 in DCUtils::copystr\n",
+    EXPECT_EQ("ERROR DCUtils Could not allocate space for string of size 5 in DCUtils::copystr\n",
               capture.text());
 }
 

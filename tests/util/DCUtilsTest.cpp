@@ -5,11 +5,15 @@
 #include <cerrno>
 #include <climits>
 #include <cmath>
+#include <cstddef>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <random>
 #include <string>
+#include <type_traits>
+#include <utility>
 
 #include "support/AllStrings.h"
 
@@ -21,6 +25,39 @@ using namespace std::string_literals;
 std::string taken(char* array) {
     const std::unique_ptr<char[]> owner(array);
     return array == nullptr ? "(null)" : array;
+}
+
+// Each overload by its type: what a pointer, a literal and a string select, and what comes back.
+TEST(DCUtilsTest, OverloadsAreSelectedByTheTypeOfTheText) {
+    static_cast<void>(static_cast<bool (*)(const char*, const char*)>(&startsWith));
+    static_cast<void>(static_cast<bool (*)(const std::string&, const std::string&)>(&startsWith));
+    static_cast<void>(static_cast<char* (*)(char*, long, int*)>(&ltoa));
+    static_cast<void>(static_cast<std::string& (*)(long, std::string&)>(&ltoa));
+    static_assert(std::is_same_v<char*, decltype(strip(NULL))>);
+    static_assert(std::is_same_v<char*, decltype(strip("literal"))>);
+    static_assert(std::is_same_v<std::string, decltype(strip(std::string()))>);
+    static_assert(std::is_same_v<char*, decltype(lowercase(NULL))>);
+    static_assert(std::is_same_v<char*, decltype(lowercase("literal"))>);
+    static_assert(std::is_same_v<void, decltype(lowercase(std::declval<std::string&>()))>);
+    static_assert(std::is_same_v<char*(const char*), decltype(copystr)>);
+    static_assert(std::is_same_v<char*(const char*), decltype(substituteEnvs)>);
+    static_assert(std::is_same_v<char*(const char*, const char*), decltype(my_strcasestr)>);
+    static_assert(std::is_same_v<char*(const Pathname&), decltype(readText)>);
+    static_assert(std::is_same_v<bool(const Pathname&, const char*), decltype(writeText)>);
+    static_assert(std::is_same_v<bool(std::FILE*, char*, int), decltype(readLine)>);
+    static_assert(std::is_same_v<const char*(bool), decltype(bool2str)>);
+    static_assert(std::is_same_v<bool(const char*), decltype(toBool)>);
+    static_assert(std::is_same_v<void(char*, const char*), decltype(initMap)>);
+    static_assert(std::is_same_v<long(const std::string&, bool&), decltype(getLong)>);
+    static_assert(std::is_same_v<double(const std::string&), decltype(getDouble)>);
+    static_assert(std::is_same_v<std::string(unsigned), decltype(pad)>);
+    static_assert(
+        std::is_same_v<void(const std::string&, std::string&, unsigned), decltype(getPunct)>);
+    EXPECT_EQ(nullptr, copystr(NULL));
+    EXPECT_EQ(nullptr, strip(NULL));
+    EXPECT_EQ(nullptr, lowercase(NULL));
+    EXPECT_EQ(nullptr, substituteEnvs(NULL));
+    EXPECT_FALSE(toBool(NULL));
 }
 
 TEST(DCUtilsTest, TellsWhetherATextStartsWithAPrefix) {
@@ -45,6 +82,14 @@ TEST(DCUtilsTest, NothingStartsWithOrIsNull) {
     EXPECT_FALSE(startsWith(null, ""));
     EXPECT_FALSE(startsWith("a", null));
     EXPECT_FALSE(startsWith(null, null));
+}
+
+TEST(DCUtilsTest, ComparesTextsAndStringsWithEachOther) {
+    EXPECT_TRUE(startsWith("abc"s, "ab"));
+    EXPECT_TRUE(startsWith("abc", "ab"s));
+    EXPECT_FALSE(startsWith("abc"s, "b"));
+    EXPECT_FALSE(startsWith(nullptr, "a"));
+    EXPECT_FALSE(startsWith("a", NULL));
 }
 
 TEST(DCUtilsTest, StringsStartWithPrefixesBehindAnEmbeddedNul) {

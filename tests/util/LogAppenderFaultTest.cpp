@@ -15,6 +15,7 @@
 #include <string>
 
 #include "support/FileAppender.h"
+#include "support/RootLayout.h"
 #include "support/ScriptedCalls.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
@@ -116,6 +117,14 @@ TEST_F(LogAppenderFault, AnFstatThatFailsClosesTheFileAgain) {
     EXPECT_FALSE(_log._fd.valid());
     line("written");
     EXPECT_EQ("written\n", readFile(_file));
+}
+
+TEST_F(LogAppenderFault, AnFstatThatFailsIsCritical) {
+    const RootLayout layout("%p %c %m%n");
+    ScriptedCalls fstats("fstat");
+    fstats.fail(EIO);
+    line("lost");
+    EXPECT_EQ("CRIT Logger " + report("Error calling fstat on", EIO), _err.text());
 }
 
 TEST_F(LogAppenderFault, TheReportTellsTheFailureAndNotWhatClosingDid) {

@@ -39,6 +39,15 @@ TEST_F(LogAppenderIdentity, AMoveIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
+TEST_F(LogAppenderIdentity, OnlyTheWholeSecondsOfAStampCount) {
+    fs::rename(_file, _moved);
+    LogMsgMetadata mdata = stampedAt(1005);
+    mdata.stamp.set(1005, 999999);
+    _log.write(mdata, "at 1005.999999");
+    EXPECT_FALSE(fs::exists(_file));
+    EXPECT_EQ("first\nat 1005.999999\n", readFile(_moved));
+}
+
 TEST_F(LogAppenderIdentity, ADeletionIsNoticedAfterSixSecondsNotAfterFive) {
     fs::remove(_file);
     _log.line("at 1005", 1005);

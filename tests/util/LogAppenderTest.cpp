@@ -5,13 +5,17 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <cstring>
 #include <filesystem>
+#include <iterator>
 #include <limits>
 #include <string>
+#include <type_traits>
 
 #include "support/FileAppender.h"
 #include "support/InChild.h"
+#include "support/RootLayout.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogFormat.h"
@@ -37,6 +41,19 @@ TEST(LogAppender, StartsClosedWithoutFileLimitBackupsAndLayout) {
     EXPECT_EQ(0, appender._curSize);
     EXPECT_EQ(0U, appender._maxBackupIndex);
     EXPECT_EQ(nullptr, appender._fmt);
+}
+
+TEST(LogAppender, KeepsTheOrderOfItsFields) {
+    const LogAppender a;
+    const void* const fields[] = {&a._fd,      &a._filename,       &a._maxSize,
+                                  &a._curSize, &a._maxBackupIndex, &a._fmt,
+                                  &a._mutex,   &a._inodeNum,       &a._lastCheck};
+    for (std::size_t i = 1; i < std::size(fields); ++i) {
+        EXPECT_LT(fields[i - 1], fields[i]) << i;
+    }
+    static_assert(std::is_same_v<std::int64_t, file_offset_t>);
+    static_assert(std::is_same_v<file_offset_t, decltype(LogAppender::_curSize)>);
+    static_assert(std::is_same_v<std::uint32_t, decltype(LogAppender::_maxBackupIndex)>);
 }
 
 TEST(LogAppender, RootAppenderWritesTheBareMessageToStandardError) {
@@ -327,6 +344,41 @@ TEST(LogAppender, SetupClosesAFileThatAReportHasAlreadyOpened) {
     struct stat status;
     EXPECT_EQ(-1, ::fstat(descriptor, &status));
     EXPECT_EQ("before the setup\n", readFile(dir.file("a.log")));
+}
+
+TEST(LogAppender, WarnsOfItsSettingsOnTheLoggerOfTheSubsystem) {
+    const TempDir dir;
+    const StderrCapture err;
+    const RootLayout layout("%p %c %m%n");
+    LogAppender bare;
+    bare._maxSize = 5;
+    bare._maxBackupIndex = 3;
+    bare.finalSetup("bare");
+    LogAppender unlimited;
+    unlimited._filename = dir.file("a.log");
+    unlimited._maxBackupIndex = 3;
+    unlimited.finalSetup("unlimited");
+    const std::string prefix = "WARN Logger Appender ";
+    EXPECT_EQ(
+        prefix + "\"bare\" has no filename, assuming stderr\n" +  //
+            prefix + "\"bare\" has maxBackupIndex set without specifying a filename, ignoring\n" +
+            prefix + "\"bare\" has maxSize set without specifying a filename, ignoring\n" + prefix +
+            "\"unlimited\" has maxBackupIndex set without specifying maxSize, ignoring\n",
+        err.text());
+}
+
+TEST(LogAppender, AFileThatCannotBeOpenedIsAnErrorAndALineThatCannotBeWrittenIsCritical) {
+    const TempDir dir;
+    const StderrCapture err;
+    const RootLayout layout("%p %c %m%n");
+    const std::string missing = dir.file("missing/a.log");
+    const FileAppender unopened(missing);
+    FileAppender full("/dev/full");
+    full.line("lost");
+    EXPECT_EQ("ERROR Logger Error opening \"" + missing +
+                  "\": No such file or directory\n"
+                  "CRIT Logger Error writing to \"/dev/full\": No space left on device\n",
+              err.text());
 }
 
 TEST(LogAppender, AppendsToAnExistingFile) {

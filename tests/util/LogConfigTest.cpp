@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "support/InChild.h"
+#include "support/RootLayout.h"
 #include "support/TempDir.h"
 #include "util/LogAppender.h"
 #include "util/LogFormat.h"
@@ -156,6 +157,25 @@ TEST_F(LogConfig, AMissingFileIsReportedAndLeavesLoggingUsable) {
                       "\ninfo\nerror\n",
                   run.err);
     }
+}
+
+TEST_F(LogConfig, AMissingFileAndAnOpenCommentAreErrorsAndABadLineIsAWarning) {
+    const ChildRun missing = inChild([&] {
+        const RootLayout layout("%p %c %m%n");
+        EXPECT_FALSE(Logger::initialize(Pathname(_cfg), Pathname()));
+    });
+    EXPECT_EQ("ERROR Logger Couldn't open log file configuration \"" + _cfg +
+                  "\": No such file or directory\n",
+              missing.err);
+    writeFile(_cfg, "bad\n<!-- open\n");
+    const ChildRun open = inChild([&] {
+        const RootLayout layout("%p %c %m%n");
+        EXPECT_FALSE(Logger::initialize(Pathname(_cfg), Pathname()));
+    });
+    EXPECT_EQ("ERROR Logger " + _cfg + ":2: Unterminated XML comment started\nWARN Logger " +
+                  parseError(1, "bad"),
+              open.err);
+    EXPECT_EQ(0, missing.status | open.status);
 }
 
 TEST_F(LogConfig, AFolderReadsLikeAnEmptyFile) {

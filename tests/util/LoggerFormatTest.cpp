@@ -16,6 +16,7 @@
 namespace {
 std::vector<std::size_t> bufferSizes;  // of the calls of vsnprintf
 std::string errorTextInstead;          // taken for the text of every error unless empty
+std::size_t errorTextSize = 0;         // of the last buffer for one
 }  // namespace
 
 extern "C" {
@@ -30,6 +31,7 @@ int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
 // The strerror_r that reports failures.
 int __real___xpg_strerror_r(int errnum, char* buf, std::size_t size);
 int __wrap___xpg_strerror_r(int errnum, char* buf, std::size_t size) {
+    errorTextSize = size;
     if (!errorTextInstead.empty()) {
         std::strcpy(buf, errorTextInstead.c_str());
         return 0;
@@ -97,6 +99,12 @@ TEST_F(LoggerFormatTest, AsksForNoErrorTextWithoutPercentM) {
     const ScriptedCalls texts("strerror_r");
     EXPECT_EQ("100%", formatted(ENOENT, "%d%%", 100));
     EXPECT_EQ(0u, texts.calls());
+}
+
+TEST_F(LoggerFormatTest, TakesAnErrorTextOf999CharactersWhole) {
+    errorTextInstead = std::string(999, 'e');
+    EXPECT_EQ("<" + errorTextInstead + ">", formatted(ENOSPC, "<%m>"));
+    EXPECT_EQ(1000u, errorTextSize);
 }
 
 TEST_F(LoggerFormatTest, ReadsConversionsInAnErrorText) {

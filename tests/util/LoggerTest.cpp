@@ -100,6 +100,27 @@ TEST(LoggerTest, IsAPlainObject) {
     EXPECT_EQ(4 * sizeof(void*), sizeof(Logger));
 }
 
+TEST(LogMsgMetadataTest, IsStampedWhenItIsMade) {
+    const Logger logger("Name");
+    const Timeval before = Timeval::now();
+    const LogMsgMetadata mdata(&logger, ALERT);
+    const Timeval after = Timeval::now();
+    EXPECT_LE(before, mdata.stamp);
+    EXPECT_LE(mdata.stamp, after);
+    EXPECT_EQ(&logger, mdata.category);
+    EXPECT_EQ(ALERT, mdata.level);
+}
+
+TEST(LogMsgMetadataTest, KeepsTheOrderOfItsFields) {
+    static_assert(std::is_same_v<CurrentTimeval, decltype(LogMsgMetadata::stamp)>);
+    static_assert(std::is_same_v<const Logger*, decltype(LogMsgMetadata::category)>);
+    static_assert(std::is_same_v<LogLevel, decltype(LogMsgMetadata::level)>);
+    const Logger logger("Name");
+    const LogMsgMetadata mdata(&logger, ALERT);
+    EXPECT_LT(static_cast<const void*>(&mdata.stamp), static_cast<const void*>(&mdata.category));
+    EXPECT_LT(static_cast<const void*>(&mdata.category), static_cast<const void*>(&mdata.level));
+}
+
 TEST(LoggerTest, WaitsInAListNewestFirst) {
     const std::string before = waiting();
     const Logger a("a");
@@ -171,6 +192,24 @@ TEST(LoggerTest, FormatsManyArgumentsOfEveryKind) {
     bound.logger.info("%d %ld %lld %c %s %.1f %p %zu %x %u %.2e", -1, -2L, -3LL, 'c', "s", 1.5,
                       static_cast<void*>(nullptr), sizeof(int), 255u, 7u, 12345.0);
     EXPECT_EQ("INFO Bound -1 -2 -3 c s 1.5 (nil) 4 ff 7 1.23e+04\n", writes.text());
+}
+
+TEST(LoggerTest, TakesATextForAFormatAndAStringForAMessage) {
+    Bound bound(DEBUG);
+    const char* const text = "100%%";
+    const std::string string = text;
+    const RecordedWrites writes;
+    for (const EntryPoint& entry : ENTRY_POINTS) {
+        (bound.logger.*entry.print)(text);
+    }
+    bound.logger.warn("50%%");
+    bound.logger.warn(string);
+    bound.logger.warn("<" + string + ">");
+    EXPECT_EQ(
+        "FATAL Bound 100%\nCRIT Bound 100%\nERROR Bound 100%\nWARN Bound 100%\n"
+        "INFO Bound 100%\nDEBUG Bound 100%\n"
+        "WARN Bound 50%\nWARN Bound 100%%\nWARN Bound <100%%>\n",
+        writes.text());
 }
 
 TEST(LoggerTest, TakesStringsAndExceptionsAsTheyStand) {
