@@ -151,6 +151,11 @@ TEST(DCUtilsFilesTest, GivesNullForAFileThatCannotBeOpened) {
     EXPECT_EQ(nullptr, readText(Pathname(dir.file("missing"))));
 }
 
+TEST(DCUtilsFilesTest, ReadsAFolderAsAnEmptyText) {
+    const TempDir dir;  // it opens and has a size, but no bytes can be read
+    expectText("", Pathname(dir.path()));
+}
+
 TEST(DCUtilsFilesTest, GivesNullForAFileWithoutASize) {
     const TempDir dir;
     writeFile(dir.file("text"), "x");

@@ -379,6 +379,24 @@ TEST_F(LogConfig, ErrorsAreReportedLinesFirstThenRootThenCategories) {
                         "category.\n"));
 }
 
+TEST_F(LogConfig, SettingsWithoutWordsAndEmptyValuesAreNoErrors) {
+    const ChildRun run = configured(
+        "rootCategory=\n"
+        "category.X = \n"
+        "category.Y= , \t,\n"
+        "appender.A.fileName =\n"
+        "appender.A.layout.ConversionPattern=\n",
+        [&](bool complete) {
+            EXPECT_TRUE(complete);
+            EXPECT_EQ(INFO, rootChannel().minlevel);
+            EXPECT_NE(&rootChannel(), &channel("X"));
+            EXPECT_EQ(INFO, channel("Y").minlevel);
+            EXPECT_EQ("", LogAppender::find("A", false)->_fmt->_fmt);
+        });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("Appender \"A\" has no filename, assuming stderr\n", run.err);
+}
+
 TEST_F(LogConfig, AnUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppenders) {
     const ChildRun run = configured("rootCategory=WARN,A\n" + fileLine("A") + "category.X=INFO,B\n",
                                     [&](bool complete) {

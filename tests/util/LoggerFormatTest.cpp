@@ -40,6 +40,13 @@ int __wrap___xpg_strerror_r(int errnum, char* buf, std::size_t size) {
 }
 }
 
+// The internal functions, which other programs may declare for themselves.
+bool setup_log_channel(const std::string& line);
+void fallback_to_stderr(LogLevel level, const std::string& msg);
+Timeval& epoch_timeval();
+bool read_line(std::string& result, std::FILE* ifile);
+bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile);
+
 namespace {
 
 class LoggerFormatTest : public testing::Test {
@@ -204,6 +211,26 @@ TEST(LoggerHeader, BringsTheWholeOfLoggingAlong) {
     EXPECT_EQ("WARN net.Http hello", line);
     EXPECT_EQ(nullptr, LogAppender::find("absent", false));
     EXPECT_TRUE((std::is_same_v<bool, decltype(Logger::initialize("log.cfg", "/home"))>));
+}
+
+TEST(LoggerHeader, InternalFunctionsNeedNoHeader) {
+    EXPECT_TRUE(setup_log_channel("declared here=ALERT"));
+    EXPECT_EQ(ALERT, LogChannel::find("declared here", false)->minlevel);
+    EXPECT_EQ(&epoch_timeval(), &epoch_timeval());
+    testing::internal::CaptureStderr();
+    fallback_to_stderr(INFO, "text");
+    EXPECT_EQ("INFO - text\n", testing::internal::GetCapturedStderr());
+
+    char contents[] = "one\ntwo --> three\n";
+    std::FILE* const file = ::fmemopen(contents, sizeof contents - 1, "r");
+    std::string line;
+    EXPECT_TRUE(read_line(line, file));
+    EXPECT_EQ("one", line);
+    unsigned lineno = 1;
+    EXPECT_TRUE(handle_xml_comment(line, "", lineno, file));
+    EXPECT_EQ("one three", line);
+    EXPECT_EQ(2u, lineno);
+    std::fclose(file);
 }
 
 TEST_F(LoggerFormatTest, KeepsCharactersBehindANul) {
