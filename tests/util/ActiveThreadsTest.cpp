@@ -10,6 +10,7 @@
 #include <thread>
 #include <vector>
 
+#include "support/AllocationProbe.h"
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
@@ -247,6 +248,18 @@ TEST(ActiveThreadsTest, LeavesAWorkerUnregisteredWhenItCannotBeAdded) {
     std::string name;
     runWorker("Next", [&] { name = Thread::currentName(); });
     EXPECT_EQ("Next", name);
+}
+
+TEST(ActiveThreadsTest, SaysThatItHasNoMemoryForItself) {
+    mainThread();
+    const StderrCapture err;
+    {
+        const AllocationProbe probe(1);
+        ActiveThreads::add(&mainThread());
+    }
+    EXPECT_EQ(nullptr, Thread::current());
+    expectNoRegistry();
+    EXPECT_EQ(NOT_REGISTERED, err.text());
 }
 
 TEST(ActiveThreadsTest, KeepsTheOthersWhenAWorkerCannotBeAdded) {
