@@ -44,8 +44,8 @@ constinit Mutex& ready_to_run_lock = startMutex.mutex;
 
 constinit std::atomic<bool> threadLoggerGone{false};
 
-// The unit's logger, and the end of its locks at exit. Every Thread makes it before itself, so that
-// the locks outlive static Thread objects of any unit. Workers that were never joined keep them.
+// The unit's logger, and the end of its locks at exit. Every worker makes it before itself, so that
+// the locks outlive static workers of any unit. Workers that were never joined keep them.
 struct ProcessState {
     ProcessState() : logger("Thread") {}
     ~ProcessState() {
@@ -107,7 +107,6 @@ Thread::Thread()
       _did_join(true),
       _ready_to_run(true),
       _jhelp(this) {
-    processState();
     if (main_thread_created.exchange(true)) {
         throw PthreadException("Main Thread created twice!");
     }

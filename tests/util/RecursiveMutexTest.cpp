@@ -73,6 +73,18 @@ TEST(RecursiveMutexTest, UnlockDoesNotAskWhoTheOwnerIs) {
     EXPECT_FALSE(mutex._owner_valid);
 }
 
+TEST(RecursiveMutexTest, IsNotTakenAgainByAFormerOwner) {
+    RecursiveMutex mutex;
+    mutex.lock();
+    mutex.unlock();
+    EXPECT_TRUE(mutex._owner == PthreadToken::self());
+    // Held, and not claimed yet by whoever holds it.
+    mutex._mutex.lock();
+    EXPECT_FALSE(mutex.tryLock());
+    EXPECT_EQ(0U, mutex._owner_count);
+    mutex._mutex.unlock();
+}
+
 TEST(RecursiveMutexTest, ForgetsAnOwnerThatHasLetGo) {
     RecursiveMutex mutex;
     mutex.lock();

@@ -17,6 +17,7 @@
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
 #include "util/LogInternal.h"
+#include "util/Logger.h"
 #include "util/Thread.h"
 
 namespace {
@@ -34,23 +35,29 @@ std::string failure() {
 // Decides about the exit status of a child after everything else was destroyed.
 struct Judge {
     ~Judge() {
-        if (!judging) {
-            return;
+        if (judging) {
+            ::_exit(lastWorkerRan && reportsWithoutLogger() ? statusOfLocks() : OTHERWISE);
         }
+    }
+
+    int statusOfLocks() const {
         const auto at = [this](const pthread_mutex_t* mutex) {
             return std::find(destroyed.begin(), destroyed.end(), mutex) - destroyed.begin();
         };
         const auto none = static_cast<std::ptrdiff_t>(destroyed.size());
         const auto start = at(startLock);
         const auto registry = at(&ActiveThreads::_mutex._pthread_mutex);
-        int status = OTHERWISE;
         if (start < registry && registry < none) {
-            status = IN_ORDER;
-        } else if (start == none && registry == none) {
-            status = NOT_DESTROYED;
+            return IN_ORDER;
         }
-        // The unit's logger is gone by now.
-        ::_exit(failure() == lastFailure && lastWorkerRan ? status : OTHERWISE);
+        return start == none && registry == none ? NOT_DESTROYED : OTHERWISE;
+    }
+
+    // The unit's logger is gone by now.
+    bool reportsWithoutLogger() const {
+        const StderrCapture err;
+        return failure() == lastFailure &&
+               err.text() == (lastFailure.empty() ? "" : "WARN - " + lastFailure + "\n");
     }
 
     bool judging = false;
@@ -61,18 +68,13 @@ struct Judge {
 };
 __attribute__((init_priority(102))) Judge judge;
 
-// Uses everything before the library's statics exist, and a worker after main.
+// Uses locks and a worker before the library's statics exist, and a worker after main.
 struct Early {
     Early() : firstOfAll(uninitialized_loggers == nullptr), name(Thread::currentName()) {
         Mutex mutex;
         mutex.lock();
         mutexWorks = !mutex.tryLock();
         mutex.unlock();
-        {
-            const StderrCapture err;
-            thrown = failure();
-            printed = err.text();
-        }
         runWorker("Early", [this] { workerName = Thread::currentName(); });
         onMutexDestroy = [](const pthread_mutex_t* destroyed) {
             if (judge.judging) {
@@ -88,24 +90,41 @@ struct Early {
     bool firstOfAll;
     std::string name;
     bool mutexWorks = false;
-    std::string thrown;
-    std::string printed;
     std::string workerName;
 };
-__attribute__((init_priority(102))) Early early;
+__attribute__((init_priority(103))) Early early;
+
+// Reports a failure before the library's statics exist.
+struct EarlyFailure {
+    EarlyFailure() {
+        const StderrCapture err;
+        thrown = failure();
+        printed = err.text();
+    }
+
+    std::string thrown;
+    std::string printed;
+};
+__attribute__((init_priority(104))) EarlyFailure earlyFailure;
 
 TEST(ThreadStaticsTest, EverythingWorksBeforeTheLibraryIsInitialized) {
     EXPECT_TRUE(early.firstOfAll);
     EXPECT_EQ("Main Thread", early.name);
     EXPECT_TRUE(early.mutexWorks);
-    EXPECT_EQ(FAILURE, early.thrown);
-    EXPECT_EQ(std::string(FAILURE) + "\n", early.printed);
+    EXPECT_EQ(FAILURE, earlyFailure.thrown);
+    EXPECT_EQ(std::string(FAILURE) + "\n", earlyFailure.printed);
     EXPECT_EQ("Early", early.workerName);
 }
 
 TEST(ThreadStaticsTest, LocksOutliveStaticObjectsAndAreDestroyedAtExit) {
     EXPECT_EXIT(
         {
+            Logger::initialize();
+            {
+                ScriptedCalls creations("pthread_create");
+                creations.give(EAGAIN);
+                EXPECT_THROW(Worker("Never", [] {}), PthreadException);
+            }
             Worker worker("Sorter", [] {});
             worker.go();
             judge.startLock = seenByPthread.locked;
