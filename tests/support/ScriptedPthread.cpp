@@ -1,5 +1,7 @@
 #include "support/ScriptedPthread.h"
 
+#include <unistd.h>
+
 #include <climits>
 
 thread_local SeenByPthread seenByPthread;
@@ -35,21 +37,24 @@ __attribute__((init_priority(101))) Start atStart;
         return scriptedCall(#function, [&] { return __real_##function arguments; }); \
     }
 
-// The same for what a runtime calls.
-#define SCRIPTED_LATE(function, parameters, arguments)                                \
-    int __real_##function parameters;                                                 \
-    static int scripted_##function parameters {                                       \
-        return scriptedCall(#function, [&] { return __real_##function arguments; });  \
-    }                                                                                 \
-    NOT_INSTRUMENTED int __wrap_##function parameters;                                \
-    int __wrap_##function parameters {                                                \
-        return started ? scripted_##function arguments : __real_##function arguments; \
+// The same for what a runtime calls, on threads that have hardly begun too: only calls on the main
+// thread take part.
+#define SCRIPTED_ON_MAIN_THREAD(function, parameters, arguments)                     \
+    int __real_##function parameters;                                                \
+    static int scripted_##function parameters {                                      \
+        return scriptedCall(#function, [&] { return __real_##function arguments; }); \
+    }                                                                                \
+    NOT_INSTRUMENTED int __wrap_##function parameters;                               \
+    int __wrap_##function parameters {                                               \
+        return started && ::gettid() == ::getpid() ? scripted_##function arguments   \
+                                                   : __real_##function arguments;    \
     }
 
 extern "C" {
 
-SCRIPTED_LATE(pthread_attr_init, (pthread_attr_t * attr), (attr))
-SCRIPTED_LATE(pthread_attr_setstacksize, (pthread_attr_t * attr, size_t size), (attr, size))
+SCRIPTED_ON_MAIN_THREAD(pthread_attr_init, (pthread_attr_t * attr), (attr))
+SCRIPTED_ON_MAIN_THREAD(pthread_attr_setstacksize, (pthread_attr_t * attr, size_t size),
+                        (attr, size))
 
 int __real_pthread_key_create(pthread_key_t* key, void (*cleanup)(void*));
 static int scripted_pthread_key_create(pthread_key_t* key, void (*cleanup)(void*)) {

@@ -251,6 +251,7 @@ TEST(ActiveThreadsTest, LeavesAWorkerUnregisteredWhenItCannotBeAdded) {
 }
 
 TEST(ActiveThreadsTest, SaysThatItHasNoMemoryForItself) {
+    REQUIRE_ALLOCATION_PROBE();
     mainThread();
     const StderrCapture err;
     {

@@ -211,8 +211,12 @@ TEST(ThreadTest, AssertsOnDestructionBeforeJoin) {
                 failedAssertion("src/util/Thread.cpp", "_did_join || !checkThreadErrors"));
     EXPECT_EXIT(
         {
-            Worker worker("Sorter", [] {});
+            std::atomic<bool> running{false};
+            Worker worker("Sorter", [&] { running = true; });
             worker.go();
+            while (!running) {
+                std::this_thread::yield();
+            }
         },
         testing::KilledBySignal(SIGABRT),
         failedAssertion("src/util/Thread.cpp", "_did_join || !checkThreadErrors"));
