@@ -6,8 +6,9 @@
 // One error policy covers every call but the NOLOG_ pair: a pthread function that fails is logged
 // as a warning on the logger "Thread" and then thrown as a PthreadException with the same text.
 // The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a checked
-// failure would log through the very logger that it is locking. The destructors are checked too,
-// and therefore may throw.
+// failure would log through the very logger that it is locking.
+// Deliberate: the destructors are checked too, and so may throw. A class that holds one of these by
+// value and whose destructor must not throw says noexcept, and ends the program instead.
 // A Mutex of static storage duration is constant-initialized: it can be used before main, whatever
 // the order in which units are initialized.
 // Safe from any thread, once the object is constructed and until its destruction begins.

@@ -34,7 +34,9 @@ public:
     };
 
     // Stands for the calling thread, under the name "Main Thread".
-    // Errors: PthreadException "Main Thread created twice!", also after the first was destroyed.
+    // Errors: PthreadException "Main Thread created twice!".
+    // Deliberate: there is one in the life of a process, also when it was destroyed or its
+    // construction failed half way.
     // A stack size that cannot be set is only a warning.
     Thread();
 
@@ -63,16 +65,18 @@ public:
 
     // Waits until the thread has ended.
     // Requires: not called before (asserted).
+    // Deliberate: a join that fails counts too; it is not tried again, and the object may go.
     void join();
 
-    // Owns: this object.
+    // Owns: the helper is a part of this object.
     JoinHelper* joinHelper() { return &_jhelp; }
 
     // Returns: the calling thread's object; null on the main thread and on every thread that no
     // Thread stands for.
     static Thread* current();
 
-    // Returns: the calling thread's name, "Main Thread" where current() is null.
+    // Returns: the calling thread's name.
+    // Deliberate: "Main Thread" where current() is null, on whichever thread that is.
     // Threads: takes no lock; touches nothing shared on a thread that no Thread stands for.
     static const char* currentName();
 
