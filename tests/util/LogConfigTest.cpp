@@ -11,6 +11,7 @@
 #include <filesystem>
 #include <random>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "support/InChild.h"
@@ -21,6 +22,7 @@
 #include "util/LogInternal.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
+#include "util/Timeval.h"
 
 namespace fs = std::filesystem;
 using namespace std::string_literals;
@@ -205,6 +207,23 @@ TEST_F(LogConfig, APipeIsReadAsItComes) {
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ(parseError(2, "bad"), run.err);
+}
+
+TEST_F(LogConfig, TheEpochIsFixedBeforeTheFileIsRead) {
+    ASSERT_EQ(0, ::mkfifo(_cfg.c_str(), 0600));
+    const ChildRun run = inChild([&] {
+        Timeval opened;
+        std::thread writer([&] {
+            std::FILE* const pipe = std::fopen(_cfg.c_str(), "w");  // waits for the reader
+            opened = Timeval::now();
+            while (Timeval::now() <= opened) {}
+            std::fclose(pipe);
+        });
+        EXPECT_TRUE(Logger::initialize(Pathname(_cfg), Pathname()));
+        writer.join();
+        EXPECT_LE(epoch_timeval(), opened);
+    });
+    EXPECT_EQ(0, run.status);
 }
 
 TEST_F(LogConfig, InitializingTwiceIsAnError) {
