@@ -288,6 +288,19 @@ TEST_F(LogAppenderFault, ALineCostsOneWriteAndAnIdentityCheckEveryFiveSeconds) {
     EXPECT_EQ(0U, opens.calls());
 }
 
+TEST_F(LogAppenderFault, EveryRotationClosesTheFileThatItLeaves) {
+    _log._maxSize = 1;
+    _log._maxBackupIndex = 2;
+    line("first");
+    ScriptedCalls opens("open");
+    ScriptedCalls closes("close");
+    for (int i = 0; i < 5; ++i) {
+        line("text");
+    }
+    EXPECT_EQ(5U, opens.calls());
+    EXPECT_EQ(5U, closes.calls());
+}
+
 TEST_F(LogAppenderFault, StandardErrorIsNeverExamined) {
     LogAppender appender;
     appender.finalSetup("E");
