@@ -14,6 +14,7 @@
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
+#include "util/Logger.h"
 #include "util/Thread.h"
 
 namespace {
@@ -261,6 +262,21 @@ TEST(ActiveThreadsTest, SaysThatItHasNoMemoryForItself) {
     EXPECT_EQ(nullptr, Thread::current());
     expectNoRegistry();
     EXPECT_EQ(NOT_REGISTERED, err.text());
+}
+
+TEST(ActiveThreadsTest, ReportsAWorkerThatCannotBeAddedAsAnErrorOfTheLoggerNamedThread) {
+    for (const bool shown : {true, false}) {
+        const ChildRun run = inChild([&] {
+            Logger::setChannelLevel(nullptr, shown ? "FATAL" : "DEBUG");
+            Logger::setChannelLevel("Thread", shown ? "ERROR" : "CRIT");
+            Logger::initialize();
+            ScriptedCalls creations("pthread_key_create");
+            creations.give(EAGAIN);
+            ActiveThreads::add(&mainThread());
+        });
+        EXPECT_EQ(0, run.status);
+        EXPECT_EQ(shown ? NOT_REGISTERED : "", run.err);
+    }
 }
 
 TEST(ActiveThreadsTest, KeepsTheOthersWhenAWorkerCannotBeAdded) {

@@ -10,13 +10,40 @@
 #include <cstdlib>
 #include <ctime>
 #include <string>
+#include <type_traits>
 
 #include "support/Arguments.h"
+#include "support/FieldOrder.h"
 #include "support/ParsedLoaderInfo.h"
 #include "support/TempDir.h"
 #include "util/Logger.h"
 
 namespace {
+
+// How callers see the record: results are copies, and queries work on a record that is const.
+template <typename Result>
+using Getter = Result (LoaderInfo::*)() const;
+using Words = const char* const*;
+static_assert(std::is_same_v<decltype(&LoaderInfo::getQueltaHome), Getter<Pathname>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getQueltaDb), Getter<Pathname>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getCommonConfigPath), Getter<Pathname>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getInstallConfigPath), Getter<Pathname>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getComponentName), Getter<std::string>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getInstallName), Getter<std::string>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getHost), Getter<std::string>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getStartupMode), Getter<std::string>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getPort), Getter<int>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getPid), Getter<pid_t>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getStartupTime), Getter<time_t>>);
+static_assert(
+    std::is_same_v<decltype(&LoaderInfo::getCommonComponentNode), Getter<const xml::node&>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::validate), Getter<int>>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getErrorMessage), const char* (*)(int)>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::getInstance), LoaderInfo* (*)()>);
+static_assert(std::is_same_v<decltype(&LoaderInfo::init), void (LoaderInfo::*)(int, Words)>);
+static_assert(
+    std::is_same_v<decltype(&LoaderInfo::common_main_setup), void (*)(int, Words, Words)>);
+static_assert(!std::is_polymorphic_v<LoaderInfo>);
 
 const Arguments none{};
 
@@ -40,6 +67,36 @@ TEST(LoaderInfoTest, StartsEmptyWithNothingLeftUndefined) {
     EXPECT_FALSE(info.isError());
     EXPECT_EQ(nullptr, info._poptContext);
     EXPECT_STREQ("", info.getCommonComponentNode().get_content());
+}
+
+TEST(LoaderInfoTest, KeepsItsFieldsInOrder) {
+    const LoaderInfo info;
+    EXPECT_TRUE(standInOrder({&info._queltaHome,
+                              &info._queltaDb,
+                              &info._componentName,
+                              &info._commonConfigPath,
+                              &info._installName,
+                              &info._rpcPort,
+                              &info._pid,
+                              &info._startupTime,
+                              &info._host,
+                              &info._commonComponentNode,
+                              &info._isDebug,
+                              &info._useDebugLog,
+                              &info._isDaemon,
+                              &info._startupMode,
+                              &info._poptOptionsTable,
+                              &info._poptContext,
+                              &info._poptIsDebug,
+                              &info._poptUseDebugLog,
+                              &info._poptIsNodaemon,
+                              &info._poptCommonConfigPath,
+                              &info._poptHost,
+                              &info._poptInstallName,
+                              &info._poptComponentName,
+                              &info._poptRpcPort,
+                              &info._optionsError,
+                              &info._poptStartupMode}));
 }
 
 TEST(LoaderInfoTest, InitSetsTheDefaults) {
@@ -530,15 +587,16 @@ TEST(LoaderInfoTest, StartUpFillsTheRecordAnnouncesTheConfigurationAndStartsLogg
     EXPECT_EQ("logged\n", readFile(dir.file("log")));
 }
 
-TEST(LoaderInfoTest, StartUpGoesOnWithoutAConfiguration) {
+// Unbuffered, so that the order in which things are said shows.
+TEST(LoaderInfoTest, StartUpAnnouncesTheConfigurationBeforeItIsReadAndGoesOnWithoutIt) {
     const TempDir dir;
     ::setenv("QUELTA_HOME", dir.path().c_str(), 1);
     const std::string config = dir.path() + "/etc/log-cmdline.cfg";
-    EXPECT_EXIT(
-        startUp(none), testing::ExitedWithCode(0),
-        testing::AllOf(testing::HasSubstr("Using logging configuration at " + config + ".\n"),
-                       testing::HasSubstr("Couldn't open log file configuration \"" + config +
-                                          "\": No such file or directory\n")));
+    EXPECT_EXIT((std::setvbuf(stdout, nullptr, _IONBF, 0), startUp(none)),
+                testing::ExitedWithCode(0),
+                testing::Eq("Using logging configuration at " + config +
+                            ".\nCouldn't open log file configuration \"" + config +
+                            "\": No such file or directory\n"));
 }
 
 }  // namespace

@@ -6,6 +6,7 @@
 
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
+#include "util/Logger.h"
 #include "util/Thread.h"
 
 namespace {
@@ -100,6 +101,24 @@ TEST(MainThreadTest, OnlyWarnsAboutAStackSizeThatCannotBeSet) {
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("cannot override thread stack size: pthread_attr_setstacksize(): Invalid argument\n",
               run.err);
+}
+
+TEST(MainThreadTest, WarnsAboutTheStackSizeOnTheLoggerNamedThread) {
+    for (const bool shown : {true, false}) {
+        const ChildRun run = inChild([&] {
+            Logger::setChannelLevel(nullptr, shown ? "ERROR" : "DEBUG");
+            Logger::setChannelLevel("Thread", shown ? "WARN" : "ERROR");
+            Logger::initialize();
+            ScriptedCalls sizes("pthread_attr_setstacksize");
+            sizes.give(EINVAL);
+            const Thread main;
+        });
+        EXPECT_EQ(0, run.status);
+        EXPECT_EQ(shown ? "cannot override thread stack size: pthread_attr_setstacksize(): "
+                          "Invalid argument\n"
+                        : "",
+                  run.err);
+    }
 }
 
 }  // namespace

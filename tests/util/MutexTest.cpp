@@ -9,6 +9,7 @@
 #include <mutex>
 #include <string>
 #include <type_traits>
+#include <utility>
 
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
@@ -25,6 +26,11 @@ static_assert(std::is_empty_v<PthreadObject>);
 static_assert(sizeof(Mutex) == sizeof(pthread_mutex_t));
 static_assert(sizeof(ConditionWakeAll) == sizeof(pthread_cond_t));
 static_assert(!std::is_copy_constructible_v<Mutex> && !std::is_copy_assignable_v<Mutex>);
+
+static_assert(std::is_same_v<decltype(&Mutex::tryLock), bool (Mutex::*)()>);
+static_assert(std::is_same_v<decltype(std::declval<Mutex&>().NOLOG_lock()), bool>);
+static_assert(std::is_same_v<decltype(std::declval<Mutex&>().NOLOG_unlock()), int>);
+static_assert(std::is_constructible_v<PthreadException, const char*>);
 
 constinit Mutex staticMutex;
 
@@ -202,6 +208,25 @@ TEST(PthreadObjectTest, NamesTheThreadThatMadeTheCall) {
               [&] { text = thrownBy([] { PthreadObject::checkPtRes("pthread_thing", EINVAL); }); });
     EXPECT_EQ(pthreadFailure("pthread_thing", "Invalid argument", "Sorter"), text);
     EXPECT_EQ(text + "\n", err.text());
+}
+
+TEST(PthreadObjectTest, TakesNoNameForAFormat) {
+    const StderrCapture err;
+    std::string text;
+    runWorker("100%s %m",
+              [&] { text = thrownBy([] { PthreadObject::checkPtRes("pthread_%d%n", EINVAL); }); });
+    EXPECT_EQ(pthreadFailure("pthread_%d%n", "Invalid argument", "100%s %m"), text);
+    EXPECT_EQ(text + "\n", err.text());
+}
+
+TEST(PthreadObjectTest, ReportsNamesOfAnyLengthAndResultsWithoutAText) {
+    const StderrCapture err;
+    const std::string function(10000, 'f');
+    const std::string text = pthreadFailure(function, "UNKNOWN ERROR");
+    EXPECT_EQ(text, thrownBy([&] { PthreadObject::checkPtRes(function.c_str(), 9999); }));
+    EXPECT_EQ(text + "\n", err.text());
+    EXPECT_EQ(pthreadFailure("f", "UNKNOWN ERROR"),
+              thrownBy([] { PthreadObject::checkPtRes("f", -1); }));
 }
 
 TEST(PthreadObjectTest, WarnsOnTheLoggerNamedThread) {

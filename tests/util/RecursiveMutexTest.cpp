@@ -6,6 +6,7 @@
 #include <thread>
 #include <vector>
 
+#include "support/FieldOrder.h"
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
 #include "util/Mutex.h"
@@ -31,6 +32,8 @@ TEST(RecursiveMutexTest, IsNobodysAtFirst) {
     EXPECT_FALSE(mutex._owner_valid);
     EXPECT_EQ(0U, mutex._owner_count);
     EXPECT_TRUE(isFree(mutex));
+    EXPECT_TRUE(standInOrder({&mutex._mutex, &mutex._owner_mutex, &mutex._owner,
+                              &mutex._owner_valid, &mutex._owner_count}));
 }
 
 TEST(RecursiveMutexTest, LockedThreeTimesNeedsThreeUnlocks) {

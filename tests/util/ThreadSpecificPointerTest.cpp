@@ -4,6 +4,7 @@
 #include <thread>
 #include <vector>
 
+#include "support/FieldOrder.h"
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
@@ -109,6 +110,7 @@ TEST_F(TspImplementorTest, KeepsItsFunctionAndDeletesItsKey) {
     {
         const TSP_Implementor pointer(clean);
         EXPECT_EQ(&clean, pointer._cleanup_fn);
+        EXPECT_TRUE(standInOrder({&pointer._key, &pointer._cleanup_fn}));
     }
     EXPECT_EQ(1U, creations.calls());
     EXPECT_EQ(1U, deletions.calls());

@@ -9,7 +9,9 @@
 #include <string>
 #include <thread>
 #include <type_traits>
+#include <vector>
 
+#include "support/FieldOrder.h"
 #include "support/InChild.h"
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
@@ -22,6 +24,14 @@ static_assert(std::has_virtual_destructor_v<InThreadActor>);
 static_assert(std::is_base_of_v<InThreadActor, Thread::JoinHelper>);
 static_assert(!std::is_copy_constructible_v<Thread> && !std::is_copy_assignable_v<Thread>);
 static_assert(Thread::s_stackSize == 1048576);
+static_assert(std::is_same_v<decltype(&Thread::callMain), void* (*)(void*)>);
+static_assert(std::is_same_v<decltype(&Thread::current), Thread* (*)()>);
+static_assert(std::is_same_v<decltype(&Thread::currentName), const char* (*)()>);
+static_assert(std::is_same_v<decltype(&Thread::mainThreadDying), void (*)()>);
+static_assert(std::is_same_v<decltype(&Thread::name), const char* (Thread::*)() const>);
+static_assert(std::is_same_v<decltype(&Thread::isCurrent), bool (Thread::*)() const>);
+static_assert(std::is_same_v<decltype(&ActiveThreads::add), void (*)(Thread*)>);
+static_assert(std::is_same_v<decltype(&ActiveThreads::remove), void (*)(void*)>);
 
 // Tells when it is deleted.
 class Mortal : public Worker {
@@ -178,6 +188,24 @@ TEST(ThreadTest, WorkersGetAStackOfOneMebibyte) {
     worker.join();
 }
 
+TEST(ThreadTest, KeepsItsFieldsInOrder) {
+    const Thread& main = mainThread();
+    EXPECT_TRUE(standInOrder({&main._token, &main._name, &main._did_join, &main._ready_to_run,
+                              &main._ready_to_run_cond, &main._jhelp}));
+}
+
+TEST(ThreadTest, StartRoutineRunsTheBodyAsThatThreadAndReturnsNull) {
+    std::vector<std::string> names;
+    Worker worker("Sorter", [&] { names.emplace_back(Thread::currentName()); });
+    worker.go();
+    worker.join();
+    // The handshake is over, so whoever calls the routine now goes through at once.
+    EXPECT_TRUE(onForeignThread(
+        [&] { return Thread::callMain(&worker) == nullptr && Thread::current() == &worker; }));
+    EXPECT_EQ((std::vector<std::string>{"Sorter", "Sorter"}), names);
+    EXPECT_EQ(0U, ActiveThreads::_nthreads);
+}
+
 TEST(ThreadTest, WithoutABodyOfItsOwnRunsNone) {
     mainThread();
     Thread thread("Plain");
@@ -305,6 +333,7 @@ TEST(InThreadActorTest, IsPendingNowhereAtFirst) {
     EXPECT_FALSE(actor._wantWake);
     EXPECT_FALSE(actor._ran);
     EXPECT_EQ(nullptr, actor._next);
+    EXPECT_TRUE(standInOrder({&actor._wantWake, &actor._cond, &actor._ran, &actor._next}));
 }
 
 TEST(MainThreadDyingTest, LetsAWorkerThatNeverRanBeDestroyed) {

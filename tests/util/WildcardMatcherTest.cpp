@@ -10,10 +10,29 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "support/FieldOrder.h"
+
 namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+
+static_assert(std::is_same_v<decltype(WildcardMatcher::_subStrings), char* [256]>);
+static_assert(std::is_same_v<decltype(WildcardMatcher::_subStringCount), int>);
+static_assert(std::is_same_v<decltype(WildcardMatcher::_isWord), int>);
+static_assert(std::is_same_v<decltype(&WildcardMatcher::getPatternPrefix),
+                             const char* (WildcardMatcher::*)() const>);
+static_assert(std::is_same_v<decltype(&WildcardMatcher::getOrigPattern),
+                             const char* (WildcardMatcher::*)() const>);
+static_assert(std::is_same_v<decltype(&WildcardMatcher::debugOpaqueMatcher),
+                             void (WildcardMatcher::*)() const>);
+static_assert(std::is_convertible_v<const char*, WildcardMatcher>);
+static_assert(!std::is_polymorphic_v<WildcardMatcher>);
+
+// Matching without capture is a query; with capture it is none.
+constexpr bool (WildcardMatcher::*asQuery)(const char*) const = &WildcardMatcher::isMatch;
+constexpr bool (WildcardMatcher::*withCapture)(const char*, std::vector<std::string>&) =
+    &WildcardMatcher::isMatch;
 
 bool matches(const char* pattern, const char* text) {
     const WildcardMatcher matcher(pattern);
@@ -144,6 +163,21 @@ TEST(WildcardMatcherTest, CompilesToSegmentsAndFlags) {
                   matcher.getHardEnd());
         EXPECT_EQ(c.isWord != 0 ? matcher._subStrings[0] : nullptr, matcher.getWord());
     }
+}
+
+TEST(WildcardMatcherTest, IsCalledThroughBothItsForms) {
+    WildcardMatcher matcher("*ar");
+    std::vector<std::string> parts;
+    EXPECT_FALSE((matcher.*asQuery)("fark"));
+    EXPECT_TRUE((matcher.*withCapture)("far", parts));
+    EXPECT_THAT(parts, ElementsAre("f"));
+}
+
+TEST(WildcardMatcherTest, KeepsItsFieldsInOrder) {
+    const WildcardMatcher matcher("");
+    EXPECT_TRUE(
+        standInOrder({&matcher._needle, &matcher._buffer, &matcher._hardEnd, &matcher._hardStart,
+                      &matcher._subStrings, &matcher._subStringCount, &matcher._isWord}));
 }
 
 TEST(WildcardMatcherTest, NumbersItsKinds) {

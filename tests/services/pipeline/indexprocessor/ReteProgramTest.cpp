@@ -1,5 +1,9 @@
 // The functions of the program, linked with its main under another name. random() is replaced by a
-// counting stand-in, or served from a list; time() is a clock that only the cases move.
+// counting stand-in, or served from a list; time() is a clock that only the cases move; the matcher
+// can be made to fail the program's self-check.
+
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
@@ -14,16 +18,21 @@
 
 #include "services/pipeline/indexprocessor/Rete.h"
 #include "support/MatcherOracle.h"
+#include "support/TempDir.h"
 
 extern const char* const WORDS[183];
 int randint(int min, int max);
 void printImplications(StringSet& implications);
 void generateRandomText(std::string& text, bool isQuery);
 void testWildCards(RuleSystem* rs, int testcount);
+int rete_main(int argc, char** argv, char** envp);
 
 extern "C" long __real_random();
 extern "C" std::time_t __wrap_time(std::time_t* out);
 extern "C" long __wrap_random();
+// WildcardMatcher::isMatch without capture, under the linker's name for it.
+extern "C" bool __real__ZNK15WildcardMatcher7isMatchEPKc(const WildcardMatcher*, const char*);
+extern "C" bool __wrap__ZNK15WildcardMatcher7isMatchEPKc(const WildcardMatcher*, const char*);
 
 namespace {
 
@@ -32,10 +41,21 @@ std::deque<long> scripted;
 std::vector<long>* recorded = nullptr;
 std::time_t now = 1000;
 std::time_t secondsPerReading = 0;
+void (*onReading)() = nullptr;
+void (*onDraw)() = nullptr;
+bool faultyMatcher = false;
 
 }  // namespace
 
+extern "C" bool __wrap__ZNK15WildcardMatcher7isMatchEPKc(const WildcardMatcher* matcher,
+                                                         const char* haystack) {
+    return faultyMatcher || __real__ZNK15WildcardMatcher7isMatchEPKc(matcher, haystack);
+}
+
 extern "C" std::time_t __wrap_time(std::time_t* out) {
+    if (onReading != nullptr) {
+        onReading();
+    }
     if (out != nullptr) {
         *out = now;
     }
@@ -45,6 +65,9 @@ extern "C" std::time_t __wrap_time(std::time_t* out) {
 
 extern "C" long __wrap_random() {
     ++draws;
+    if (onDraw != nullptr) {
+        onDraw();
+    }
     long value;
     if (scripted.empty()) {
         value = __real_random();
@@ -69,6 +92,7 @@ protected:
         scripted.clear();
         recorded = nullptr;
         secondsPerReading = 0;
+        onReading = nullptr;
     }
 };
 
@@ -154,6 +178,31 @@ TEST_F(ReteProgramDeathTest, AnEmptyRangeIsAsserted) {
     EXPECT_DEATH(randint(1, 0), "Rete.cpp:[0-9]+: failed assertion `range != 0'");
 }
 
+// Runs the program up to its first draw, where it ends with status 7.
+[[noreturn]] void runToTheFirstDraw(const TempDir& home) {
+    ::dup2(STDERR_FILENO, STDOUT_FILENO);
+    ::setenv("QUELTA_HOME", home.path().c_str(), 1);
+    ::mkdir(home.file("etc").c_str(), 0755);
+    writeFile(home.file("etc/log-cmdline.cfg"), "");
+    onDraw = [] {
+        std::fflush(stdout);
+        ::_exit(7);
+    };
+    std::string name = "Rete";
+    char* argv[] = {name.data(), nullptr};
+    char* envp[] = {nullptr};
+    ::_exit(rete_main(1, argv, envp));
+}
+
+TEST_F(ReteProgramDeathTest, ReportsAFaultyMatcherAndCarriesOn) {
+    const TempDir home;
+    const std::string announcement =
+        "Using logging configuration at " + home.path() + "/etc/log-cmdline.cfg.\n";
+    EXPECT_EXIT((faultyMatcher = true, runToTheFirstDraw(home)), testing::ExitedWithCode(7),
+                testing::Eq(announcement + "BUG IN WILDCARDMATCHER\n"));
+    EXPECT_EXIT(runToTheFirstDraw(home), testing::ExitedWithCode(7), testing::Eq(announcement));
+}
+
 TEST_F(ReteProgramTest, NobodySeedsTheGenerator) {
     srandom(4711);
     std::vector<long> values;
@@ -174,16 +223,47 @@ TEST_F(ReteProgramTest, PrintsImplications) {
     EXPECT_EQ("[]\n", print({}));
     EXPECT_EQ("Implications: a, b, \n", print({"b", "a"}));
     EXPECT_EQ("Implications: , \n", print({""}));
+    EXPECT_EQ("Implications: %s, 100%\n, \n", print({"%s", "100%\n"}));
+    // Printed as C strings, an embedded NUL ends them.
+    EXPECT_EQ("Implications: a, \n", print({std::string("a\0b", 3)}));
 }
 
 TEST_F(ReteProgramTest, HasTheVocabularyInOrder) {
-    EXPECT_EQ(183u, std::size(WORDS));
-    EXPECT_STREQ("100", WORDS[0]);
-    EXPECT_STREQ("abstractconfi", WORDS[3]);
-    EXPECT_STREQ("wsserverimpl", WORDS[182]);
-    for (std::size_t i = 1; i < std::size(WORDS); ++i) {
-        EXPECT_LT(std::string(WORDS[i - 1]), WORDS[i]) << i;
+    const std::string expected =
+        "100 202 206 abstractconfi accessexecute accessnoremotescript accesssource "
+        "accesssslnegotiatecert acl added admininitiali aggregatorminingprocessor algorithm "
+        "allowpathinfoforscriptmappings answered appallowdebugging apppackageid appwamclsid "
+        "aspcodepage aspenableparentpaths aspkeepsessionidsecure aspqueueconnectiontesttime "
+        "aspscripterrormessage aspscripttimeout aspthreadgateloadhigh aspthreadgatetimeslice "
+        "auth authenticated authorizationmanager authpersistence auto begin block buffer bytes "
+        "cacheisapi cancel caused cgitimeout child client command commonprogramfiles "
+        "componentid configuration connection contentindexed couldn cpuappenabled "
+        "cpuenableallproclogging cpuenablekerneltime cpuenabletotalprocs cpulimitpriority "
+        "cpulogginginterval create creating current db debug defaultdocfooter deferring denied "
+        "deploying dhcpinform dial dirbrowseshowdate dirbrowseshowtime disablesocketpooling "
+        "discovereventpoller discoverworker division dontlog enabled enablereversedns entry "
+        "errors exceptions ext fail favicon file flushed getting halt head host httpexpires "
+        "https iis informational inner inst internationalization issuer jdbc jni jvm keyusage "
+        "least licensemanager loaded locknflags logextfileclientip logextfileflags "
+        "logextfilereferer logextfiletime logextfileuseragent logfilelocaltimerollover logger "
+        "logodbcdatasource logon logs mainmenu maxconnections mbrstatexchg metadata min module "
+        "monitorenginestarter name non null observer operating oracle orderdetailma "
+        "passwordcachettl peer pid pool ppid process processing pstn pwd queuelogresponse "
+        "reads recoverydirec register removing reply results roleviewleade schedulerserv "
+        "securitydm sendmail serverbindings servername services setting sighup sip soap "
+        "sourceid sql ssl stage starting stock storing suexec syslogd systemout tcp text "
+        "threadname timedservletpoolelement top total trackingadapt trying unitofwork uri "
+        "userexception validity verbose virtual vsync warning webgroup windowsservices write "
+        "wsserverimpl";
+    ASSERT_EQ(183u, std::size(WORDS));
+    std::string words;
+    for (const char* const word : WORDS) {
+        words += words.empty() ? "" : " ";
+        words += word;
     }
+    EXPECT_EQ(expected, words);
+    EXPECT_STREQ("100", WORDS[0]);
+    EXPECT_STREQ("wsserverimpl", WORDS[182]);
 }
 
 TEST_F(ReteProgramTest, GeneratesTextsFromScriptedDraws) {
@@ -233,6 +313,25 @@ TEST_F(ReteProgramTest, PrintsTheSecondsBetweenTwoReadings) {
     EXPECT_EQ("0 conditions\n[]\n0 implications\nTIME = 7\n",
               printed([&] { testWildCards(&rs, 0); }));
     EXPECT_EQ(before + 14, now) << "read once before and once after";
+    secondsPerReading = 5000000000;
+    EXPECT_EQ("0 conditions\n[]\n0 implications\nTIME = 5000000000\n",
+              printed([&] { testWildCards(&rs, 0); }));
+    secondsPerReading = -3;
+    EXPECT_EQ("0 conditions\n[]\n0 implications\nTIME = -3\n",
+              printed([&] { testWildCards(&rs, 0); }));
+}
+
+// The span begins behind the line of conditions and ends behind the line of implications.
+TEST_F(ReteProgramTest, ReadsTheClockAroundResetAndMatch) {
+    static std::vector<long> printedSoFar;
+    printedSoFar.clear();
+    onReading = [] {
+        std::fflush(stdout);
+        printedSoFar.push_back(::lseek(STDOUT_FILENO, 0, SEEK_CUR));
+    };
+    RuleSystem rs;
+    const std::string output = printed([&] { testWildCards(&rs, 10); });
+    EXPECT_THAT(printedSoFar, ElementsAre(output.find("conditions\n") + 11, output.find("TIME")));
 }
 
 // Each draw is made in its place: counts and output follow from the sequence alone.

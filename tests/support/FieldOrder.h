@@ -1,0 +1,14 @@
+#ifndef QUELTA_TESTS_SUPPORT_FIELDORDER_H_
+#define QUELTA_TESTS_SUPPORT_FIELDORDER_H_
+
+#include <algorithm>
+#include <functional>
+#include <initializer_list>
+
+// Whether these fields of one object lie behind each other in the order given.
+inline bool standInOrder(std::initializer_list<const void*> fields) {
+    return std::adjacent_find(fields.begin(), fields.end(), std::greater_equal<const void*>()) ==
+           fields.end();
+}
+
+#endif  // QUELTA_TESTS_SUPPORT_FIELDORDER_H_
