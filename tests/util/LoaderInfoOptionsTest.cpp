@@ -18,6 +18,31 @@ extern "C" const char* __lsan_default_suppressions() {
 
 namespace {
 
+// What popt was last given for a context.
+struct ContextRequest {
+    std::string name;
+    int argc = -1;
+    const char** argv = nullptr;
+    const struct poptOption* options = nullptr;
+    unsigned flags = ~0U;
+};
+ContextRequest latestRequest;
+
+}  // namespace
+
+extern "C" poptContext __real_poptGetContext(const char* name, int argc, const char** argv,
+                                             const struct poptOption* options, unsigned flags);
+extern "C" poptContext __wrap_poptGetContext(const char* name, int argc, const char** argv,
+                                             const struct poptOption* options, unsigned flags);
+
+extern "C" poptContext __wrap_poptGetContext(const char* name, int argc, const char** argv,
+                                             const struct poptOption* options, unsigned flags) {
+    latestRequest = {name, argc, argv, options, flags};
+    return __real_poptGetContext(name, argc, argv, options, flags);
+}
+
+namespace {
+
 const Arguments none{};
 
 // --- The option table ------------------------------------------------------------------------
@@ -80,6 +105,23 @@ TEST(LoaderInfoTest, InitPointsEachEntryOfItsCopyAtItsField) {
         EXPECT_EQ(master.descrip, entry.descrip) << i;
     }
     EXPECT_NE(nullptr, info._poptContext);
+}
+
+// The context keeps its name whatever the component is called.
+TEST(LoaderInfoTest, InitMakesAContextOverTheArgumentsAndItsOwnTable) {
+    const Arguments arguments{"-n", "comp", "word"};
+    LoaderInfo info;
+    for (int round = 0; round < 2; ++round) {
+        info._componentName = "other";
+        info.init(arguments.argc(), arguments.argv());
+        EXPECT_EQ("queltad", latestRequest.name);
+        EXPECT_EQ(4, latestRequest.argc);
+        EXPECT_EQ(arguments.argv(), latestRequest.argv);
+        EXPECT_EQ(info._poptOptionsTable, latestRequest.options);
+        EXPECT_EQ(0U, latestRequest.flags);
+        info.populateFromCommandLine();
+        EXPECT_EQ("comp", info.getComponentName());
+    }
 }
 
 // --- Command line ----------------------------------------------------------------------------

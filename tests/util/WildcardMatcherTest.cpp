@@ -308,7 +308,7 @@ TEST(WildcardMatcherTest, RefusesMoreThan256Segments) {
 TEST(WildcardMatcherTest, AssignmentAppendsOverAnEmptiedTable) {
     WildcardMatcher matcher("*ab*cd");
     const WildcardMatcher other("x*y");
-    matcher = other;
+    EXPECT_EQ(&matcher, &(matcher = other));
     EXPECT_STREQ("x*y", matcher.getOrigPattern());
     EXPECT_EQ(4, matcher._subStringCount);
     EXPECT_EQ(nullptr, matcher._subStrings[0]);
