@@ -1,9 +1,14 @@
 #include "services/pipeline/indexprocessor/Rete.h"
 
+#include <algorithm>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <ctime>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "util/Assert.h"
 #include "util/LoaderInfo.h"
@@ -88,28 +93,181 @@ void generateRandomText(std::string& text, bool isQuery) {
     }
 }
 
+namespace {
+
+const char* const ALPHABET = "abcdefghijklmnopqrstuvwxyz";
+constexpr std::size_t ALPHABET_LENGTH = 26;
+constexpr int MOST_STARS = 20;
+
+// A drawn pattern, zero behind its last character: each star adds at most one to the alphabet.
+struct Pattern {
+    static constexpr std::size_t SIZE = 48;
+    static constexpr std::size_t WORD_COUNT = SIZE / sizeof(std::uint64_t);
+
+    bool operator==(const Pattern& other) const {
+        return std::memcmp(characters, other.characters, SIZE) == 0;
+    }
+
+    // The same order as that of the strings.
+    bool operator<(const Pattern& other) const {
+        return std::memcmp(characters, other.characters, SIZE) < 0;
+    }
+
+    // The first characters as a number that is ordered like them.
+    std::uint64_t head() const {
+        std::uint64_t number = 0;
+        for (std::size_t i = 0; i < sizeof(number); ++i) {
+            number = number << 8 | static_cast<unsigned char>(characters[i]);
+        }
+        return number;
+    }
+
+    std::uint64_t hash() const {
+        std::uint64_t words[WORD_COUNT];
+        std::memcpy(words, characters, SIZE);
+        std::uint64_t mixed = 0;
+        for (const std::uint64_t word : words) {
+            mixed = (mixed ^ word) * 0xff51afd7ed558ccdU;
+            mixed ^= mixed >> 32;
+        }
+        return mixed;
+    }
+
+    char characters[SIZE];
+};
+static_assert(ALPHABET_LENGTH + MOST_STARS < Pattern::SIZE);
+
+// Draws a pattern: the alphabet, in which one to twenty times a run of characters, possibly none
+// and never the last, becomes a `*`. Everything behind the run moves in one piece of fixed size,
+// with the zeros that follow; so there is room behind the pattern for as many more.
+Pattern drawPattern() {
+    char wild[2 * Pattern::SIZE] = {};
+    std::memcpy(wild, ALPHABET, ALPHABET_LENGTH);
+    int last = static_cast<int>(ALPHABET_LENGTH) - 1;
+    for (int stars = randint(1, MOST_STARS); stars > 0; --stars) {
+        const int start = randint(0, last);
+        const int end = randint(start, last);
+        char behind[Pattern::SIZE];
+        std::memcpy(behind, wild + end, sizeof(behind));
+        wild[start] = '*';
+        std::memcpy(wild + start + 1, behind, sizeof(behind));
+        last -= end - start - 1;
+    }
+    Pattern pattern;
+    std::memcpy(pattern.characters, wild, sizeof(pattern.characters));
+    return pattern;
+}
+
+// The distinct ones among millions of patterns: an open-addressing table of hashes and places in a
+// list. Patterns wait in a batch, because the table is far larger than the nearer caches: by the
+// time that the batch is full, the slots that it needs have been fetched.
+class PatternSet {
+public:
+    PatternSet() : _table(1024) { _batch.reserve(BATCH_SIZE); }
+
+    void add(const Pattern& pattern) {
+        const std::uint64_t hash = pattern.hash();
+        __builtin_prefetch(&_table[hash & (_table.size() - 1)]);
+        _batch.push_back({hash, pattern});
+        if (_batch.size() == BATCH_SIZE) {
+            addBatch();
+        }
+    }
+
+    // Returns: the patterns in ascending order.
+    StringSet sorted() {
+        addBatch();
+        std::vector<std::pair<std::uint64_t, std::uint32_t>> order;
+        order.reserve(_patterns.size());
+        for (const Pattern& pattern : _patterns) {
+            order.emplace_back(pattern.head(), static_cast<std::uint32_t>(order.size()));
+        }
+        std::sort(order.begin(), order.end(), [this](const auto& left, const auto& right) {
+            return left.first != right.first ? left.first < right.first
+                                             : _patterns[left.second] < _patterns[right.second];
+        });
+        StringSet strings;
+        for (const auto& [head, place] : order) {
+            strings.emplace_hint(strings.end(), _patterns[place].characters);
+        }
+        return strings;
+    }
+
+private:
+    static constexpr std::size_t BATCH_SIZE = 64;
+
+    struct Slot {
+        std::uint32_t tag = 0;    // the upper half of the hash
+        std::uint32_t place = 0;  // in _patterns, counted from 1; 0: the slot is free
+    };
+
+    void addBatch() {
+        for (const auto& [hash, pattern] : _batch) {
+            if (Slot& slot = find(hash, pattern); slot.place == 0) {
+                _patterns.push_back(pattern);
+                slot = {static_cast<std::uint32_t>(hash >> 32),
+                        static_cast<std::uint32_t>(_patterns.size())};
+                if (_patterns.size() > _table.size() / 2) {
+                    grow();
+                }
+            }
+        }
+        _batch.clear();
+    }
+
+    // Returns: the slot of the pattern, or the free one where it belongs.
+    Slot& find(std::uint64_t hash, const Pattern& pattern) {
+        const std::uint32_t tag = static_cast<std::uint32_t>(hash >> 32);
+        for (std::size_t i = hash;; ++i) {
+            Slot& slot = _table[i & (_table.size() - 1)];
+            if (slot.place == 0 || (slot.tag == tag && _patterns[slot.place - 1] == pattern)) {
+                return slot;
+            }
+        }
+    }
+
+    void grow() {
+        std::vector<Slot> old(4 * _table.size());
+        old.swap(_table);
+        for (const Slot& slot : old) {
+            if (slot.place != 0) {
+                const Pattern& pattern = _patterns[slot.place - 1];
+                find(pattern.hash(), pattern) = slot;
+            }
+        }
+    }
+
+    std::vector<Pattern> _patterns;                         // distinct, in the order of drawing
+    std::vector<Slot> _table;                               // a power of two, at most half full
+    std::vector<std::pair<std::uint64_t, Pattern>> _batch;  // with their hashes
+};
+
+// Returns: the distinct ones among `count` patterns drawn.
+StringSet generatePatterns(int count) {
+    PatternSet patterns;
+    for (int i = 0; i < count; ++i) {
+        patterns.add(drawPattern());
+    }
+    return patterns.sorted();
+}
+
+// Gives each pattern an operator of its own that implies the pattern as a line.
+void addPatterns(RuleSystem& rs, const StringSet& wildcards) {
+    for (const std::string& wild : wildcards) {
+        std::string imp = wild + '\n';
+        rs.addCondition(wild, *new AndOperator(nullptr, imp));
+    }
+}
+
+}  // namespace
+
 // Fills `rs` with up to `testcount` random patterns, each behind an operator of its own that
 // implies the pattern, sets one term, and prints the counts and the seconds that resetting and
 // matching took.
 void testWildCards(RuleSystem* rs, int testcount) {
-    std::string text = "abcdefghijklmnopqrstuvwxyz";
     StringSet implications;
-    StringSet wildcards;
-    for (int i = 0; i < testcount; ++i) {
-        std::string wild = text;
-        for (int stars = randint(1, 20); stars > 0; --stars) {
-            const int last = static_cast<int>(wild.length()) - 1;
-            const int start = randint(0, last);
-            const int end = randint(start, last);
-            wild.replace(static_cast<std::size_t>(start), static_cast<std::size_t>(end - start),
-                         "*");
-        }
-        wildcards.insert(wild);
-    }
-    for (const std::string& wild : wildcards) {
-        std::string imp = wild + '\n';
-        rs->addCondition(wild, *new AndOperator(nullptr, imp));
-    }
+    const StringSet wildcards = generatePatterns(testcount);
+    addPatterns(*rs, wildcards);
     std::printf("%lu conditions\n", static_cast<unsigned long>(wildcards.size()));
 
     RuleSystem::Candidates candidates;
@@ -117,7 +275,7 @@ void testWildCards(RuleSystem* rs, int testcount) {
     rs->resetAll(implications);
     printImplications(implications);
     // The letter n is gone: only patterns whose star covers its place match.
-    text = "abcdefghijklmxopqrstuvwxyz";
+    const std::string text = "abcdefghijklmxopqrstuvwxyz";
     rs->setCondition(text, candidates, implications);
     std::printf("%lu implications\n", static_cast<unsigned long>(implications.size()));
     const std::time_t end = std::time(nullptr);
