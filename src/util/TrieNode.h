@@ -13,6 +13,8 @@
 #include <utility>
 #include <vector>
 
+#include "util/HugePages.h"
+
 template <typename T>
 class TrieNode {
 public:
@@ -30,12 +32,10 @@ public:
 
     // Stores a copy of `data` behind the values already stored under `key`.
     // Errors: what copying `data` throws, std::bad_alloc; no value is stored then.
-    void addData(const std::string& key, const T& data) { reach(key)._dataList.push_back(data); }
+    void addData(const std::string& key, const T& data) { reach(key).append(data); }
 
     // The same, moving `data`.
-    void addData(const std::string& key, T&& data) {
-        reach(key)._dataList.push_back(std::move(data));
-    }
+    void addData(const std::string& key, T&& data) { reach(key).append(std::move(data)); }
 
     // Replaces `results` by pointers to all values that are stored under a beginning of `key`: the
     // empty one first, then ever longer ones, each node's values in the order of their storing.
@@ -81,6 +81,7 @@ public:
     }
 
 private:
+    static constexpr std::size_t LARGE = 32;
     static int index(char c) { return static_cast<unsigned char>(c); }
 
     int firstUsedSlot() const {
@@ -102,6 +103,20 @@ private:
             node = child;
         }
         return *node;
+    }
+
+    template <typename Data>
+    void append(Data&& data) {
+        if (_dataList.size() == _dataList.capacity() && _dataList.size() >= LARGE) {
+            makeRoom();
+        }
+        _dataList.push_back(std::forward<Data>(data));
+    }
+
+    void makeRoom() {
+        const std::size_t capacity = 8 * _dataList.capacity();
+        _dataList.reserve(capacity);
+        adviseHugePages(static_cast<void*>(_dataList.data()), capacity * sizeof(T));
     }
 
     void appendData(std::vector<T*>& results) {

@@ -80,12 +80,13 @@ WildcardMatcher::WildcardMatcher(WildcardMatcher&& other) noexcept
       _hardStart(other._hardStart),
       _subStringCount(other._subStringCount),
       _isWord(other._isWord) {
-    std::copy_n(other._subStrings, MAX_SUBSTRINGS, _subStrings);
+    std::fill(std::copy_n(other._subStrings, _subStringCount, _subStrings),
+              _subStrings + MAX_SUBSTRINGS, nullptr);
     other._needle = nullptr;
     other._buffer = nullptr;
     other._hardEnd = false;
     other._hardStart = false;
-    std::fill_n(other._subStrings, MAX_SUBSTRINGS, nullptr);
+    std::fill_n(other._subStrings, _subStringCount, nullptr);
     other._subStringCount = 0;
     other._isWord = 0;
 }

@@ -115,6 +115,7 @@ protected:
     const char* _type;  // null, or the type tag
 
 private:
+    static void takeOut(const std::string& implication, StringSet& implications);
     bool updateSelf(StringSet& returnImplications);
 };
 
@@ -131,6 +132,15 @@ public:
     bool shouldFire() override { return _matchCount >= _needMatch; }
 };
 
+// Implications mostly leave in their order, which spares the search.
+inline void BoolOperator::takeOut(const std::string& implication, StringSet& implications) {
+    if (!implications.empty() && *implications.begin() == implication) {
+        implications.erase(implications.begin());
+    } else {
+        implications.erase(implication);
+    }
+}
+
 // The part of update that concerns this operator alone.
 inline bool BoolOperator::updateSelf(StringSet& returnImplications) {
     const bool fires = shouldFire();
@@ -139,13 +149,15 @@ inline bool BoolOperator::updateSelf(StringSet& returnImplications) {
     }
     _fired = fires;
     if (fires) {
-        returnImplications.insert(_implications.begin(), _implications.end());
+        for (const std::string& implication : _implications) {
+            returnImplications.insert(returnImplications.end(), implication);
+        }
         for (BoolOperator* const child : _children) {
             child->incCount();
         }
     } else {
         for (const std::string& implication : _implications) {
-            returnImplications.erase(implication);
+            takeOut(implication, returnImplications);
         }
         for (BoolOperator* const child : _children) {
             child->decCount();

@@ -113,10 +113,10 @@ struct Pattern {
         return std::memcmp(characters, other.characters, SIZE) < 0;
     }
 
-    // The first characters as a number that is ordered like them.
-    std::uint64_t head() const {
+    // Eight characters as a number that is ordered like them.
+    std::uint64_t ordered(std::size_t from) const {
         std::uint64_t number = 0;
-        for (std::size_t i = 0; i < sizeof(number); ++i) {
+        for (std::size_t i = from; i < from + sizeof(number); ++i) {
             number = number << 8 | static_cast<unsigned char>(characters[i]);
         }
         return number;
@@ -137,11 +137,22 @@ struct Pattern {
 };
 static_assert(ALPHABET_LENGTH + MOST_STARS < Pattern::SIZE);
 
+// A pattern in the making, and behind it the zeros that move up when it shrinks.
+struct Draft {
+    char characters[2 * Pattern::SIZE];
+
+    Pattern pattern() const {
+        Pattern finished;
+        std::memcpy(finished.characters, characters, sizeof(finished.characters));
+        return finished;
+    }
+};
+
 // Draws a pattern: the alphabet, in which one to twenty times a run of characters, possibly none
-// and never the last, becomes a `*`. Everything behind the run moves in one piece of fixed size,
-// with the zeros that follow; so there is room behind the pattern for as many more.
-Pattern drawPattern() {
-    char wild[2 * Pattern::SIZE] = {};
+// and never the last, becomes a `*`. What stands behind the run moves as a piece of fixed size.
+void drawPattern(Draft& draft) {
+    draft = Draft();
+    char* const wild = draft.characters;
     std::memcpy(wild, ALPHABET, ALPHABET_LENGTH);
     int last = static_cast<int>(ALPHABET_LENGTH) - 1;
     for (int stars = randint(1, MOST_STARS); stars > 0; --stars) {
@@ -153,66 +164,91 @@ Pattern drawPattern() {
         std::memcpy(wild + start + 1, behind, sizeof(behind));
         last -= end - start - 1;
     }
-    Pattern pattern;
-    std::memcpy(pattern.characters, wild, sizeof(pattern.characters));
-    return pattern;
 }
 
 // The distinct ones among millions of patterns: an open-addressing table of hashes and places in a
-// list. Patterns wait in a batch, because the table is far larger than the nearer caches: by the
-// time that the batch is full, the slots that it needs have been fetched.
+// list. Patterns are drawn in batches, because the table is far larger than the nearer caches: the
+// slots that a batch needs are all on their way before the first is read.
 class PatternSet {
 public:
-    PatternSet() : _table(1024) { _batch.reserve(BATCH_SIZE); }
+    PatternSet() : _table(1024) {}
 
-    void add(const Pattern& pattern) {
-        const std::uint64_t hash = pattern.hash();
-        __builtin_prefetch(&_table[hash & (_table.size() - 1)]);
-        _batch.push_back({hash, pattern});
-        if (_batch.size() == BATCH_SIZE) {
-            addBatch();
+    // Adds `count` drawn patterns.
+    void draw(int count) {
+        Draft batch[BATCH_SIZE];
+        while (count > 0) {
+            const int size = std::min(count, BATCH_SIZE);
+            for (int i = 0; i < size; ++i) {
+                drawPattern(batch[i]);
+            }
+            add(batch, size);
+            count -= size;
         }
     }
 
     // Returns: the patterns in ascending order.
-    StringSet sorted() {
-        addBatch();
-        std::vector<std::pair<std::uint64_t, std::uint32_t>> order;
-        order.reserve(_patterns.size());
-        for (const Pattern& pattern : _patterns) {
-            order.emplace_back(pattern.head(), static_cast<std::uint32_t>(order.size()));
-        }
-        std::sort(order.begin(), order.end(), [this](const auto& left, const auto& right) {
-            return left.first != right.first ? left.first < right.first
-                                             : _patterns[left.second] < _patterns[right.second];
-        });
+    StringSet sorted() const {
+        const std::vector<Key> order = sortedKeys();
         StringSet strings;
-        for (const auto& [head, place] : order) {
-            strings.emplace_hint(strings.end(), _patterns[place].characters);
+        for (std::size_t i = 0; i < order.size(); ++i) {
+            const std::size_t ahead = std::min(i + 16, order.size() - 1);
+            __builtin_prefetch(&_patterns[order[ahead].place]);
+            strings.emplace_hint(strings.end(), _patterns[order[i].place].characters);
         }
         return strings;
     }
 
 private:
-    static constexpr std::size_t BATCH_SIZE = 64;
+    static constexpr int BATCH_SIZE = 64;
 
     struct Slot {
         std::uint32_t tag = 0;    // the upper half of the hash
         std::uint32_t place = 0;  // in _patterns, counted from 1; 0: the slot is free
     };
 
-    void addBatch() {
-        for (const auto& [hash, pattern] : _batch) {
-            if (Slot& slot = find(hash, pattern); slot.place == 0) {
+    // The first characters, which mostly decide the order, and the place in _patterns.
+    struct Key {
+        std::uint64_t first;
+        std::uint64_t second;
+        std::uint32_t place;
+    };
+
+    std::vector<Key> sortedKeys() const {
+        std::vector<Key> order;
+        order.reserve(_patterns.size());
+        for (const Pattern& pattern : _patterns) {
+            order.push_back({pattern.ordered(0), pattern.ordered(sizeof(Key::first)),
+                             static_cast<std::uint32_t>(order.size())});
+        }
+        std::sort(order.begin(), order.end(), [this](const Key& left, const Key& right) {
+            if (left.first != right.first) {
+                return left.first < right.first;
+            }
+            if (left.second != right.second) {
+                return left.second < right.second;
+            }
+            return _patterns[left.place] < _patterns[right.place];
+        });
+        return order;
+    }
+
+    void add(const Draft* batch, int size) {
+        std::uint64_t hashes[BATCH_SIZE];
+        for (int i = 0; i < size; ++i) {
+            hashes[i] = batch[i].pattern().hash();
+            __builtin_prefetch(&_table[hashes[i] & (_table.size() - 1)]);
+        }
+        for (int i = 0; i < size; ++i) {
+            const Pattern pattern = batch[i].pattern();
+            if (Slot& slot = find(hashes[i], pattern); slot.place == 0) {
                 _patterns.push_back(pattern);
-                slot = {static_cast<std::uint32_t>(hash >> 32),
+                slot = {static_cast<std::uint32_t>(hashes[i] >> 32),
                         static_cast<std::uint32_t>(_patterns.size())};
                 if (_patterns.size() > _table.size() / 2) {
                     grow();
                 }
             }
         }
-        _batch.clear();
     }
 
     // Returns: the slot of the pattern, or the free one where it belongs.
@@ -237,17 +273,14 @@ private:
         }
     }
 
-    std::vector<Pattern> _patterns;                         // distinct, in the order of drawing
-    std::vector<Slot> _table;                               // a power of two, at most half full
-    std::vector<std::pair<std::uint64_t, Pattern>> _batch;  // with their hashes
+    std::vector<Pattern> _patterns;  // distinct, in the order of drawing
+    std::vector<Slot> _table;        // a power of two, at most half full
 };
 
 // Returns: the distinct ones among `count` patterns drawn.
 StringSet generatePatterns(int count) {
     PatternSet patterns;
-    for (int i = 0; i < count; ++i) {
-        patterns.add(drawPattern());
-    }
+    patterns.draw(count);
     return patterns.sorted();
 }
 

@@ -80,7 +80,7 @@ public:
     ~RuleSystem() { clearRules(); }
 
     // Takes ownership of `op`, made with new. Doing so twice is the same as once.
-    void addOperator(BoolOperator& op) { _allOperators.insert(&op); }
+    void addOperator(BoolOperator& op) { _allOperators.insert(_allOperators.end(), &op); }
 
     // Makes the condition `keyword` feed `op`, and takes ownership of `op`. A keyword with a `*`
     // is a pattern, and a candidate once for each time it is added.
@@ -164,11 +164,13 @@ inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& o
         matcher.emplace(keyword.c_str());
     }
     addOperator(op);
-    auto place = _conditions.find(keyword);
-    if (place == _conditions.end()) {
+    // Names often come in order; then the place is behind the last and needs no search.
+    const bool last = !_conditions.empty() && _conditions.rbegin()->first < keyword;
+    auto place = last ? _conditions.end() : _conditions.lower_bound(keyword);
+    if (place == _conditions.end() || place->first != keyword) {
         auto fresh = std::make_unique<Conditional>(keyword);
         fresh->addOperator(op);
-        place = _conditions.emplace(keyword, fresh.get()).first;
+        place = _conditions.emplace_hint(place, keyword, fresh.get());
         fresh.release();
     } else {
         place->second->addOperator(op);
@@ -208,7 +210,7 @@ inline void RuleSystem::changeOneCondition(bool newState, Conditional& cond,
     cond.set(implications);
     std::string name;
     cond.getName(name);
-    _setConditions.insert(std::move(name));
+    _setConditions.insert(_setConditions.end(), std::move(name));
 }
 
 inline void RuleSystem::reset(StringSet& implications) {
