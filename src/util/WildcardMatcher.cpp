@@ -43,16 +43,41 @@ int countSegments(const char* pattern) {
 
 // Returns: the place behind `segment` at the beginning of `text`; null if it does not begin so.
 const char* skipPrefix(const char* text, const char* segment) {
-    if (segment == nullptr) {
-        return nullptr;
+    for (; *segment != '\0'; ++segment, ++text) {
+        if (*text != *segment) {
+            return nullptr;
+        }
     }
-    const std::size_t length = std::strlen(segment);
-    return std::strncmp(text, segment, length) == 0 ? text + length : nullptr;
+    return text;
 }
 
-// Returns: the first occurrence of `segment` at or after `cursor`; null if there is none.
-const char* findSegment(const char* cursor, const char* segment) {
-    return segment == nullptr ? nullptr : std::strstr(cursor, segment);
+// Returns: the place behind the first occurrence of `segment` at or after `cursor`, or null.
+const char* skipToSegment(const char* cursor, const char* segment) {
+    if (segment[1] == '\0') {
+        const char* const found = std::strchr(cursor, segment[0]);
+        return found == nullptr ? nullptr : found + 1;
+    }
+    const char* const found = std::strstr(cursor, segment);
+    return found == nullptr ? nullptr : found + std::strlen(segment);
+}
+
+// Seeks `segment` from `cursor` on in steps that do not overlap, until one ends at `end`; that one
+// stands at the end of the text is known. Only where the segment may overlap itself can the steps
+// miss it.
+bool stepsReachEnd(const char* cursor, const char* end, const char* segment, std::size_t length) {
+    const char* const place = end - length;
+    if (cursor >= place || std::memchr(segment + 1, segment[0], length - 1) == nullptr) {
+        return cursor <= place;
+    }
+    while (cursor < place) {
+        const bool here = std::memcmp(cursor, segment, length) == 0;
+        const char* const found = here ? cursor : std::strstr(cursor, segment);
+        if (found == place) {
+            return true;
+        }
+        cursor = found + length;
+    }
+    return cursor == place;
 }
 
 const char* printable(const char* segment) {
@@ -145,36 +170,44 @@ void WildcardMatcher::compile() {
 
 bool WildcardMatcher::isMatch(const char* haystack) const {
     QUELTA_ASSERT(haystack != NULL);
-    if (_isWord != 0) {
-        return _subStrings[0] != nullptr && std::strcmp(haystack, _subStrings[0]) == 0;
+    return isMatch(haystack, _hardEnd ? std::strlen(haystack) : 0);
+}
+
+// Of the object itself this reads only the front: flags and segments up to the null behind the
+// last. An empty first entry means no segments at all, or an object that was assigned to.
+bool WildcardMatcher::isMatch(const char* haystack, std::size_t length) const {
+    const char* const* segment = _subStrings;
+    if (*segment == nullptr) {
+        return _subStringCount == 0;
+    }
+    const char* const* const tableEnd = _subStrings + MAX_SUBSTRINGS;
+    const char* const* behind = segment + 1;
+    while (behind != tableEnd && *behind != nullptr) {
+        ++behind;
+    }
+    // What the text must end with is looked at first, as it refuses most texts at once.
+    std::size_t lastLength = 0;
+    if (_hardEnd) {
+        lastLength = std::strlen(*--behind);
+        if (length < lastLength ||
+            std::memcmp(haystack + length - lastLength, *behind, lastLength) != 0) {
+            return false;
+        }
     }
     const char* cursor = haystack;
-    int i = 0;
     if (_hardStart) {
-        cursor = skipPrefix(cursor, _subStrings[i++]);
-        if (cursor == nullptr) {
-            return false;
+        if (segment == behind) {
+            return length == lastLength;  // a single word
         }
+        cursor = skipPrefix(cursor, *segment++);
     }
-    for (const int limit = _subStringCount - (_hardEnd ? 1 : 0); i < limit; ++i) {
-        cursor = findSegment(cursor, _subStrings[i]);
-        if (cursor == nullptr) {
-            return false;
-        }
-        cursor += std::strlen(_subStrings[i]);
+    for (; cursor != nullptr && segment != behind; ++segment) {
+        cursor = skipToSegment(cursor, *segment);
     }
-    if (!_hardEnd) {
-        return true;
+    if (cursor == nullptr || !_hardEnd) {
+        return cursor != nullptr;
     }
-    const char* const end = _subStrings[_subStringCount - 1];
-    do {
-        cursor = findSegment(cursor, end);
-        if (cursor == nullptr) {
-            return false;
-        }
-        cursor += std::strlen(end);
-    } while (*cursor != '\0');
-    return true;
+    return stepsReachEnd(cursor, haystack + length, *behind, lastLength);
 }
 
 bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& substrs) {
@@ -187,13 +220,14 @@ bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& su
     int i = 0;
     bool matched = true;
     if (_hardStart) {
-        const char* const behind = skipPrefix(cursor, _subStrings[i++]);
+        const char* const start = _subStrings[i++];
+        const char* const behind = start == nullptr ? nullptr : skipPrefix(cursor, start);
         matched = behind != nullptr;
         cursor = matched ? behind : cursor;
     }
     // Puts the text in front of the next occurrence on record and moves behind it.
     const auto advance = [&](const char* segment) {
-        const char* const found = findSegment(cursor, segment);
+        const char* const found = segment == nullptr ? nullptr : std::strstr(cursor, segment);
         if (found == nullptr) {
             return false;
         }

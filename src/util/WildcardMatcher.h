@@ -17,6 +17,7 @@
 //
 // Immutable after construction; safe to share. The exception is assignment.
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -62,6 +63,17 @@ public:
     // ends the text, so "*aa" does not match "aaa".
     // Cost: no allocation.
     bool isMatch(const char* haystack) const;
+
+    // The same for a text whose length in bytes, up to its NUL, is known.
+    bool isMatch(const char* haystack, std::size_t length) const;
+
+    // Fetches what isMatch reads, for a caller who is going to ask many matchers in a row: first
+    // the object, and some matchers later the segments that it points at.
+    void prefetch() const {
+        __builtin_prefetch(this);
+        __builtin_prefetch(&_subStrings[4]);
+    }
+    void prefetchSegments() const { __builtin_prefetch(_subStrings[0]); }
 
     // The same test. `substrs` is replaced by the texts that the stars covered, in pattern order;
     // after a failure it holds what was covered up to there.

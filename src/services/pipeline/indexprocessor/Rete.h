@@ -14,6 +14,9 @@
 //
 // Not thread-safe; one thread at a time per object.
 
+#include <algorithm>
+#include <cstddef>
+#include <cstring>
 #include <map>
 #include <memory>
 #include <optional>
@@ -192,9 +195,14 @@ inline bool RuleSystem::changeCondition(bool newState, const std::string& term,
         met = true;
     }
     _wildcardTrie.findData(text, wildcardMatches);
-    for (const auto* const candidate : wildcardMatches) {
-        if (candidate->first.isMatch(text.c_str())) {
-            changeOneCondition(newState, *candidate->second, implications);
+    const std::size_t length = std::strlen(text.c_str());
+    const std::size_t last = wildcardMatches.size() - 1;
+    for (std::size_t i = 0; i < wildcardMatches.size(); ++i) {
+        wildcardMatches[std::min(i + 16, last)]->first.prefetch();
+        wildcardMatches[std::min(i + 8, last)]->first.prefetchSegments();
+        auto& [matcher, condition] = *wildcardMatches[i];
+        if (matcher.isMatch(text.c_str(), length)) {
+            changeOneCondition(newState, *condition, implications);
             met = true;
         }
     }
