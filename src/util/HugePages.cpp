@@ -12,7 +12,7 @@ void adviseHugePages(void* memory, std::size_t size) noexcept {
     const std::uintptr_t end = (from + size) & ~(PAGE_SIZE - 1);
     if (begin < end) {
         const int error = errno;
-        ::madvise(reinterpret_cast<void*>(begin), end - begin, MADV_HUGEPAGE);
+        ::madvise(static_cast<char*>(memory) + (begin - from), end - begin, MADV_HUGEPAGE);
         errno = error;
     }
 }

@@ -169,7 +169,7 @@ void WildcardMatcher::compile() {
 }
 
 bool WildcardMatcher::isMatch(const char* haystack) const {
-    QUELTA_ASSERT(haystack != NULL);
+    QUELTA_ASSERT(haystack != nullptr);
     return isMatch(haystack, _hardEnd ? std::strlen(haystack) : 0);
 }
 
@@ -211,7 +211,7 @@ bool WildcardMatcher::isMatch(const char* haystack, std::size_t length) const {
 }
 
 bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& substrs) {
-    QUELTA_ASSERT(haystack != NULL);
+    QUELTA_ASSERT(haystack != nullptr);
     substrs.clear();
     if (_isWord != 0) {
         return _subStrings[0] != nullptr && std::strcmp(haystack, _subStrings[0]) == 0;

@@ -274,8 +274,8 @@ TEST(WildcardMatcherDeathTest, AssertsThatThereIsAText) {
     WildcardMatcher matcher("a");
     std::vector<std::string> parts;
     EXPECT_DEATH(static_cast<const WildcardMatcher&>(matcher).isMatch(nullptr),
-                 "src/util/WildcardMatcher.cpp:[0-9]+: failed assertion `haystack != NULL'");
-    EXPECT_DEATH(matcher.isMatch(nullptr, parts), "failed assertion `haystack != NULL'");
+                 "src/util/WildcardMatcher.cpp:[0-9]+: failed assertion `haystack != nullptr'");
+    EXPECT_DEATH(matcher.isMatch(nullptr, parts), "failed assertion `haystack != nullptr'");
 }
 
 TEST(WildcardMatcherTest, HoldsUpTo256Segments) {

@@ -174,7 +174,7 @@ inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& o
         auto fresh = std::make_unique<Conditional>(keyword);
         fresh->addOperator(op);
         place = _conditions.emplace_hint(place, keyword, fresh.get());
-        fresh.release();
+        static_cast<void>(fresh.release());
     } else {
         place->second->addOperator(op);
     }
@@ -187,7 +187,8 @@ inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& o
 
 inline bool RuleSystem::changeCondition(bool newState, const std::string& term,
                                         Candidates& wildcardMatches, StringSet& implications) {
-    const std::string text = term;  // the term may be an implication that is about to be erased
+    // The term may be an implication that is about to be erased.
+    const std::string text = term;  // NOLINT(performance-unnecessary-copy-initialization)
     bool met = false;
     const auto literal = _conditions.find(text);
     if (literal != _conditions.end()) {
