@@ -27,6 +27,8 @@ bool refused(const std::string& pattern) {
 void checkMatch(WildcardMatcher& matcher, const oracle::Match& expected, const std::string& text) {
     std::vector<std::string> parts = {"left over"};
     checkEqual("isMatch", expected.matched, std::as_const(matcher).isMatch(text.c_str()));
+    checkEqual("isMatch with a length", expected.matched,
+               matcher.isMatch(text.c_str(), text.size()));
     checkEqual("isMatch with capture", expected.matched, matcher.isMatch(text.c_str(), parts));
     checkEqual("captured parts", expected.parts, parts);
 }
