@@ -7,6 +7,9 @@
 find_package(GTest REQUIRED)
 include(GoogleTest)
 
+# The programs that the thread sanitizer is there for: those labelled thread.
+add_custom_target(thread_tests)
+
 function(quelta_test name)
   cmake_parse_arguments(arg "" "TIMEOUT" "SOURCES;LIBS;LABELS;DEFINES;WRAP" ${ARGN})
   add_executable(${name} ${arg_SOURCES})
@@ -30,6 +33,9 @@ function(quelta_test name)
   endif()
   if(NOT arg_TIMEOUT)
     set(arg_TIMEOUT 120)
+  endif()
+  if("thread" IN_LIST arg_LABELS)
+    add_dependencies(thread_tests ${name})
   endif()
   gtest_discover_tests(${name}
     DISCOVERY_TIMEOUT 60
