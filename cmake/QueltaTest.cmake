@@ -10,24 +10,48 @@ include(GoogleTest)
 # The programs that the thread sanitizer is there for: those labelled thread.
 add_custom_target(thread_tests)
 
+# The flags of a test's own sources. Only the oracles, which compute, are worth optimizing; the
+# library under test keeps the flags of its preset.
+function(quelta_test_flags name optimized)
+  target_compile_options(${name} PRIVATE -fno-access-control)
+  if(NOT optimized)
+    target_compile_options(${name} PRIVATE -O0 -g1)
+  endif()
+  target_link_libraries(${name} PRIVATE GTest::gmock GTest::gtest_main)
+  quelta_warnings(${name})
+  quelta_sanitize(${name})
+endfunction()
+
+# Half of the time of building the tests would go to reading GoogleTest's headers, so they are
+# compiled once for each set of flags. The owners are programs because only those are compiled as
+# position-independent executables, like the tests.
+foreach(variant quick optimized)
+  file(CONFIGURE OUTPUT test_headers_${variant}.cpp CONTENT "")
+  add_executable(test_headers_${variant} ${CMAKE_CURRENT_BINARY_DIR}/test_headers_${variant}.cpp)
+  target_precompile_headers(test_headers_${variant} PRIVATE
+    <gmock/gmock.h> <gtest/gtest.h> <filesystem> <fstream> <map> <memory> <set> <sstream> <string>
+    <vector>)
+endforeach()
+quelta_test_flags(test_headers_quick FALSE)
+quelta_test_flags(test_headers_optimized TRUE)
+
 function(quelta_test name)
   cmake_parse_arguments(arg "" "TIMEOUT" "SOURCES;LIBS;LABELS;DEFINES;WRAP" ${ARGN})
   add_executable(${name} ${arg_SOURCES})
   target_include_directories(${name} PRIVATE
     ${PROJECT_SOURCE_DIR}/src ${PROJECT_SOURCE_DIR}/tests)
-  target_link_libraries(${name} PRIVATE ${arg_LIBS} quelta_util GTest::gmock GTest::gtest_main)
-  target_compile_options(${name} PRIVATE -fno-access-control)
-  # The bulk of a build is the compilation of tests. Only the oracles, which compute, are worth
-  # optimizing; the library under test keeps the flags of its preset.
-  if(NOT "oracle" IN_LIST arg_LABELS)
-    target_compile_options(${name} PRIVATE -O0 -g1)
+  target_link_libraries(${name} PRIVATE ${arg_LIBS} quelta_util)
+  if("oracle" IN_LIST arg_LABELS)
+    quelta_test_flags(${name} TRUE)
+    target_precompile_headers(${name} REUSE_FROM test_headers_optimized)
+  else()
+    quelta_test_flags(${name} FALSE)
+    target_precompile_headers(${name} REUSE_FROM test_headers_quick)
   endif()
   target_compile_definitions(${name} PRIVATE ${arg_DEFINES})
   foreach(function ${arg_WRAP})
     target_link_options(${name} PRIVATE -Wl,--wrap=${function})
   endforeach()
-  quelta_warnings(${name})
-  quelta_sanitize(${name})
   if(NOT arg_LABELS)
     set(arg_LABELS unit)
   endif()
