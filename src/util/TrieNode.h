@@ -9,6 +9,8 @@
 //
 // Not thread-safe; one thread at a time per object.
 
+#include <cstddef>
+#include <exception>
 #include <string>
 #include <utility>
 #include <vector>
@@ -81,7 +83,9 @@ public:
     }
 
 private:
-    static constexpr std::size_t LARGE = 32;
+    static constexpr std::size_t LARGE = 128;  // values in a list
+    static constexpr std::size_t GROWTH = 32;
+
     static int index(char c) { return static_cast<unsigned char>(c); }
 
     int firstUsedSlot() const {
@@ -113,9 +117,16 @@ private:
         _dataList.push_back(std::forward<Data>(data));
     }
 
+    // Values may be large, and moving them would touch their memory once more at each doubling.
+    // Room that is never used is address space alone, so a large list takes much of it at once,
+    // unless the system refuses.
     void makeRoom() {
-        const std::size_t capacity = 8 * _dataList.capacity();
-        _dataList.reserve(capacity);
+        const std::size_t capacity = GROWTH * _dataList.capacity();
+        try {
+            _dataList.reserve(capacity);
+        } catch (const std::exception&) {
+            return;
+        }
         adviseHugePages(static_cast<void*>(_dataList.data()), capacity * sizeof(T));
     }
 

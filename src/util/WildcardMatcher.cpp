@@ -1,6 +1,5 @@
 #include "util/WildcardMatcher.h"
 
-#include <algorithm>
 #include <cstdio>
 #include <cstring>
 #include <list>
@@ -105,13 +104,14 @@ WildcardMatcher::WildcardMatcher(WildcardMatcher&& other) noexcept
       _hardStart(other._hardStart),
       _subStringCount(other._subStringCount),
       _isWord(other._isWord) {
-    std::fill(std::copy_n(other._subStrings, _subStringCount, _subStrings),
-              _subStrings + MAX_SUBSTRINGS, nullptr);
+    const std::size_t used = static_cast<std::size_t>(_subStringCount) * sizeof(char*);
+    std::memcpy(_subStrings, other._subStrings, used);
+    std::memset(_subStrings + _subStringCount, 0, sizeof(_subStrings) - used);
     other._needle = nullptr;
     other._buffer = nullptr;
     other._hardEnd = false;
     other._hardStart = false;
-    std::fill_n(other._subStrings, _subStringCount, nullptr);
+    std::memset(other._subStrings, 0, used);
     other._subStringCount = 0;
     other._isWord = 0;
 }
@@ -141,7 +141,7 @@ void WildcardMatcher::init(const char* pattern) {
     }
     _needle = needle.release();
     _buffer = buffer.release();
-    std::fill_n(_subStrings, MAX_SUBSTRINGS, nullptr);
+    std::memset(_subStrings, 0, sizeof(_subStrings));
     if (pattern != nullptr && *pattern != '\0') {
         compile();
     }

@@ -180,6 +180,23 @@ TEST(TrieNodeTest, ACopyThatFailsLeavesNothingBehind) {
     EXPECT_EQ(0, live);
 }
 
+// The list takes room in leaps once it is large; nothing of that shows.
+TEST(TrieNodeTest, LongListsKeepTheirOrder) {
+    TrieNode<std::pair<std::string, int>> trie;
+    constexpr int COUNT = 10000;
+    for (int i = 0; i < COUNT; ++i) {
+        trie.addData("key", {std::string(20, 'x') + std::to_string(i), i});
+    }
+    std::vector<std::pair<std::string, int>*> results;
+    trie.findData("keys", results);
+    ASSERT_EQ(static_cast<std::size_t>(COUNT), results.size());
+    for (int i = 0; i < COUNT; ++i) {
+        const auto& [text, number] = *results[static_cast<std::size_t>(i)];
+        ASSERT_EQ(i, number);
+        ASSERT_EQ(std::string(20, 'x') + std::to_string(i), text);
+    }
+}
+
 TEST(TrieNodeTest, KeysOfAHundredThousandBytesNeedNoStack) {
     onSmallStack([] {
         const std::string key(100000, 'k');

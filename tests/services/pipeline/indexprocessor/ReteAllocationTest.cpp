@@ -18,7 +18,13 @@ namespace {
 // Allocations that succeed before one fails; negative: all succeed.
 long allocationsLeft = -1;
 
-bool takeAllocation() {
+// Larger ones fail.
+std::size_t largestAllocation = std::size_t(-1);
+
+bool takeAllocation(std::size_t size) {
+    if (size > largestAllocation) {
+        return false;
+    }
     if (allocationsLeft < 0) {
         return true;
     }
@@ -26,7 +32,7 @@ bool takeAllocation() {
 }
 
 void* allocateOrNull(std::size_t size) noexcept {
-    return takeAllocation() ? std::malloc(size == 0 ? 1 : size) : nullptr;
+    return takeAllocation(size) ? std::malloc(size == 0 ? 1 : size) : nullptr;
 }
 
 void* allocate(std::size_t size) {
@@ -283,6 +289,27 @@ TEST(ReteAllocationTest, CopyingATrieNeverLeaks) {
     std::vector<std::string*> results;
     copy->findData("abcdef", results);
     EXPECT_EQ(4u, results.size());
+}
+
+// A list that cannot have room for many values more takes less.
+TEST(ReteAllocationTest, ALongListGrowsInSmallStepsIfNeedBe) {
+    struct Large {
+        int number;
+        char rest[2000];
+    };
+    TrieNode<Large> trie;
+    constexpr int COUNT = 1000;
+    largestAllocation = std::size_t{4} << 20;
+    for (int i = 0; i < COUNT; ++i) {
+        trie.addData("a", Large{i, {}});
+    }
+    largestAllocation = std::size_t(-1);
+    std::vector<Large*> results;
+    trie.findData("a", results);
+    ASSERT_EQ(static_cast<std::size_t>(COUNT), results.size());
+    for (int i = 0; i < COUNT; ++i) {
+        ASSERT_EQ(i, results[static_cast<std::size_t>(i)]->number);
+    }
 }
 
 TEST(ReteAllocationTest, MatchingAllocatesNothing) {
