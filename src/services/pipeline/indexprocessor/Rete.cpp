@@ -284,11 +284,14 @@ StringSet generatePatterns(int count) {
     return patterns.sorted();
 }
 
-// Gives each pattern an operator of its own that implies the pattern as a line.
-void addPatterns(RuleSystem& rs, const StringSet& wildcards) {
-    for (const std::string& wild : wildcards) {
-        std::string imp = wild + '\n';
-        rs.addCondition(wild, *new AndOperator(nullptr, imp));
+// Gives each pattern an operator of its own that implies the pattern as a line. The patterns leave
+// the set one by one, so that the network grows into the memory that they give back.
+void addPatterns(RuleSystem& rs, StringSet& wildcards) {
+    std::string imp;
+    while (!wildcards.empty()) {
+        const StringSet::node_type wild = wildcards.extract(wildcards.begin());
+        imp.assign(wild.value()).push_back('\n');
+        rs.addCondition(wild.value(), *new AndOperator(nullptr, imp));
     }
 }
 
@@ -299,9 +302,10 @@ void addPatterns(RuleSystem& rs, const StringSet& wildcards) {
 // matching took.
 void testWildCards(RuleSystem* rs, int testcount) {
     StringSet implications;
-    const StringSet wildcards = generatePatterns(testcount);
+    StringSet wildcards = generatePatterns(testcount);
+    const std::size_t conditions = wildcards.size();
     addPatterns(*rs, wildcards);
-    std::printf("%lu conditions\n", static_cast<unsigned long>(wildcards.size()));
+    std::printf("%lu conditions\n", static_cast<unsigned long>(conditions));
 
     RuleSystem::Candidates candidates;
     const std::time_t start = std::time(nullptr);
