@@ -1,15 +1,18 @@
 #!/usr/bin/env python3
 """Breaks one operator, constant or comparison of a source at a time and sees whether a test fails.
 
-Usage: mutate.py BUILD_DIR [--sample N] [--seed S] [SOURCE...]
+Usage: mutate.py BUILD_DIR [--jobs N] [--sample N] [--seed S] [SOURCE...]
 
-Works in a copy of the tree below BUILD_DIR, never in the tree itself. targets.txt names the test
-programs of each source, equivalents.txt the mutants that no test can tell from the original, with
+Works in copies of the tree below BUILD_DIR, one for each job, never in the tree itself. targets.txt
+names the test programs of each source, equivalents.txt the mutants that no test can tell from the original, with
 the reason. Prints each survivor as path:line: before -> after. Exits with 1 when a mutant survives
 that equivalents.txt does not explain, or when an explained one no longer survives.
 """
 import argparse
+import concurrent.futures
+import os
 import pathlib
+import queue
 import random
 import re
 import subprocess
@@ -66,13 +69,13 @@ class Tree:
                        check=True, stdout=subprocess.DEVNULL)
 
     def make(self, targets):
-        return subprocess.run(['ninja', '-C', self.build, *targets], stdout=subprocess.DEVNULL,
+        return subprocess.run(['ninja', '-j2', '-C', self.build, *targets], stdout=subprocess.DEVNULL,
                               stderr=subprocess.DEVNULL).returncode == 0
 
     def passes(self, target):
         program = next(p for p in self.build.rglob(target) if p.is_file())
         try:
-            run = subprocess.run([program, '--gtest_brief=1', '--gtest_break_on_failure=0'],
+            run = subprocess.run([program, '--gtest_brief=1', '--gtest_fail_fast'],
                                  cwd=program.parent, stdin=subprocess.DEVNULL,
                                  stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL,
                                  timeout=RUN_SECONDS)
@@ -94,38 +97,60 @@ class Tree:
             path.write_text(original)
 
 
+def test_source(pool, trees, source, targets, options):
+    """Yields each mutant of a source with what Tree.survives says of it."""
+    def with_tree(use):
+        tree = trees.get()
+        try:
+            return use(tree)
+        finally:
+            trees.put(tree)
+
+    def unbroken(tree):
+        return tree.make(targets) and all(tree.passes(target) for target in targets)
+
+    if not with_tree(unbroken):
+        sys.exit(f'{source}: its tests do not pass unbroken')
+    chosen = list(mutants(ROOT / source))
+    if options.sample and len(chosen) > options.sample:
+        chosen = sorted(random.Random(options.seed).sample(chosen, options.sample))
+    print(f'{source}: {len(chosen)} mutants', file=sys.stderr, flush=True)
+    futures = [pool.submit(with_tree, lambda tree, m=mutant: tree.survives(source, m[0], m[2], targets))
+               for mutant in chosen]
+    for mutant, future in zip(chosen, futures):
+        yield mutant, future.result()
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__.split('\n')[0])
     parser.add_argument('build_dir', type=pathlib.Path)
     parser.add_argument('sources', nargs='*')
+    parser.add_argument('--jobs', type=int, default=os.cpu_count(), help='copies at work at once')
     parser.add_argument('--sample', type=int, default=0, help='mutants per source, 0 for all')
     parser.add_argument('--seed', type=int, default=1)
-    options = parser.parse_args()
+    options = parser.parse_intermixed_args()
 
     explained = {(row[0], row[1], row[2]) for row in read_table('equivalents.txt')}
-    tree = Tree(options.build_dir.resolve())
+    trees = queue.SimpleQueue()
+    for job in range(options.jobs):
+        trees.put(Tree(options.build_dir.resolve() / str(job)))
     killed = invalid = 0
     survivors = set()
-    for source, targets in read_table('targets.txt'):
-        if options.sources and source not in options.sources:
-            continue
-        targets = targets.split()
-        if not tree.make(targets) or not all(tree.passes(t) for t in targets):
-            sys.exit(f'{source}: its tests do not pass unbroken')
-        chosen = list(mutants(ROOT / source))
-        if options.sample and len(chosen) > options.sample:
-            chosen = sorted(random.Random(options.seed).sample(chosen, options.sample))
-        for number, line, mutated in chosen:
-            result = tree.survives(source, number, mutated, targets)
-            if result is None:
-                invalid += 1
-            elif not result:
-                killed += 1
-            else:
-                survivors.add((source, line.strip(), mutated.strip()))
-                known = (source, line.strip(), mutated.strip()) in explained
-                print(f'{source}:{number + 1}: {line.strip()}  ->  {mutated.strip()}'
-                      f'{"  (equivalent)" if known else ""}', flush=True)
+    with concurrent.futures.ThreadPoolExecutor(options.jobs) as pool:
+        for source, targets in read_table('targets.txt'):
+            if options.sources and source not in options.sources:
+                continue
+            for mutant, result in test_source(pool, trees, source, targets.split(), options):
+                if result is None:
+                    invalid += 1
+                elif not result:
+                    killed += 1
+                else:
+                    number, line, mutated = mutant
+                    row = (source, line.strip(), mutated.strip())
+                    survivors.add(row)
+                    print(f'{source}:{number + 1}: {row[1]}  ->  {row[2]}'
+                          f'{"  (equivalent)" if row in explained else ""}', flush=True)
     unexplained = survivors - explained
     stale = set() if options.sample or options.sources else explained - survivors
     for row in sorted(stale):
