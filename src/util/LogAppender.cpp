@@ -45,6 +45,17 @@ private:
     const bool _locked;
 };
 
+// Makes a call again for as long as a signal interrupts it.
+// Returns: whether it succeeded in the end.
+template <typename Call>
+bool uninterrupted(Call call) {
+    bool done = call();
+    while (!done && errno == EINTR) {
+        done = call();
+    }
+    return done;
+}
+
 const std::uint64_t IDENTITY_CHECK_SECONDS = 5;
 const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 
@@ -278,7 +289,7 @@ void LogAppender::checkIdentity(time_t now) {
         return;
     }
     struct stat status;
-    if (_filename.stat(&status) && status.st_ino == _inodeNum) {
+    if (uninterrupted([&] { return _filename.stat(&status); }) && status.st_ino == _inodeNum) {
         _lastCheck = now;
     } else {
         closeFd();
@@ -286,8 +297,11 @@ void LogAppender::checkIdentity(time_t now) {
 }
 
 bool LogAppender::openFile(Failure* later) {
-    _fd = _filename.openCreateOrAppend(Pathname::CREATE_NORMAL);
-    if (!_fd.valid()) {
+    const bool opened = uninterrupted([this] {
+        _fd = _filename.openCreateOrAppend(Pathname::CREATE_NORMAL);
+        return _fd.valid();
+    });
+    if (!opened) {
         failed(Problem::OPEN, later);
         return false;
     }
@@ -299,7 +313,7 @@ bool LogAppender::openAndInitFile(time_t now, Failure* later) {
         return false;
     }
     struct stat status;
-    if (!_fd.stat(&status)) {
+    if (!uninterrupted([&] { return _fd.stat(&status); })) {
         failed(Problem::FSTAT, later);
         closeFd();
         return false;
@@ -321,7 +335,8 @@ void LogAppender::rotateFile(time_t now, Failure* later) {
 }
 
 // Makes the base file's name free: moves each file up to the first free number one further, or
-// deletes the last one when there is no free number. What cannot be moved stays.
+// deletes the last one when there is no free number.
+// Deliberate: a file that cannot be moved is not waited for; the next one may take its name.
 void LogAppender::shiftBackups() {
     Pathname from;
     Pathname to;
@@ -330,16 +345,16 @@ void LogAppender::shiftBackups() {
         filenameWithSuffix(to, suffix);
         if (suffix >= _maxBackupIndex) {
             QUELTA_ASSERT(suffix == _maxBackupIndex);
-            to.unlink();
+            uninterrupted([&] { return to.unlink(); });
             break;
         }
-        if (!to.exists()) {
+        if (!uninterrupted([&] { return to.exists(); })) {
             break;
         }
     }
     for (; suffix > 0; --suffix) {
         filenameWithSuffix(from, suffix - 1);
-        from.renameTo(to);
+        uninterrupted([&] { return from.renameTo(to); });
         to.swap(from);
     }
 }

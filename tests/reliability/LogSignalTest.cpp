@@ -1,5 +1,6 @@
 // Signals that interrupt system calls all the time.
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/time.h>
@@ -101,5 +102,35 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     reader.join();
     EXPECT_GT(signals, 10U);
     EXPECT_TRUE(expected == got) << expected.size() << " bytes expected, " << got.size() << " came";
+    EXPECT_EQ("", err.text());
+}
+
+// Nobody reads yet, so the open itself waits, in the middle of the storm.
+TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
+    const TempDir dir;
+    const StderrCapture err;
+    ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
+    std::string got;
+    std::thread reader([&] {
+        sigset_t all;
+        sigfillset(&all);
+        ::pthread_sigmask(SIG_BLOCK, &all, nullptr);
+        while (signals < 100) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        }
+        got = readFile(dir.file("pipe"));
+    });
+    {
+        LogAppender log;
+        ASSERT_TRUE(log.setAttribute("fileName", dir.file("pipe").c_str(), Pathname()));
+        log._fmt = &defaultFormat();
+        const SignalStorm storm;
+        log.write(stampedAt(1000), "first");
+        log.write(stampedAt(1010), "second");
+    }
+    // Lets a reader go to whom nobody came.
+    ::close(::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK));
+    reader.join();
+    EXPECT_EQ("first\nsecond\n", got);
     EXPECT_EQ("", err.text());
 }
