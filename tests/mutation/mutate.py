@@ -25,6 +25,7 @@ ROOT = HERE.parent.parent
 # A test program has so long to find a mutant, beyond ten times what it takes unbroken: one that
 # runs on for ever is found too.
 GRACE_SECONDS = 3
+UNBROKEN_SECONDS = 600
 
 # What is replaced by what, where the pattern stands outside of comments, texts and directives.
 MUTATIONS = [
@@ -67,8 +68,10 @@ class Tree:
         self.build = folder / 'build'
         self.limits = {}  # seconds that a test program may take, once it is known
         self.root.mkdir(parents=True, exist_ok=True)
-        subprocess.run(['rsync', '-a', '--delete', '--exclude=/build', '--exclude=/.git',
-                        f'{ROOT}/', f'{self.root}/'], check=True)
+        # A mutant that an interrupted run left here is newer than the file that replaces it: with
+        # the time of the original, the build would keep what was made of the mutant.
+        subprocess.run(['rsync', '-a', '--checksum', '--no-times', '--delete', '--exclude=/build',
+                        '--exclude=/.git', f'{ROOT}/', f'{self.root}/'], check=True)
         subprocess.run(['cmake', '-G', 'Ninja', '-S', self.root, '-B', self.build,
                         '-DCMAKE_BUILD_TYPE=Debug', '-DCMAKE_CXX_FLAGS_DEBUG=-O0'],
                        check=True, stdout=subprocess.DEVNULL)
@@ -83,7 +86,7 @@ class Tree:
             run = subprocess.run([program, '--gtest_brief=1', '--gtest_fail_fast'],
                                  cwd=program.parent, stdin=subprocess.DEVNULL,
                                  stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL,
-                                 timeout=self.limits.get(target))
+                                 timeout=self.limits.get(target, UNBROKEN_SECONDS))
         except subprocess.TimeoutExpired:
             return False
         return run.returncode == 0

@@ -46,6 +46,7 @@ TEST(HugePagesTest, AdvisesTheWholeLargePagesWithinTheBlock) {
         {4 * MIB, 2 * MIB - 1, 0, 0},
         {4 * MIB + 16, 2 * MIB, 0, 0},
         {4 * MIB + 16, 4 * MIB, 6 * MIB, 8 * MIB},
+        {4 * MIB + 1, 4 * MIB, 6 * MIB, 8 * MIB},
         {4 * MIB - 1, 2 * MIB + 1, 4 * MIB, 6 * MIB},
         {3 * MIB, 100 * MIB, 4 * MIB, 102 * MIB},
         {4 * MIB, 0, 0, 0},

@@ -59,6 +59,7 @@ TEST(TimevalTest, CopiesBothFields) {
 TEST(TimevalTest, TellsWholeSecondsAndMilliseconds) {
     EXPECT_EQ(12, at(12, 345678).sec());
     EXPECT_EQ(12345, at(12, 345678).msec());
+    EXPECT_EQ(12999, at(12, 999000).msec());
     EXPECT_EQ(-1, at(-1, 999999).sec());
     EXPECT_EQ(-1, at(-1, 999999).msec());
 }
@@ -301,6 +302,7 @@ TEST(TimevalTest, DescribesADifferenceInItsUnit) {
         {at(1, 0), at(0, 0), "1000 milliseconds"},
         {at(1, 500000), at(0, 0), "1000 milliseconds"},
         {at(2, 999000), at(0, 0), "2000 milliseconds"},
+        {at(2, 2000), at(1, 1000), "1000 milliseconds"},
         {at(3, 0), at(0, 0), "3000 milliseconds"},
         {at(3, 1), at(0, 1), "3000.0 milliseconds"},
         {at(1, 1), at(0, 0), "1000.0 milliseconds"},

@@ -154,12 +154,14 @@ TEST(TrieNodeTest, CopiesTheSubtree) {
     original->addData("ab", "ab");
     original->addData("ac", "ac");
     original->addData("\xff", "high");
+    original->addData(std::string(1, '\0'), "nul");
     Trie copy(*original);
     original->addData("ab", "later");
     original.reset();
     EXPECT_THAT(find(copy, "ab"), ElementsAre("root", "ab"));
     EXPECT_THAT(find(copy, "ac"), ElementsAre("root", "ac"));
     EXPECT_THAT(find(copy, "\xff"), ElementsAre("root", "high"));
+    EXPECT_THAT(find(copy, std::string(1, '\0')), ElementsAre("root", "nul"));
     EXPECT_EQ(nullptr, copy._children[int{'b'}]);
 }
 
