@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <vector>
@@ -46,11 +47,22 @@ const char* const messages[] = {
 constexpr int messageCount = sizeof(messages) / sizeof(messages[0]);
 
 // popt's contexts, and the strings that it hands out and leaves to its caller, live as long as the
-// process. The list itself is never destroyed, so that a leak checker finds them at exit.
-void keepReachable(const void* memory) {
+// process. The list of them is never destroyed, so that a leak checker finds them at exit.
+std::vector<const void*>& keptMemory() {
     static auto& kept = *new std::vector<const void*>;
+    return kept;
+}
+
+// Makes room to keep so much more. Called before popt allocates: a list that cannot grow afterwards
+// would lose what it was to keep.
+void makeRoomToKeep(std::size_t count) {
+    keptMemory().reserve(keptMemory().size() + count);
+}
+
+// Requires: there is room.
+void keepReachable(const void* memory) {
     if (memory != nullptr) {
-        kept.push_back(memory);
+        keptMemory().push_back(memory);
     }
 }
 
@@ -71,7 +83,6 @@ void set_path_from_envvar(Pathname& path, const char* name) {
 template <typename Field>
 void replaceIfGiven(Field& field, const char* given) {
     if (given != nullptr) {
-        keepReachable(given);
         field = given;
     }
 }
@@ -177,6 +188,7 @@ void LoaderInfo::init(int argc, const char* const* argv) {
     // popt starts behind the program's name, and would read past a list that lacks even that.
     static const char* nameOnly[] = {"", nullptr};
     const bool named = argc > 0;
+    makeRoomToKeep(1);
     _poptContext =
         ::poptGetContext("queltad", named ? argc : 1,
                          named ? const_cast<const char**>(argv) : nameOnly, _poptOptionsTable, 0);
@@ -215,6 +227,7 @@ void LoaderInfo::populateFromEnvironment() {
 void LoaderInfo::populateFromCommandLine() {
     QUELTA_ASSERT(_poptContext != nullptr);
 
+    makeRoomToKeep(_poptOptionsCount);
     int result = 0;
     while ((result = ::poptGetNextOpt(_poptContext)) != -1) {
         if (result == POPT_ERROR_BADOPT) {
@@ -222,6 +235,12 @@ void LoaderInfo::populateFromCommandLine() {
             std::fprintf(stderr, "Bad Option %s\n",
                          ::poptBadOption(_poptContext, POPT_BADOPTION_NOALIAS));
         }
+    }
+
+    // All of them before any is copied, which may fail.
+    for (const char* const given : {_poptCommonConfigPath, _poptHost, _poptInstallName,
+                                    _poptComponentName, _poptStartupMode}) {
+        keepReachable(given);
     }
 
     _isDebug = _poptIsDebug != 0;

@@ -10,6 +10,7 @@
 #include <string>
 
 #include "support/FileAppender.h"
+#include "support/InChild.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 
@@ -155,6 +156,34 @@ TEST_F(LogAppenderIdentity, AFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
     fs::create_directory(dir.file("logs"));
     log.line("written", 1011);
     EXPECT_EQ("written\n", readFile(dir.file("logs/app.log")));
+}
+
+// In a child without root's rights, to which permissions mean nothing.
+TEST_F(LogAppenderIdentity, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen) {
+    const std::string folder = _dir.file("logs");
+    const std::string file = folder + "/app.log";
+    const std::string report = "Error opening \"" + file + "\": Permission denied\n";
+    fs::permissions(_dir.path(), fs::perms::all);
+    const ChildRun run = inChild([&] {
+        if (::geteuid() == 0) {
+            ASSERT_EQ(0, ::setuid(65534));
+        }
+        fs::create_directory(folder);
+        FileAppender log(file);
+        log.line("first", 1000);
+        fs::permissions(file, fs::perms::none);
+        log.line("still open", 1010);
+        fs::permissions(folder, fs::perms::none);
+        log.line("not to be found", 1020);
+        fs::permissions(folder, fs::perms::all);
+        log.line("not to be opened", 1020);
+        fs::permissions(file, fs::perms::owner_write);
+        log.line("written", 1020);
+        fs::permissions(file, fs::perms::owner_all);
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ(report + report, run.err);
+    EXPECT_EQ("first\nstill open\nwritten\n", readFile(file));
 }
 
 TEST_F(LogAppenderIdentity, TheFarthestStampsAreNoTrouble) {
