@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: scripts_test.sh
-# Runs script/run and script/bootstrap in a scratch copy, with the package tools, cmake and the
-# program replaced by ones that note how they were called.
+# Runs the scripts in a scratch copy, with the package tools, cmake and the program replaced by ones
+# that note how they were called.
 set -eu
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(cd "$(mktemp -d)" && pwd -P)
@@ -10,6 +10,8 @@ clone=$scratch/clone
 tools=$scratch/tools
 mkdir -p "$clone" "$tools"
 cp -r "$source/script" "$source/sample" "$clone"
+mkdir -p "$clone/bench" "$clone/fuzz/corpus/Strings"
+touch "$clone/bench/LoggerBench.cpp"
 
 tool() {
     mkdir -p "$(dirname "$1")"
@@ -101,3 +103,32 @@ apt-get install -y -qq --no-install-recommends libpopt-dev"
 absent=
 run "$clone/script/bootstrap" run test
 expect "nothing missing" "$status $out$err" "0 "
+
+for script in bench bootstrap check coverage docs fuzz lint run sanitize test; do
+    run "$clone/script/$script" --help
+    expect "$script --help: status and error" "$status $err" "0 "
+    case $out in
+    "Usage: script/$script"*) ;;
+    *) expect "$script --help" "$out" "Usage: script/$script ..." ;;
+    esac
+done
+
+# refused "SCRIPT ARGUMENTS" REASON: nothing is installed or built.
+absent=clang
+refused() {
+    # shellcheck disable=SC2086  # a list of words on purpose
+    run "$clone/script/"$1
+    expect "$1: status and output" "$status $out" "2 "
+    expect "$1: reason" "$(printf '%s\n' "$err" | head -n 2)" "script/${1%% *}: $2
+$(sed -n '2s/^# //p' "$clone/script/${1%% *}")"
+}
+refused bootstrap "no group is named"
+refused "bootstrap run nonsense" "unknown group 'nonsense'"
+refused "bench --fast" "unknown program '--fast', not one of LoggerBench"
+refused "check nonsense" "unknown check 'nonsense'"
+refused "docs nonsense" "it takes no arguments"
+refused "fuzz ten" "'ten' is no number of seconds"
+refused "fuzz 10 nonsense" "unknown topic 'nonsense', not one of Strings"
+refused "lint format nonsense" "unknown check 'nonsense'"
+refused "sanitize asan" "a sanitizer and a compiler are needed"
+refused "sanitize ubsan g++" "unknown sanitizer 'ubsan'"
