@@ -7,7 +7,9 @@ set(quelta_pc_dir "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 install(TARGETS Rete RUNTIME)
 install(TARGETS quelta_util quelta_loader quelta_rete quelta_xmlwrapp EXPORT queltaTargets ARCHIVE)
 install(DIRECTORY src/util src/services DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta"
-  FILES_MATCHING PATTERN "*.h" PATTERN "LogInternal.h" EXCLUDE)
+  FILES_MATCHING PATTERN "*.h"
+  # What the logging sources share among themselves.
+  PATTERN "LogAtoms.h" EXCLUDE PATTERN "LogConfig.h" EXCLUDE PATTERN "LogInternal.h" EXCLUDE)
 if(QUELTA_XMLWRAPP_CHOICE STREQUAL "bundled")
   install(DIRECTORY src/xmlwrapp-bundled/xmlwrapp
     DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta" FILES_MATCHING PATTERN "*.h")
@@ -48,7 +50,10 @@ endforeach()
 install(DIRECTORY sample/ DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample")
 install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/etc/myinstall")
 install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/var/log")
-install(FILES README.md CHANGELOG.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+# The README, and what it links to.
+install(FILES README.md CHANGELOG.md CONTRIBUTING.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(DIRECTORY docs examples DESTINATION "${CMAKE_INSTALL_DOCDIR}"
+  FILES_MATCHING REGEX "\\.(md|cpp|cfg|txt)$" PATTERN "CMakeLists.txt" EXCLUDE)
 
 set(CPACK_GENERATOR DEB)
 set(CPACK_PACKAGE_CONTACT "The Quelta developers <quelta@localhost>")
