@@ -30,7 +30,9 @@ int main(int argc, char** argv) {
         return 2;
     }
     const bool complete = Logger::initialize(Pathname(argv[1]), Pathname(argv[2]));
-    logger.info("logging is configured from %s", argv[1]);
+    if (complete) {
+        logger.info("logging is configured from %s", argv[1]);
+    }
 
     for (int item = 1; item <= 30; ++item) {
         try {

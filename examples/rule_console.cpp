@@ -7,7 +7,8 @@
 //     -term                                takes them back
 //     !                                    takes everything back
 //
-// Empty lines, and lines of the file that start with `#`, are ignored.
+// Empty lines, and lines of the file that start with `#`, are ignored. The term `meta::all` is set
+// from the start and after each `!`.
 
 #include <algorithm>
 #include <fstream>
@@ -17,8 +18,6 @@
 #include <sstream>
 #include <stdexcept>
 #include <string>
-#include <utility>
-#include <vector>
 
 #include "services/pipeline/indexprocessor/Rete.h"
 
@@ -92,7 +91,7 @@ void printChanges(const StringSet& before, const StringSet& after) {
 }
 
 void handle(RuleSystem& rules, const std::string& line, StringSet& implications) {
-    std::vector<std::pair<WildcardMatcher, Conditional*>*> candidates;
+    RuleSystem::Candidates candidates;
     if (line == "!") {
         rules.resetAll(implications);
     } else if (line[0] == '-') {

@@ -40,7 +40,7 @@ TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);
     EXPECT_EQ(
-        "+ everything is quiet\n"
+        "+ watching\n"
         "+ archive the web log\n"
         "+ old log\n"
         "+ web log\n"
@@ -138,7 +138,6 @@ TEST(OwnLogTest, GoesOnWithoutAConfigurationAndSaysSo) {
     EXPECT_EQ(
         "Couldn't open log file configuration \"/nowhere/own_log.cfg\": No such file or "
         "directory\n"
-        "logging is configured from /nowhere/own_log.cfg\n"
         "item 10 is round\n"
         "item 20 is round\n"
         "item 30 is round\n"

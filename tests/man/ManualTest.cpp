@@ -172,7 +172,7 @@ TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
     std::filesystem::create_directories(home.file("var/log"));
     const ChildRun run = inChild([&] {
         EXPECT_TRUE(Logger::initialize(Pathname(SAMPLE_CONFIG), Pathname(home.path())));
-        Logger("Rete").debug("the first line");
+        Logger("Thread").debug("the first line");
         Logger("other").info("not written");
     });
     EXPECT_EQ(0, run.status);
@@ -180,7 +180,7 @@ TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
     EXPECT_TRUE(std::regex_match(
         readFile(home.file("var/log/cmdline.log")),
         std::regex(
-            "[0-9]{2}-[0-9]{2}-[0-9]{4} [0-9:]{8}\\.[0-9]{3} DEBUG Rete - the first line\n")));
+            "[0-9]{2}-[0-9]{2}-[0-9]{4} [0-9:]{8}\\.[0-9]{3} DEBUG Thread - the first line\n")));
 }
 
 }  // namespace
