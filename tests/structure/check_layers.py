@@ -15,7 +15,7 @@ INCLUDE = re.compile(r'^\s*#\s*include\s+["<]((?:util|services|xmlwrapp)/[^">]+)
 
 
 def read_layers(path):
-    """Returns ({unit: rank}, {unit: units that its header may reach})."""
+    """Returns ({unit: (rank, layer)}, {unit: units that its header may reach})."""
     ranks, allowed, order = {}, {}, []
     for line in path.read_text().splitlines():
         line = line.split('#')[0].strip()
@@ -28,7 +28,7 @@ def read_layers(path):
         if name not in order:
             order.append(name)
         for unit in units.split():
-            ranks[unit] = order.index(name)
+            ranks[unit] = (order.index(name), name)
     return ranks, allowed
 
 
@@ -45,12 +45,13 @@ def upward_includes(files, ranks):
     for path in files:
         unit = unit_of(path, ranks)
         if unit not in ranks:
-            yield f'{path.name}: no layer names this unit'
+            yield f'{path.name}: no layer of layers.txt names this unit'
             continue
         for included in includes(path):
             other = included.stem
             if other in ranks and ranks[other] > ranks[unit]:
-                yield f'{path.name} includes {included}, which is in a higher layer'
+                yield (f'{path.name} is in the layer {ranks[unit][1]} and includes {included} of the '
+                       f'higher layer {ranks[other][1]}')
 
 
 def find_circle(graph):
@@ -108,7 +109,7 @@ def main():
     count, problems = check(source_dir, layers_file)
     for problem in problems:
         print(problem)
-    print(f'{count} files, {len(problems)} problems')
+    print(f'files checked against {layers_file}: {count}, problems: {len(problems)}')
     return 1 if problems or count == 0 else 0
 
 

@@ -25,11 +25,11 @@ class CheckLayers(unittest.TestCase):
         self.assertEqual([], self.problems('low: A\nhigh: B\n', A_h='', B_h='#include "util/A.h"\n'))
 
     def test_reports_a_header_that_includes_a_higher_layer(self):
-        self.assertEqual(['A.h includes util/B.h, which is in a higher layer'],
+        self.assertEqual(['A.h is in the layer low and includes util/B.h of the higher layer high'],
                          self.problems('low: A\nhigh: B\n', A_h='#include "util/B.h"\n', B_h=''))
 
     def test_reports_a_source_that_includes_a_higher_layer(self):
-        self.assertEqual(['A.cpp includes util/B.h, which is in a higher layer'],
+        self.assertEqual(['A.cpp is in the layer low and includes util/B.h of the higher layer high'],
                          self.problems('low: A\nhigh: B\n', A_cpp='#include "util/B.h"\n', B_h=''))
 
     def test_reports_a_circle(self):
@@ -38,7 +38,7 @@ class CheckLayers(unittest.TestCase):
                                        B_h='#include "util/A.h"\n'))
 
     def test_reports_a_unit_without_a_layer(self):
-        self.assertEqual(['B.h: no layer names this unit'], self.problems('low: A\n', A_h='', B_h=''))
+        self.assertEqual(['B.h: no layer of layers.txt names this unit'], self.problems('low: A\n', A_h='', B_h=''))
 
     def test_reports_a_layer_that_names_nothing(self):
         self.assertEqual(['layers.txt names C, which does not exist'],
