@@ -1,12 +1,15 @@
-# Read by every script: what it says of itself, which is the comment at its top.
+# Read by every script, with the project's folder in $root: what the script says of itself, which is
+# the comment at its top.
+
+self=$(CDPATH= cd -- "$(dirname -- "$0")" && pwd)/${0##*/}
 
 usage() {
-    sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$0"
+    sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$self"
 }
 
 # refuse REASON...: for arguments that the script does not know.
 refuse() {
-    echo "script/${0##*/}: $*" >&2
+    echo "${self#"$root"/}: $*" >&2
     usage >&2
     exit 2
 }

@@ -45,7 +45,8 @@ private:
 };
 
 // A compiled conversion pattern. Also the home of the routing that every entry point of Logger
-// goes through, as it needs the private parts of loggers and channels that a layout needs too.
+// goes through (in LogRouting.cpp), as it needs the private parts of loggers and channels that a
+// layout needs too.
 class LogFormat {
 public:
     struct Atom {

@@ -117,7 +117,7 @@ done
 absent=clang
 refused() {
     # shellcheck disable=SC2086  # a list of words on purpose
-    run "$clone/script/"$1
+    run clone/script/$1
     expect "$1: status and output" "$status $out" "2 "
     expect "$1: reason" "$(printf '%s\n' "$err" | head -n 2)" "script/${1%% *}: $2
 $(sed -n '2s/^# //p' "$clone/script/${1%% *}")"

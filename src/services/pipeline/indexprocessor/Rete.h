@@ -198,6 +198,7 @@ inline bool RuleSystem::changeCondition(bool newState, const std::string& term,
     _wildcardTrie.findData(text, wildcardMatches);
     const std::size_t length = std::strlen(text.c_str());
     const std::size_t last = wildcardMatches.size() - 1;
+    // The matchers lie far apart, so those of later candidates are fetched while this one is tried.
     for (std::size_t i = 0; i < wildcardMatches.size(); ++i) {
         wildcardMatches[std::min(i + 16, last)]->first.prefetch();
         wildcardMatches[std::min(i + 8, last)]->first.prefetchSegments();
