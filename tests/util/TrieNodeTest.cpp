@@ -2,11 +2,13 @@
 
 #include <memory>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "support/FieldOrder.h"
 #include "support/SmallStack.h"
 
 namespace {
@@ -43,9 +45,18 @@ struct Counted {
 };
 int Counted::copiesLeft = 0;
 
+// How callers see a node.
+static_assert(std::is_same_v<decltype(Trie::_children), Trie * [Trie::ALPHABET_SIZE]>);
+static_assert(std::is_same_v<decltype(Trie::_dataList), std::vector<std::string>>);
+static_assert(std::is_same_v<decltype(&Trie::clear), void (Trie::*)()>);
+static_assert(std::is_same_v<decltype(&Trie::findData),
+                             void (Trie::*)(const std::string&, std::vector<std::string*>&)>);
+static_assert(!std::is_polymorphic_v<Trie>);
+
 TEST(TrieNodeTest, HasOneSlotPerByteValueAndStartsEmpty) {
     static_assert(Trie::ALPHABET_SIZE == 256);
     Trie trie;
+    EXPECT_TRUE(standInOrder({&trie._children, &trie._dataList}));
     EXPECT_EQ(256u, std::size(trie._children));
     for (const Trie* const child : trie._children) {
         EXPECT_EQ(nullptr, child);
@@ -84,6 +95,17 @@ TEST(TrieNodeTest, ReplacesTheResults) {
     EXPECT_EQ("a", *results[0]);
     trie.findData("b", results);
     EXPECT_THAT(results, IsEmpty());
+}
+
+TEST(TrieNodeTest, StoresACopyAndLeavesTheOriginalAlone) {
+    Trie trie;
+    const std::string key = "a";
+    std::string data = "a value that is longer than any small string";
+    const std::string before = data;
+    trie.addData(key, data);
+    EXPECT_EQ(before, data);
+    data = "changed";
+    EXPECT_THAT(find(trie, "a"), ElementsAre(before));
 }
 
 TEST(TrieNodeTest, ResultsPointIntoTheTrie) {

@@ -1,19 +1,82 @@
 #include "services/pipeline/indexprocessor/Rete.h"
 
+#include <cstdint>
+#include <functional>
+#include <map>
 #include <memory>
+#include <set>
 #include <stdexcept>
 #include <string>
+#include <type_traits>
+#include <utility>
 #include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "support/FieldOrder.h"
 #include "support/SmallStack.h"
 
 namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+
+// How callers see the network.
+template <typename Class, typename Result, typename... Arguments>
+using Method = Result (Class::*)(Arguments...);
+using Scratch = std::vector<std::pair<WildcardMatcher, Conditional*>*>;
+using Text = const std::string&;
+static_assert(std::is_same_v<StringSet, std::set<std::string>>);
+static_assert(std::is_same_v<OpSet, std::set<BoolOperator*>>);
+static_assert(std::is_same_v<ConditionMap, std::map<std::string, Conditional*>>);
+static_assert(std::is_same_v<PrefixTrie, TrieNode<std::pair<WildcardMatcher, Conditional*>>>);
+static_assert(std::is_same_v<decltype(AND_OPERATOR), const char* const>);
+static_assert(std::is_same_v<decltype(META_ALL), const std::string>);
+
+static_assert(std::is_abstract_v<BoolOperator> && std::has_virtual_destructor_v<BoolOperator>);
+static_assert(std::is_constructible_v<AndOperator, BoolOperator*, std::string&>);
+static_assert(std::is_same_v<decltype(&BoolOperator::hasFired), Method<BoolOperator, bool>>);
+static_assert(std::is_same_v<decltype(&BoolOperator::incCount), Method<BoolOperator, void>>);
+static_assert(std::is_same_v<decltype(&BoolOperator::decCount), Method<BoolOperator, void>>);
+using Updating = Method<BoolOperator, bool, StringSet&>;
+static_assert(std::is_same_v<decltype(&BoolOperator::addMatch), Updating>);
+static_assert(std::is_same_v<decltype(&BoolOperator::retractMatch), Updating>);
+static_assert(std::is_same_v<decltype(&BoolOperator::update), Updating>);
+static_assert(std::is_same_v<decltype(&BoolOperator::reset), Updating>);
+static_assert(
+    std::is_same_v<decltype(&BoolOperator::addImplication), Method<BoolOperator, void, Text>>);
+static_assert(std::is_same_v<decltype(&BoolOperator::incNeedMatch), Method<BoolOperator, void>>);
+static_assert(
+    std::is_same_v<decltype(&BoolOperator::addChild), Method<BoolOperator, void, BoolOperator&>>);
+static_assert(
+    std::is_same_v<decltype(&BoolOperator::toString), std::string (BoolOperator::*)() const>);
+static_assert(std::is_same_v<decltype(&AndOperator::shouldFire), Method<AndOperator, bool>>);
+
+static_assert(!std::is_polymorphic_v<Conditional> && std::is_copy_constructible_v<Conditional>);
+static_assert(std::is_constructible_v<Conditional, Text>);
+static_assert(
+    std::is_same_v<decltype(&Conditional::getName), Method<Conditional, void, std::string&>>);
+static_assert(std::is_same_v<decltype(&Conditional::isSet), Method<Conditional, bool>>);
+static_assert(
+    std::is_same_v<decltype(&Conditional::addOperator), Method<Conditional, void, BoolOperator&>>);
+static_assert(
+    std::is_same_v<decltype(&Conditional::toString), std::string (Conditional::*)() const>);
+
+static_assert(!std::is_polymorphic_v<RuleSystem> && std::is_copy_constructible_v<RuleSystem>);
+static_assert(
+    std::is_same_v<decltype(&RuleSystem::addOperator), Method<RuleSystem, void, BoolOperator&>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::addCondition),
+                             Method<RuleSystem, void, Text, BoolOperator&>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::setCondition),
+                             Method<RuleSystem, bool, Text, Scratch&, StringSet&>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::resetCondition),
+                             Method<RuleSystem, void, Text, Scratch&, StringSet&>>);
+static_assert(
+    std::is_same_v<decltype(&RuleSystem::resetAll), Method<RuleSystem, void, StringSet&>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::reset), Method<RuleSystem, void, StringSet&>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::clearRules), Method<RuleSystem, void>>);
+static_assert(std::is_same_v<decltype(&RuleSystem::toString), Method<RuleSystem, std::string>>);
 
 // A network with its caller's set and scratch space.
 class ReteTest : public testing::Test {
@@ -79,6 +142,53 @@ TEST_F(ReteTest, ANewOperatorNeedsNothingAndHasNotFired) {
     EXPECT_EQ(AND_OPERATOR, op._type);
     OrOperator plain(nullptr, implication);
     EXPECT_EQ(nullptr, plain._type);
+}
+
+TEST_F(ReteTest, EachClassKeepsItsFieldsInOrder) {
+    std::string implication = "i";
+    const AndOperator op(nullptr, implication);
+    static_assert(std::is_same_v<decltype(op._needMatch), std::int32_t>);
+    static_assert(std::is_same_v<decltype(op._matchCount), std::int32_t>);
+    EXPECT_TRUE(standInOrder({&op._needMatch, &op._matchCount, &op._fired, &op._implications,
+                              &op._children, &op._type}));
+    static_assert(sizeof(AndOperator) == sizeof(BoolOperator));
+    const Conditional condition("a");
+    EXPECT_TRUE(standInOrder({&condition._name, &condition._setValue, &condition._operators}));
+    EXPECT_TRUE(
+        standInOrder({&rs._allOperators, &rs._conditions, &rs._wildcardTrie, &rs._setConditions}));
+}
+
+TEST_F(ReteTest, ANewConditionIsNotSetAndFeedsNothing) {
+    const std::string name = "a*";
+    Conditional condition(name);
+    std::string out = "stale";
+    condition.getName(out);
+    EXPECT_EQ("a*", out);
+    EXPECT_FALSE(condition._setValue);
+    EXPECT_FALSE(condition.isSet());
+    EXPECT_THAT(condition._operators, IsEmpty());
+}
+
+TEST_F(ReteTest, ANewSystemIsEmpty) {
+    EXPECT_THAT(rs._allOperators, IsEmpty());
+    EXPECT_THAT(rs._conditions, IsEmpty());
+    EXPECT_THAT(rs._setConditions, IsEmpty());
+    EXPECT_TRUE(rs._wildcardTrie._dataList.empty());
+    for (const PrefixTrie* const child : rs._wildcardTrie._children) {
+        EXPECT_EQ(nullptr, child);
+    }
+}
+
+TEST_F(ReteTest, AnAndOperatorComparesCountsWithTheirSign) {
+    std::string implication = "i";
+    AndOperator op(nullptr, implication);
+    op._matchCount = -1;
+    EXPECT_FALSE(op.shouldFire());
+    op._needMatch = -1;
+    EXPECT_TRUE(op.shouldFire());
+    op.decCount();
+    op.incCount();
+    EXPECT_EQ(-1, op._matchCount);
 }
 
 TEST_F(ReteTest, CountsStayBetweenNoneAndTheNeed) {
@@ -325,6 +435,26 @@ TEST_F(ReteTest, TermsWithBytesFrom128) {
     EXPECT_TRUE(set("\xe4\x80\xff"));
     EXPECT_THAT(implied, ElementsAre("i"));
     EXPECT_FALSE(set("\xe5\x80\xff"));
+}
+
+TEST_F(ReteTest, SettingAgainRecordsTheNameAgain) {
+    rule("a", "i");
+    set("a");
+    rs._setConditions.clear();
+    reset("a");
+    EXPECT_THAT(rs._setConditions, IsEmpty());
+    set("a");
+    rs._setConditions.clear();
+    set("a");
+    EXPECT_THAT(rs._setConditions, ElementsAre("a"));
+}
+
+// Only what the rule system sets is recorded.
+TEST_F(ReteTest, AConditionThatIsSetByItselfIsNotRecorded) {
+    rule("a", "i");
+    rs._conditions.at("a")->set(implied);
+    EXPECT_THAT(implied, ElementsAre("i"));
+    EXPECT_THAT(rs._setConditions, IsEmpty());
 }
 
 // Deliberate: the record of set conditions only grows.
