@@ -16,13 +16,16 @@ const std::string sampleRules = project + "/examples/rules.txt";
 const std::string sampleConfig = project + "/examples/own_log.cfg";
 
 // Whether README.md shows this text, indented as it shows all that is typed and printed.
-bool readmeShows(const std::string& text) {
+testing::AssertionResult readmeShows(const std::string& text) {
     std::string indented;
     std::istringstream lines(text);
     for (std::string line; std::getline(lines, line);) {
         indented += "    " + line + '\n';
     }
-    return readFile(project + "/README.md").find(indented) != std::string::npos;
+    if (readFile(project + "/README.md").find(indented) == std::string::npos) {
+        return testing::AssertionFailure() << "README.md does not show\n" << indented;
+    }
+    return testing::AssertionSuccess();
 }
 
 TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
@@ -127,8 +130,7 @@ TEST(OwnLogTest, DoesWhatTheReadmeShows) {
     std::string err =
         Program(OWN_LOG).arg("examples/own_log.cfg").arg(dir.path()).in(project).run().err;
     err.replace(err.find(dir.path()), dir.path().size(), "/tmp");
-    EXPECT_TRUE(readmeShows("$ build/dev/examples/own_log examples/own_log.cfg /tmp\n" + err))
-        << err;
+    EXPECT_TRUE(readmeShows("$ build/dev/examples/own_log examples/own_log.cfg /tmp\n" + err));
     EXPECT_TRUE(readmeShows("/tmp/own.log  /tmp/own.log.1  /tmp/own.log.2\n"));
 }
 
