@@ -23,6 +23,7 @@ const char* const BLANKS = " \t";
 const std::string_view KEY_PREFIX = "log4cpp.";
 const std::string_view COMMENT_START = "<!--";
 const std::string_view COMMENT_END = "-->";
+const std::string_view FEED_READ("\n\0", 2);
 
 // Removes everything from the first "#" on.
 void cutRemark(std::string& line) {
@@ -201,10 +202,11 @@ bool read_line(std::string& result, std::FILE* ifile) {
             return !result.empty();
         }
         QUELTA_ASSERT(p == buf);
-        const std::size_t feed = std::string_view(buf, sizeof(buf)).find('\n');
+        const std::string_view filled(buf, sizeof(buf));
+        const std::size_t feed = filled.find('\n');
         if (feed == std::string_view::npos) {
             result.append(buf, sizeof(buf) - 1);
-        } else if (feed + 1 < sizeof(buf) && buf[feed + 1] == '\0') {
+        } else if (filled.substr(feed).starts_with(FEED_READ)) {
             result.append(buf, feed);
             return true;
         } else {

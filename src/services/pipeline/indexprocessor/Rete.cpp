@@ -136,6 +136,7 @@ struct Pattern {
     char characters[SIZE];
 };
 static_assert(ALPHABET_LENGTH + MOST_STARS < Pattern::SIZE);
+static_assert(Pattern::WORD_COUNT * sizeof(std::uint64_t) == Pattern::SIZE);
 
 // A pattern in the making, and behind it the zeros that move up when it shrinks.
 struct Draft {

@@ -274,9 +274,12 @@ TEST_F(ReteProgramTest, GeneratesTextsFromScriptedDraws) {
     } cases[] = {
         {{0, 0}, false, "100 "},
         {{0, 182}, true, "wsserverimpl "},
+        // Draws beyond the number of choices begin anew: four lengths, 183 words, twenty gaps.
+        {{4, 184}, false, "202 "},
         {{2, 0, 1, 2}, false, "100 202 206 "},
         // A query draws an operator for each gap: the word, then the gap behind it.
         {{1, 0, 3, 1}, true, "100 AND 202 "},
+        {{1, 0, 20, 1}, true, "100 AND 202 "},
         {{1, 0, 4, 1}, true, "100 OR 202 "},
         {{1, 0, 7, 1}, true, "100 OR 202 "},
         {{1, 0, 8, 1}, true, "100 AND NOT 202 "},

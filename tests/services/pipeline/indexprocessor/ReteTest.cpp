@@ -1,9 +1,13 @@
 #include "services/pipeline/indexprocessor/Rete.h"
 
+#include <sys/mman.h>
+#include <unistd.h>
+
 #include <cstdint>
 #include <functional>
 #include <map>
 #include <memory>
+#include <new>
 #include <set>
 #include <stdexcept>
 #include <string>
@@ -569,6 +573,31 @@ TEST_F(ReteTest, ASharedImplicationLeavesWithTheFirstThatCeasesToFire) {
     reset("a");
     EXPECT_THAT(implied, IsEmpty());
     EXPECT_TRUE(second.hasFired());
+}
+
+// The set lies at the end of the memory, so that looking at what would be its first element traps.
+TEST_F(ReteTest, TheSecondOfTwoOperatorsFindsItsImplicationGone) {
+    const auto page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+    void* const memory =
+        ::mmap(nullptr, 2 * page, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+    ASSERT_NE(MAP_FAILED, memory);
+    char* const end = static_cast<char*>(memory) + page;
+    ASSERT_EQ(0, ::mprotect(end, page, PROT_NONE));
+    auto* const implications = new (end - sizeof(StringSet)) StringSet;
+
+    std::string shared = "shared";
+    AndOperator first(nullptr, shared);
+    AndOperator second(nullptr, shared);
+    for (AndOperator* const op : {&first, &second}) {
+        EXPECT_TRUE(op->update(*implications));
+    }
+    for (AndOperator* const op : {&first, &second}) {
+        op->incNeedMatch();
+        EXPECT_TRUE(op->update(*implications));
+        EXPECT_THAT(*implications, IsEmpty());
+    }
+    implications->~set();
+    ::munmap(memory, 2 * page);
 }
 
 TEST_F(ReteTest, ATermMayBelongToTheImplicationsItTakesOut) {
