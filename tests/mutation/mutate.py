@@ -4,17 +4,19 @@
 Usage: mutate.py BUILD_DIR [--jobs N] [--sample N] [--seed S] [SOURCE...]
 
 Works in copies of the tree below BUILD_DIR, one for each job, never in the tree itself. targets.txt
-names the test programs of each source, equivalents.txt the mutants that no test can tell from the original, with
-the reason. Prints each survivor as path:line: before -> after. Exits with 1 when a mutant survives
-that equivalents.txt does not explain, or when an explained one no longer survives.
+names the test programs of each source, equivalents.txt the mutants that no test can tell from the
+original, with the reason. Prints each survivor as path:line: before -> after. Exits with 1 when a
+mutant survives that equivalents.txt does not explain, or when an explained one no longer survives.
 """
 import argparse
 import concurrent.futures
+import contextlib
 import os
 import pathlib
 import queue
 import random
 import re
+import signal
 import subprocess
 import sys
 import time
@@ -51,7 +53,7 @@ def mutants(path):
         code = HIDDEN.sub(lambda m: '\0' * len(m.group()), line)
         for pattern, replacement in MUTATIONS:
             for match in re.finditer(pattern, code):
-                new = match.expand(replacement) if isinstance(replacement, str) else replacement(match)
+                new = replacement(match) if callable(replacement) else match.expand(replacement)
                 yield number, line, line[:match.start()] + new + line[match.end():]
 
 
@@ -82,14 +84,19 @@ class Tree:
 
     def passes(self, target):
         program = next(p for p in self.build.rglob(target) if p.is_file())
+        # In a session of its own, so that what it forked ends with it.
+        run = subprocess.Popen([program, '--gtest_brief=1', '--gtest_fail_fast'],
+                               cwd=program.parent, stdin=subprocess.DEVNULL,
+                               stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL,
+                               start_new_session=True)
         try:
-            run = subprocess.run([program, '--gtest_brief=1', '--gtest_fail_fast'],
-                                 cwd=program.parent, stdin=subprocess.DEVNULL,
-                                 stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL,
-                                 timeout=self.limits.get(target, UNBROKEN_SECONDS))
+            return run.wait(self.limits.get(target, UNBROKEN_SECONDS)) == 0
         except subprocess.TimeoutExpired:
             return False
-        return run.returncode == 0
+        finally:
+            with contextlib.suppress(ProcessLookupError):
+                os.killpg(run.pid, signal.SIGKILL)
+            run.wait()
 
     def passes_unbroken(self, target):
         if target in self.limits:
@@ -97,9 +104,10 @@ class Tree:
         if not self.make(target):
             return False
         started = time.monotonic()
-        passed = self.passes(target)
+        if not self.passes(target):
+            return False
         self.limits[target] = GRACE_SECONDS + 10 * (time.monotonic() - started)
-        return passed
+        return True
 
     def survives(self, source, number, mutated, targets):
         path = self.root / source
@@ -134,8 +142,11 @@ def test_source(pool, trees, source, targets, options):
     if options.sample and len(chosen) > options.sample:
         chosen = sorted(random.Random(options.seed).sample(chosen, options.sample))
     print(f'{source}: {len(chosen)} mutants', file=sys.stderr, flush=True)
-    futures = [pool.submit(with_tree, lambda tree, m=mutant: tree.survives(source, m[0], m[2], targets))
-               for mutant in chosen]
+
+    def run(mutant):
+        return with_tree(lambda tree: tree.survives(source, mutant[0], mutant[2], targets))
+
+    futures = [pool.submit(run, mutant) for mutant in chosen]
     for mutant, future in zip(chosen, futures):
         yield mutant, future.result()
 
