@@ -1,9 +1,13 @@
 // Descriptors 0, 1 and 2 closed at the start, in every combination.
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <array>
+#include <cstdlib>
 #include <string>
 
 #include "support/NumberedLines.h"
@@ -15,6 +19,31 @@ namespace {
 
 constexpr unsigned LINES = 200;
 
+// The file behind each descriptor, 0 where there is none.
+using Files = std::array<ino_t, 3>;
+
+Files filesOfStandardDescriptors() {
+    Files files{};
+    for (int fd = 0; fd < 3; ++fd) {
+        struct stat status {};
+        files[static_cast<std::size_t>(fd)] = ::fstat(fd, &status) == 0 ? status.st_ino : 0;
+    }
+    return files;
+}
+
+// Whether descriptors that were open are as they were, and of those that were closed at most the
+// first has come into use, for the log: nothing is opened in their place.
+bool nothingIsReopened(const Files& before, const std::string& log) {
+    const Files now = filesOfStandardDescriptors();
+    Files expected = before;
+    const auto free = std::find(expected.begin(), expected.end(), ino_t{0});
+    struct stat status {};
+    if (free != expected.end() && ::stat(log.c_str(), &status) == 0) {
+        *free = status.st_ino;
+    }
+    return now == expected;
+}
+
 // What a program does: configure, log, say something to people, end.
 [[noreturn]] void runProgram(const TempDir& dir, unsigned closed) {
     for (int fd = 0; fd < 3; ++fd) {
@@ -22,10 +51,14 @@ constexpr unsigned LINES = 200;
             ::close(fd);
         }
     }
+    const Files before = filesOfStandardDescriptors();
     const bool configured = Logger::initialize(Pathname(dir.file("log.cfg")), Pathname(dir.path()));
     static Logger logger("Closed");
     for (unsigned number = 0; number < LINES; ++number) {
         logger.info(numberedLine(0, number));
+    }
+    if (!nothingIsReopened(before, dir.file("app.log"))) {
+        std::exit(9);
     }
     std::exit(configured ? 7 : 8);
 }
