@@ -35,7 +35,7 @@ std::string formatted(const LogFormat* layout, const std::string& message) {
 
 TEST(LogAppender, StartsClosedWithoutFileLimitBackupsAndLayout) {
     const LogAppender appender;
-    EXPECT_FALSE(appender._fd.valid());
+    EXPECT_EQ(-1, appender._fd._osdep);
     EXPECT_EQ("", appender._filename);
     EXPECT_EQ(0, appender._maxSize);
     EXPECT_EQ(0, appender._curSize);
@@ -259,7 +259,7 @@ TEST(LogAppender, SetupWithoutFileTurnsToStandardErrorAndSaysWhatItIgnores) {
         {0, 3,
          "Appender \"E\" has no filename, assuming stderr\n"
          "Appender \"E\" has maxBackupIndex set without specifying a filename, ignoring\n"},
-        {5, 0,
+        {1, 0,
          "Appender \"E\" has no filename, assuming stderr\n"
          "Appender \"E\" has maxSize set without specifying a filename, ignoring\n"},
         {5, 3,

@@ -11,6 +11,7 @@
 #include <deque>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -351,6 +352,28 @@ TEST_F(ReteProgramTest, CutsPatternsAsTheDrawsSay) {
         names.push_back(name);
     }
     EXPECT_THAT(names, ElementsAre("*z", "a*bc*fghijklmnopqrstuvwxyz"));
+}
+
+// Of the hashes of these two the upper halves and the ten lowest bits are the same, so that nothing
+// but their characters tells them apart.
+TEST_F(ReteProgramTest, PatternsWithTheSameSlotAndTagStayTwo) {
+    using Cuts = std::vector<std::pair<long, long>>;
+    for (const Cuts& cuts : {Cuts{{21, 22}, {7, 9}, {24, 24}, {4, 5}, {3, 6}, {18, 19}},
+                             Cuts{{18, 19}, {2, 5}, {21, 21}, {11, 14}, {11, 13}, {16, 17}}}) {
+        scripted.push_back(static_cast<long>(cuts.size()) - 1);
+        for (const auto& [start, end] : cuts) {
+            scripted.push_back(start);
+            scripted.push_back(end - start);
+        }
+    }
+    RuleSystem rs;
+    printed([&] { testWildCards(&rs, 2); });
+    EXPECT_TRUE(scripted.empty());
+    std::vector<std::string> names;
+    for (const auto& [name, condition] : rs._conditions) {
+        names.push_back(name);
+    }
+    EXPECT_THAT(names, ElementsAre("ab*fghijklm*r*tu*w*xyz", "abc*g*jklmnopqrstu*wxy*z"));
 }
 
 TEST_F(ReteProgramTest, DrawsAndPrintsExactlyAsAPlainGenerator) {
