@@ -28,9 +28,9 @@ def main():
                                  if line and not line.startswith('#'))
     present = collections.Counter(found(source_dir))
     for line in sorted((listed - present).elements()):
-        print(f'missing from the source: {line}')
+        print(f'listed in {list_file.name}, but not in the source: {line}')
     for line in sorted((present - listed).elements()):
-        print(f'missing from the list: {line}')
+        print(f'in the source, but not listed in {list_file.name}: {line}')
     print(f'{sum(present.values())} assertions')
     return 0 if present == listed and present else 1
 

@@ -17,10 +17,11 @@ def main():
     tests_dir, document = (pathlib.Path(arg) for arg in sys.argv[1:3])
     defined = {f'{suite}.{case}' for path in tests_dir.rglob('*.cpp')
                for suite, case in DEFINED.findall(path.read_text())}
-    named = set(NAMED.findall(document.read_text()))
-    missing = sorted(named - defined)
-    for name in missing:
-        print(f'no such test: {name}')
+    lines = document.read_text().splitlines()
+    named = [(number, name) for number, line in enumerate(lines, 1) for name in NAMED.findall(line)]
+    missing = [(number, name) for number, name in named if name not in defined]
+    for number, name in missing:
+        print(f'{document}:{number} names {name}, and there is no such test')
     print(f'{len(named)} tests named, {len(missing)} missing')
     return 1 if missing or not named else 0
 
