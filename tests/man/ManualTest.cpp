@@ -177,10 +177,12 @@ TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);
+    const std::string log = readFile(home.file("var/log/cmdline.log"));
     EXPECT_TRUE(std::regex_match(
-        readFile(home.file("var/log/cmdline.log")),
+        log,
         std::regex(
-            "[0-9]{2}-[0-9]{2}-[0-9]{4} [0-9:]{8}\\.[0-9]{3} DEBUG Thread - the first line\n")));
+            "[0-9]{2}-[0-9]{2}-[0-9]{4} [0-9:]{8}\\.[0-9]{3} DEBUG Thread - the first line\n")))
+        << log;
 }
 
 }  // namespace
