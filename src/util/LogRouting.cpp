@@ -51,10 +51,11 @@ void writeToStderr(LogLevel level, std::string_view msg) {
 
     char usual[1024];
     std::string longer;
+    char* line = usual;
     if (size > sizeof usual) {
         longer.resize(size);
+        line = longer.data();
     }
-    char* const line = size > sizeof usual ? longer.data() : usual;
     char* end = line;
     for (const std::string_view part : {std::string_view(name, nameLength), SEPARATOR, msg}) {
         end += part.copy(end, part.size());

@@ -156,11 +156,13 @@ TEST(LogFormatCalls, ALengthThatIsNotBelowTheBufferIsTriedAgain) {
 }
 
 TEST(LogFormatCalls, AShortDateNeedsOneCallPerPiece) {
-    EXPECT_EQ(std::vector<std::size_t>{64},
-              sizesFor("%Y-%m-%d %H:%M:%S", [](char* buf, std::size_t, const char*) {
-                  buf[0] = 'x';
-                  return std::size_t{63};
-              }));
+    for (const std::size_t length : {std::size_t{1}, std::size_t{63}}) {
+        EXPECT_EQ(std::vector<std::size_t>{64},
+                  sizesFor("%Y-%m-%d %H:%M:%S", [length](char* buf, std::size_t, const char*) {
+                      buf[0] = 'x';
+                      return length;
+                  }));
+    }
 }
 
 TEST(LogFormatCalls, ALineAllocatesAtMostOnce) {

@@ -84,6 +84,21 @@ TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
     }
 }
 
+TEST(FallbackTest, ALineOfAKibibyteNeedsNoMemory) {
+    REQUIRE_ALLOCATION_PROBE();
+    const std::string prefix = "INFO - ";
+    const std::string text(1024 - prefix.size() - 1, 'x');
+    const std::string longer = text + 'x';
+    const StderrCapture err;
+    AllocationProbe allocations;
+    fallback_to_stderr(INFO, text);
+    const std::size_t count = allocations.count();
+    fallback_to_stderr(INFO, longer);
+    allocations.stop();
+    EXPECT_EQ(0u, count);
+    EXPECT_EQ(prefix + text + '\n' + prefix + longer + '\n', err.text());
+}
+
 TEST(FallbackTest, IgnoresTheResultOfTheCall) {
     ScriptedCalls writes("write");
     writes.fail(EIO).limit(3).fail(EINTR);
