@@ -16,6 +16,7 @@
 #include "util/Assert.h"
 #include "util/ErrnoKeeper.h"
 #include "util/LogFormat.h"
+#include "util/LogInternal.h"
 #include "util/LogLevel.h"
 #include "util/LogMsgMetadata.h"
 
@@ -114,8 +115,8 @@ LogAppender& rootAppender() {
 }
 
 LogAppenderMap& appenders() {
-    static auto* const map = new LogAppenderMap;
-    return *map;
+    static Everlasting<LogAppenderMap> map;
+    return map.value;
 }
 
 LogAppender::LogAppender() : _fd(-1) {}

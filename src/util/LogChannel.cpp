@@ -39,13 +39,13 @@ LogChannel* newChannel() {
 using ChannelMap = std::map<std::string, LogChannel*, std::less<>>;
 
 // Made on the first call and never destroyed, only emptied at exit: a logger that is made later
-// still looks its name up, and finds the root channel.
+// still looks its name up, and finds the root channel. Looking up takes no memory.
 ChannelMap& channels() {
-    static ChannelMap& map = *new ChannelMap;
+    static Everlasting<ChannelMap> map;
     static const struct Emptier {
-        ~Emptier() { map.clear(); }
+        ~Emptier() { map.value.clear(); }
     } emptier;
-    return map;
+    return map.value;
 }
 
 LogChannel* findChannel(std::string_view name, bool create) {

@@ -235,3 +235,50 @@ TEST(LogAllocation, ReadingTheConfigurationCanBeTriedAgain) {
     }
     EXPECT_GT(n, 20U);
 }
+
+// Configurations that leave things to be made for the first time when logging has begun already.
+TEST(LogAllocation, StartingFromLittleEndsInTheExceptionOrIsDone) {
+    REQUIRE_ALLOCATION_PROBE();
+    const char* const configs[] = {nullptr,
+                                   "",
+                                   "bad and longer than a small string\n",
+                                   "rootCategory=WARN\n",
+                                   "category.a-category-with-quite-a-long-name=WARN\n",
+                                   "appender.an-appender-with-quite-a-long-name=x\n"};
+    const TempDir dir;
+    const Pathname cfg(dir.file("log.cfg"));
+    for (const char* const config : configs) {
+        if (config != nullptr) {
+            writeFile(cfg, config);
+        }
+        SCOPED_TRACE(config == nullptr ? "none" : config);
+        bool failed = true;
+        for (std::size_t n = 1; failed; ++n) {
+            fs::remove(dir.file("failed"));
+            const ChildRun run = inChild([&] {
+                Logger waiting("another-category-with-a-long-name");
+                bool thrown = false;
+                {
+                    AllocationProbe probe(n);
+                    try {
+                        EXPECT_EQ(config != nullptr, Logger::initialize(cfg, Pathname()));
+                    } catch (const std::bad_alloc&) {
+                        thrown = true;
+                    }
+                    if (probe.count() >= n) {
+                        probe.stop();
+                        writeFile(dir.file("failed"), "");
+                    }
+                }
+                EXPECT_EQ(!thrown, logger_initialized);
+                if (thrown) {
+                    EXPECT_EQ(config != nullptr, Logger::initialize(cfg, Pathname()));
+                }
+                EXPECT_NE(nullptr, waiting._channel);
+                EXPECT_EQ(nullptr, uninitialized_loggers);
+            });
+            failed = fs::exists(dir.file("failed"));
+            ASSERT_EQ(0, run.status) << n << '\n' << run.err;
+        }
+    }
+}
