@@ -81,7 +81,8 @@ public:
     // Writes one line, formatted by the layout, and rotates the file when it has grown beyond its
     // limit. The time by which the file's identity is checked is the message's stamp.
     // A line of which nothing could be written is reported and lost; a line cut short by a full
-    // device counts with the bytes that went out. The next line tries again.
+    // device counts with the bytes that went out. The next line tries again. What a signal
+    // interrupts is made again at once.
     // Errors: std::bad_alloc when the line cannot be formatted; errno is left as it was.
     // Cost: one `write`; at most one `stat` in five seconds of message time.
     void write(const LogMsgMetadata& mdata, const std::string& msg);

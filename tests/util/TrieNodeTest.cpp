@@ -97,6 +97,22 @@ TEST(TrieNodeTest, ReplacesTheResults) {
     EXPECT_THAT(results, IsEmpty());
 }
 
+TEST(TrieNodeTest, KeepsTheRoomOfTheResults) {
+    Trie trie;
+    for (int i = 0; i < 100; ++i) {
+        trie.addData("a", "a");
+    }
+    std::vector<std::string*> results;
+    trie.findData("a", results);
+    const auto* const storage = results.data();
+    const std::size_t room = results.capacity();
+    for (const char* const key : {"b", "", "ab"}) {
+        trie.findData(key, results);
+        EXPECT_EQ(storage, results.data()) << key;
+        EXPECT_EQ(room, results.capacity()) << key;
+    }
+}
+
 TEST(TrieNodeTest, StoresACopyAndLeavesTheOriginalAlone) {
     Trie trie;
     const std::string key = "a";

@@ -96,6 +96,22 @@ TEST_F(ReteOrderTest, AllCountsChangeBeforeTheFirstUpdate) {
     EXPECT_THAT(asked, ElementsAre("a0", "b0", "b0"));
 }
 
+TEST_F(ReteOrderTest, OperatorsOfOtherConditionsAreLeftAlone) {
+    const auto operators = makeOperators(4);
+    const char* const keywords[] = {"x", "y", "x*", "*y"};
+    for (std::size_t i = 0; i < operators.size(); ++i) {
+        rs.addCondition(keywords[i], *operators[i]);
+    }
+    rs.setCondition("x", scratch, implied);
+    EXPECT_THAT(asked, ElementsAre("a1", "c1"));
+    asked.clear();
+    rs.resetCondition("xy", scratch, implied);
+    EXPECT_THAT(asked, ElementsAre("d0", "c0"));
+    asked.clear();
+    rs.setCondition("z", scratch, implied);
+    EXPECT_THAT(asked, ElementsAre());
+}
+
 TEST_F(ReteOrderTest, ATermMeetsItsNameThenPatternsByGrowingPrefix) {
     const auto operators = makeOperators(6);
     const char* const keywords[] = {"xy*", "x*y*", "xyz", "*", "x*", "**"};

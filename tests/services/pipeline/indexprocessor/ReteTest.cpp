@@ -385,6 +385,21 @@ TEST_F(ReteTest, ATermMeetsOnlyPatternsWhosePrefixItBeginsWith) {
     EXPECT_THAT(implied, ElementsAre("*", "a*", "ab*"));
 }
 
+TEST_F(ReteTest, AResetLeavesItsCandidatesLikeASet) {
+    rule("a*", "i");
+    rule("*b", "j");
+    rule("b*", "k");
+    reset("ac");
+    ASSERT_EQ(2u, scratch.size());
+    EXPECT_STREQ("*b", scratch[0]->first.getOrigPattern());
+    EXPECT_EQ(rs._conditions.at("*b"), scratch[0]->second);
+    EXPECT_STREQ("a*", scratch[1]->first.getOrigPattern());
+    EXPECT_EQ(rs._conditions.at("a*"), scratch[1]->second);
+    const RuleSystem::Candidates before = scratch;
+    rs.resetAll(implied);
+    EXPECT_EQ(before, scratch) << "it looks up with scratch space of its own";
+}
+
 TEST_F(ReteTest, AnEmptyTermMeetsThePatternsAtTheRoot) {
     rule("*", "all");
     rule("*a", "a");
