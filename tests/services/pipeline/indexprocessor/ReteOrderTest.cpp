@@ -59,7 +59,7 @@ protected:
 
 TEST_F(ReteOrderTest, AConditionUpdatesItsOperatorsInTheOrderOfTheirAddresses) {
     const auto operators = makeOperators(4);
-    for (const std::size_t i : {2, 0, 3, 1}) {
+    for (const std::size_t i : {2U, 0U, 3U, 1U}) {
         rs.addCondition("x", *operators[i]);
     }
     rs.setCondition("x", scratch, implied);
@@ -72,7 +72,7 @@ TEST_F(ReteOrderTest, AConditionUpdatesItsOperatorsInTheOrderOfTheirAddresses) {
 TEST_F(ReteOrderTest, ChildrenFollowTheirParentDepthFirstInTheOrderOfTheirAddresses) {
     const auto operators = makeOperators(5);
     rs.addCondition("x", *operators[2]);
-    for (const std::size_t i : {4, 1, 0}) {
+    for (const std::size_t i : {4U, 1U, 0U}) {
         operators[2]->addChild(*operators[i]);
         operators[i]->incNeedMatch();
     }
