@@ -6,6 +6,7 @@
 
 thread_local SeenByPthread seenByPthread;
 std::atomic<void (*)()> onKeyDelete{nullptr};
+std::atomic<void (*)()> onDetach{nullptr};
 std::atomic<void (*)(const pthread_mutex_t*)> onMutexDestroy{nullptr};
 
 namespace {
@@ -165,6 +166,9 @@ int __real_pthread_detach(pthread_t thread);
 int __wrap_pthread_detach(pthread_t thread);
 int __wrap_pthread_detach(pthread_t thread) {
     ++seenByPthread.detached;
+    if (const auto hook = onDetach.load()) {
+        hook();
+    }
     return __real_pthread_detach(thread);
 }
 

@@ -35,6 +35,9 @@ extern thread_local SeenByPthread seenByPthread;
 // Called at the beginning of pthread_key_delete, unless null.
 extern std::atomic<void (*)()> onKeyDelete;
 
+// Called at the beginning of pthread_detach, unless null.
+extern std::atomic<void (*)()> onDetach;
+
 // Called with the mutex at the beginning of pthread_mutex_destroy, unless null.
 extern std::atomic<void (*)(const pthread_mutex_t*)> onMutexDestroy;
 

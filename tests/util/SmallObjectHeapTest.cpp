@@ -66,6 +66,9 @@ TEST(SmallObjectHeapTest, SmallObjectsLieSideBySide) {
     auto* const first = static_cast<char*>(heap->allocate(40));
     EXPECT_EQ(first + 48, heap->allocate(48));
     EXPECT_EQ(first + 96, heap->allocate(33));
+    auto* const smallest = static_cast<char*>(heap->allocate(1));
+    EXPECT_EQ(smallest + 16, heap->allocate(0));
+    EXPECT_EQ(smallest + 32, heap->allocate(16));
     EXPECT_TRUE(heap->owns(first));
 }
 

@@ -355,6 +355,25 @@ TEST(MainThreadDyingTest, LetsAWorkerThatNeverRanBeDestroyed) {
     EXPECT_EQ("", run.err);
 }
 
+// Until then the thread still reads the object that is about to end.
+TEST(MainThreadDyingTest, LetsGoOfAThreadOnlyWhenItHasLeftItsStart) {
+    const ChildRun run = inChild([] {
+        static const Thread* leaving = nullptr;
+        static bool left = true;
+        onDetach = [] { left = left && leaving->_start == Thread::STARTED; };
+        for (int round = 0; round < 50; ++round) {
+            const Worker worker("Sorter", [] {});
+            leaving = &worker;
+            Thread::mainThreadDying();
+        }
+        onDetach = nullptr;
+        EXPECT_EQ(50U, seenByPthread.detached);
+        EXPECT_TRUE(left);
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+}
+
 TEST(MainThreadDyingTest, LetsARunningWorkerOutliveItsObject) {
     const ChildRun run = inChild([] {
         std::atomic<bool> running{false};

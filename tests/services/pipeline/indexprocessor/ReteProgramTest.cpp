@@ -18,6 +18,7 @@
 #include <gtest/gtest.h>
 
 #include "services/pipeline/indexprocessor/Rete.h"
+#include "support/AllocationProbe.h"
 #include "support/MatcherOracle.h"
 #include "support/TempDir.h"
 
@@ -394,6 +395,34 @@ TEST_F(ReteProgramTest, DrawsAndPrintsExactlyAsAPlainGenerator) {
             ++name;
         }
     }
+}
+
+// The allocations of a run that makes these draws `times` times over.
+std::size_t allocationsFor(const std::vector<long>& values, int testcount, int times) {
+    for (int i = 0; i < times; ++i) {
+        scripted.insert(scripted.end(), values.begin(), values.end());
+    }
+    RuleSystem rs;
+    std::size_t count = 0;
+    printed([&] {
+        AllocationProbe probe;
+        testWildCards(&rs, times * testcount);
+        count = probe.count();
+    });
+    return count;
+}
+
+TEST_F(ReteProgramTest, PatternsDrawnAgainTakeNoMemory) {
+    REQUIRE_ALLOCATION_PROBE();
+    constexpr int COUNT = 5000;
+    std::vector<long> values;
+    recorded = &values;
+    {
+        RuleSystem rs;
+        printed([&] { testWildCards(&rs, COUNT); });
+    }
+    recorded = nullptr;
+    EXPECT_EQ(allocationsFor(values, COUNT, 1), allocationsFor(values, COUNT, 10));
 }
 
 TEST_F(ReteProgramTest, EachPatternFeedsItsOwnOperatorThatImpliesIt) {
