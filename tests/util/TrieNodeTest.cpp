@@ -237,6 +237,16 @@ TEST(TrieNodeTest, LongListsKeepTheirOrder) {
     }
 }
 
+TEST(TrieNodeTest, ListsTakeRoomOnlyWhenTheyAreFull) {
+    Trie trie;
+    for (int i = 0; i < 10000; ++i) {
+        const std::size_t capacity = trie._dataList.capacity();
+        const bool full = trie._dataList.size() == capacity;
+        trie.addData("", "value");
+        ASSERT_EQ(full, trie._dataList.capacity() != capacity) << i;
+    }
+}
+
 TEST(TrieNodeTest, KeysOfAHundredThousandBytesNeedNoStack) {
     onSmallStack([] {
         const std::string key(100000, 'k');
