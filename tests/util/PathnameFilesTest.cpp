@@ -72,10 +72,12 @@ FILE* __wrap_fopen(const char* path, const char* mode) {
                   [&] { return __real_fopen(path, mode); });
 }
 int __real_mkdir(const char* path, mode_t mode);
-// The address sanitizer's runtime makes the folder of its reports with this, before it can watch
-// any code.
-__attribute__((no_sanitize("address"), no_sanitize("undefined"))) int __wrap_mkdir(const char* path,
-                                                                                   mode_t mode) {
+// The runtimes of clang's sanitizers make the folder of their reports with this, before they can
+// watch any code.
+#ifdef __clang__
+__attribute__((disable_sanitizer_instrumentation))
+#endif
+int __wrap_mkdir(const char* path, mode_t mode) {
     if (CallLog::current == nullptr) {
         return __real_mkdir(path, mode);
     }
