@@ -34,6 +34,14 @@ thread_local State state = {};
     return block;
 }
 
+[[maybe_unused]] void* allocateOrNull(std::size_t size) noexcept {
+    try {
+        return allocate(size);
+    } catch (const std::bad_alloc&) {
+        return nullptr;
+    }
+}
+
 [[maybe_unused]] void release(void* block) {
     if (state.counting && block != nullptr) {
         --state.live;
@@ -50,6 +58,12 @@ void* operator new(std::size_t size) {
 void* operator new[](std::size_t size) {
     return allocate(size);
 }
+void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
+    return allocateOrNull(size);
+}
+void* operator new[](std::size_t size, const std::nothrow_t&) noexcept {
+    return allocateOrNull(size);
+}
 void operator delete(void* block) noexcept {
     release(block);
 }
@@ -60,6 +74,12 @@ void operator delete(void* block, std::size_t) noexcept {
     release(block);
 }
 void operator delete[](void* block, std::size_t) noexcept {
+    release(block);
+}
+void operator delete(void* block, const std::nothrow_t&) noexcept {
+    release(block);
+}
+void operator delete[](void* block, const std::nothrow_t&) noexcept {
     release(block);
 }
 bool AllocationProbe::available() {

@@ -75,7 +75,7 @@ int __real_mkdir(const char* path, mode_t mode);
 // The runtimes of clang's sanitizers make the folder of their reports with this, before they can
 // watch any code.
 #ifdef __clang__
-__attribute__((disable_sanitizer_instrumentation))
+__attribute__((no_sanitize("address", "undefined"), disable_sanitizer_instrumentation))
 #endif
 int __wrap_mkdir(const char* path, mode_t mode) {
     if (CallLog::current == nullptr) {
