@@ -6,7 +6,10 @@
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
+#include <functional>
+#include <span>
 #include <string>
+#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -182,7 +185,7 @@ public:
             for (int i = 0; i < size; ++i) {
                 drawPattern(batch[i]);
             }
-            add(batch, size);
+            add({batch, static_cast<std::size_t>(size)});
             count -= size;
         }
     }
@@ -221,34 +224,34 @@ private:
             order.push_back({pattern.ordered(0), pattern.ordered(sizeof(Key::first)),
                              static_cast<std::uint32_t>(order.size())});
         }
-        std::sort(order.begin(), order.end(), [this](const Key& left, const Key& right) {
-            if (left.first != right.first) {
-                return left.first < right.first;
-            }
-            if (left.second != right.second) {
-                return left.second < right.second;
-            }
-            return _patterns[left.place] < _patterns[right.place];
+        std::ranges::sort(order, std::less<>(), [this](const Key& key) {
+            return std::tie(key.first, key.second, _patterns[key.place]);
         });
         return order;
     }
 
-    void add(const Draft* batch, int size) {
+    void add(std::span<const Draft> batch) {
         std::uint64_t hashes[BATCH_SIZE];
-        for (int i = 0; i < size; ++i) {
-            hashes[i] = batch[i].pattern().hash();
-            __builtin_prefetch(&_table[hashes[i] & (_table.size() - 1)]);
+        std::ranges::transform(batch, hashes, [this](const Draft& draft) {
+            const std::uint64_t hash = draft.pattern().hash();
+            __builtin_prefetch(&_table[hash & (_table.size() - 1)]);
+            return hash;
+        });
+        for (std::size_t i = 0; i < batch.size(); ++i) {
+            addOne(hashes[i], batch[i].pattern());
         }
-        for (int i = 0; i < size; ++i) {
-            const Pattern pattern = batch[i].pattern();
-            if (Slot& slot = find(hashes[i], pattern); slot.place == 0) {
-                _patterns.push_back(pattern);
-                slot = {static_cast<std::uint32_t>(hashes[i] >> 32),
-                        static_cast<std::uint32_t>(_patterns.size())};
-                if (_patterns.size() > _table.size() / 2) {
-                    grow();
-                }
-            }
+    }
+
+    void addOne(std::uint64_t hash, const Pattern& pattern) {
+        Slot& slot = find(hash, pattern);
+        if (slot.place != 0) {
+            return;
+        }
+        _patterns.push_back(pattern);
+        slot = {static_cast<std::uint32_t>(hash >> 32),
+                static_cast<std::uint32_t>(_patterns.size())};
+        if (_patterns.size() > _table.size() / 2) {
+            grow();
         }
     }
 
