@@ -46,17 +46,6 @@ private:
     const bool _locked;
 };
 
-// Makes a call again for as long as a signal interrupts it.
-// Returns: whether it succeeded in the end.
-template <typename Call>
-bool uninterrupted(Call call) {
-    bool done = call();
-    while (!done && errno == EINTR) {
-        done = call();
-    }
-    return done;
-}
-
 const std::uint64_t IDENTITY_CHECK_SECONDS = 5;
 const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 

@@ -61,6 +61,15 @@ bool takeEquals(std::string_view& text) {
     return true;
 }
 
+// Tells whether a signal ended the last read, and lets reading go on then.
+bool wasInterrupted(std::FILE* file) {
+    if (std::ferror(file) == 0 || errno != EINTR) {
+        return false;
+    }
+    std::clearerr(file);
+    return true;
+}
+
 struct FileCloser {
     void operator()(std::FILE* file) const { std::fclose(file); }
 };
@@ -195,15 +204,20 @@ bool read_line(std::string& result, std::FILE* ifile) {
     for (;;) {
         // fgets does not tell how much it has read, and the text may hold NUL bytes. Filled with
         // line feeds beforehand, the buffer shows it: a line feed that was read is followed by the
-        // NUL that ends the text; the first one of the filling stands behind that NUL.
+        // NUL that ends the text; the first one of the filling stands behind that NUL, or behind
+        // what came before a signal.
         std::memset(buf, '\n', sizeof(buf));
         const char* const p = std::fgets(buf, sizeof(buf), ifile);
-        if (p == nullptr) {
-            return !result.empty();
-        }
-        QUELTA_ASSERT(p == buf);
         const std::string_view filled(buf, sizeof(buf));
         const std::size_t feed = filled.find('\n');
+        if (p == nullptr) {
+            if (!wasInterrupted(ifile)) {
+                return !result.empty();
+            }
+            result.append(filled.substr(0, feed));
+            continue;
+        }
+        QUELTA_ASSERT(p == buf);
         if (feed == std::string_view::npos) {
             result.append(buf, sizeof(buf) - 1);
         } else if (filled.substr(feed).starts_with(FEED_READ)) {
@@ -232,8 +246,12 @@ bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, s
 bool Logger::initialize(const Pathname& cfgFile, const Pathname& queltaHome) {
     QUELTA_ASSERT(!logger_initialized);
     epoch_timeval();
-    std::unique_ptr<std::FILE, FileCloser> file(cfgFile.fopen("r"));
-    if (file == nullptr) {
+    std::unique_ptr<std::FILE, FileCloser> file;
+    const bool opened = uninterrupted([&] {
+        file.reset(cfgFile.fopen("r"));
+        return file != nullptr;
+    });
+    if (!opened) {
         const int errnum = errno;
         initialize();
         errno = errnum;

@@ -5,6 +5,7 @@
 // else includes it.
 // Configured before other threads start; safe from any thread afterwards.
 
+#include <cerrno>
 #include <string>
 
 #include "util/LogLevel.h"
@@ -26,6 +27,18 @@ union Everlasting {
     Everlasting(const Everlasting&) = delete;
     Everlasting& operator=(const Everlasting&) = delete;
 };
+
+// Makes a call again for as long as a signal interrupts it; `call` tells whether it succeeded, and
+// leaves errno when it did not.
+// Returns: whether it succeeded in the end.
+template <typename Call>
+bool uninterrupted(Call call) {
+    bool done = call();
+    while (!done && errno == EINTR) {
+        done = call();
+    }
+    return done;
+}
 
 // False until Logger::initialize().
 extern bool logger_initialized;

@@ -13,6 +13,7 @@
 #include <thread>
 
 #include "support/FileAppender.h"
+#include "support/InChild.h"
 #include "support/NumberedLines.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
@@ -49,6 +50,13 @@ private:
     }
 };
 
+// Signals are for the other thread.
+void blockSignals() {
+    sigset_t all;
+    sigfillset(&all);
+    ::pthread_sigmask(SIG_BLOCK, &all, nullptr);
+}
+
 }  // namespace
 
 TEST(LogSignal, NoLineIsLostThroughRotation) {
@@ -74,10 +82,7 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
     std::string got;
     std::thread reader([&] {
-        // Signals are for the writer.
-        sigset_t all;
-        sigfillset(&all);
-        ::pthread_sigmask(SIG_BLOCK, &all, nullptr);
+        blockSignals();
         std::ifstream in(dir.file("pipe"), std::ios::binary);
         char buf[3000];
         while (in.read(buf, sizeof buf) || in.gcount() > 0) {
@@ -112,9 +117,7 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
     std::string got;
     std::thread reader([&] {
-        sigset_t all;
-        sigfillset(&all);
-        ::pthread_sigmask(SIG_BLOCK, &all, nullptr);
+        blockSignals();
         while (signals < 100) {
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
@@ -133,4 +136,43 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     reader.join();
     EXPECT_EQ("first\nsecond\n", got);
     EXPECT_EQ("", err.text());
+}
+
+// The configuration comes through a pipe, late and in pieces, while signals interrupt the reader.
+TEST(LogSignal, AConfigurationThatComesSlowlyIsReadWhole) {
+    const unsigned LINES = 200;
+    const TempDir dir;
+    ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
+    // Some names are longer than what is read at once.
+    const auto nameOf = [](unsigned i) {
+        return std::string(i % 10 * 20, 'n') + std::to_string(i);
+    };
+    std::string config;
+    for (unsigned i = 0; i < LINES; ++i) {
+        config += "category." + nameOf(i) + "=ERROR\n";
+    }
+    const ChildRun run = inChild([&] {
+        signals = 0;
+        const SignalStorm storm;
+        std::thread writer([&] {
+            blockSignals();
+            while (signals < 100) {
+                std::this_thread::sleep_for(std::chrono::milliseconds(1));
+            }
+            std::ofstream out(dir.file("pipe"), std::ios::binary);
+            for (std::size_t at = 0; at < config.size(); at += 97) {
+                out << config.substr(at, 97) << std::flush;
+                std::this_thread::sleep_for(std::chrono::microseconds(200));
+            }
+        });
+        EXPECT_TRUE(Logger::initialize(Pathname(dir.file("pipe")), Pathname()));
+        // Lets a writer go who found no reader.
+        ::close(::open(dir.file("pipe").c_str(), O_RDONLY | O_NONBLOCK));
+        writer.join();
+        for (unsigned i = 0; i < LINES; ++i) {
+            EXPECT_EQ(ERROR, LogChannel::find(nameOf(i), false)->minlevel) << i;
+        }
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
 }
