@@ -59,11 +59,9 @@ void makeRoomToKeep(std::size_t count) {
     keptMemory().reserve(keptMemory().size() + count);
 }
 
-// Requires: there is room.
+// Requires: there is room. Null needs no keeping and does no harm.
 void keepReachable(const void* memory) {
-    if (memory != nullptr) {
-        keptMemory().push_back(memory);
-    }
+    keptMemory().push_back(memory);
 }
 
 void set_path_from_envvar(Pathname& path, const char* name) {

@@ -16,7 +16,7 @@ class Pathname;
 // a character like any other.
 // Requires: `ifile` open for reading.
 // Returns: true for a line, also for a last one without a line feed; false at the end of the file
-// and after a read error, with `result` empty.
+// and after a read error, with `result` empty. A signal is no error.
 // Cost: no more memory than the line takes.
 bool read_line(std::string& result, std::FILE* ifile);
 

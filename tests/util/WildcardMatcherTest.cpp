@@ -10,6 +10,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "support/AllocationProbe.h"
 #include "support/FieldOrder.h"
 
 namespace {
@@ -259,6 +260,19 @@ TEST(WildcardMatcherTest, MovesLeaveTheEmptyPatternBehind) {
     original = taken;
     EXPECT_TRUE(original.isMatch("axb"));
     EXPECT_FALSE(original.isMatch("axc"));
+}
+
+TEST(WildcardMatcherTest, AllocatesItsTwoCopiesAndNothingToMatch) {
+    REQUIRE_ALLOCATION_PROBE();
+    AllocationProbe allocations;
+    {
+        const WildcardMatcher matcher("some*thing*else");
+        EXPECT_EQ(2U, allocations.count());
+        EXPECT_TRUE(matcher.isMatch("something else"));
+        EXPECT_FALSE(matcher.isMatch("nothing else"));
+        EXPECT_EQ(2U, allocations.count());
+    }
+    EXPECT_EQ(0, allocations.live());
 }
 
 TEST(WildcardMatcherTest, TakesANullPatternForTheEmptyOne) {
