@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <exception>
 #include <memory>
 #include <new>
 
@@ -189,10 +190,11 @@ void getPunct(const std::string& text, std::string& out, unsigned max_len) {
         initMap(BREAKER_MAP, ELLIPSE_BREAKERS);
         initd = true;
     }
-    // An item takes two characters at most. A limit far beyond the text must not cost memory.
-    constexpr std::size_t PLENTY = 4096;
-    const std::size_t likely = 2 * std::size_t{max_len} + 1;
-    out.reserve(out.size() + std::min(likely, std::max(2 * text.size() + 1, PLENTY)));
+    try {
+        out.reserve(out.size() + 2 * std::size_t{max_len} + 1);  // an item takes two at most
+    } catch (const std::exception&) {
+        // A limit far beyond the text needs no such room.
+    }
 
     unsigned items = 0;
     for (const char* p = text.c_str(); *p != '\0' && *p != '\n' && items < max_len; ++p) {

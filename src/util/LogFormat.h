@@ -64,8 +64,8 @@ public:
 
         Kind what = MSG;
         union {
-            const char* str = nullptr;      // STR: into LogFormat::_fmt, or a constant
-            const LogFormattedDate* fdate;  // TIME_FMT: owned by the LogFormat
+            const char* str = nullptr;  // STR: into LogFormat::_fmt, or a constant
+            LogFormattedDate* fdate;    // TIME_FMT: owned by the LogFormat
         } arg;
         std::size_t slen = 0;             // length of arg.str
         std::uint32_t minw = 0;           // shorter texts are padded to this width

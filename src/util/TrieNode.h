@@ -111,10 +111,13 @@ private:
 
     template <typename Data>
     void append(Data&& data) {
-        if (_dataList.size() == _dataList.capacity() && _dataList.size() >= LARGE) {
-            makeRoom();
+        if (_dataList.size() < _dataList.capacity() || _dataList.size() < LARGE) {
+            _dataList.push_back(std::forward<Data>(data));
+            return;
         }
-        _dataList.push_back(std::forward<Data>(data));
+        T value(std::forward<Data>(data));  // may be one of the values that are about to move
+        makeRoom();
+        _dataList.push_back(std::move(value));
     }
 
     // Values may be large, and moving them would touch their memory once more at each doubling.

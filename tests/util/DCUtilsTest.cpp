@@ -16,6 +16,7 @@
 #include <utility>
 
 #include "support/AllStrings.h"
+#include "support/AllocationProbe.h"
 
 namespace {
 
@@ -353,17 +354,22 @@ TEST(DCUtilsTest, AppendsTheOutline) {
 }
 
 TEST(DCUtilsTest, ReservesRoomForTheWholeOutline) {
-    std::string out = "before";
-    getPunct("", out, 100);
-    EXPECT_LE(6u + 2 * 100 + 1, out.capacity());
+    for (const unsigned limit : {100U, 5000U}) {
+        std::string out = "before";
+        getPunct("", out, limit);
+        EXPECT_LE(6 + 2 * limit + 1, out.capacity());
+    }
 }
 
-TEST(DCUtilsTest, AHugeOutlineLimitCostsNoMemory) {
-    for (const char* const text : {"", "a,b"}) {
-        std::string out;
-        getPunct(text, out, UINT_MAX);
-        EXPECT_GT(1u << 20, out.capacity()) << text;
+TEST(DCUtilsTest, AnOutlineDoesWithoutTheRoomThatIsNotToBeHad) {
+    REQUIRE_ALLOCATION_PROBE();
+    std::string out = "before";
+    {
+        const AllocationProbe allocations(1);
+        getPunct("a;b", out, 5000);
+        EXPECT_EQ(1U, allocations.count());
     }
+    EXPECT_EQ("before;", out);
 }
 
 TEST(DCUtilsTest, NamesTruthValues) {

@@ -101,7 +101,7 @@ TEST(LogFormatCompile, FieldsStandInTheirOrder) {
 TEST(LogFormatCompile, FieldsHaveTheirTypes) {
     Atom atom;
     EXPECT_TRUE((std::is_same_v<const char*, decltype(atom.arg.str)>));
-    EXPECT_TRUE((std::is_same_v<const LogFormattedDate*, decltype(atom.arg.fdate)>));
+    EXPECT_TRUE((std::is_same_v<LogFormattedDate*, decltype(atom.arg.fdate)>));
     EXPECT_TRUE((std::is_same_v<std::size_t, decltype(atom.slen)>));
     EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(atom.minw)>));
     EXPECT_TRUE((std::is_same_v<std::uint32_t, decltype(atom.maxw)>));

@@ -237,6 +237,19 @@ TEST(TrieNodeTest, LongListsKeepTheirOrder) {
     }
 }
 
+TEST(TrieNodeTest, StoresACopyOfAValueOfItsOwn) {
+    const std::string value = "longer than a string holds in itself";
+    Trie trie;
+    trie.addData("k", value);
+    std::vector<std::string*> results;
+    // Far enough for the list to move several times.
+    for (int i = 0; i < 5000; ++i) {
+        trie.findData("k", results);
+        trie.addData("k", *results.front());
+    }
+    EXPECT_EQ(std::vector<std::string>(5001, value), find(trie, "k"));
+}
+
 TEST(TrieNodeTest, ListsTakeRoomOnlyWhenTheyAreFull) {
     Trie trie;
     for (int i = 0; i < 10000; ++i) {
