@@ -29,7 +29,8 @@ ROOT = HERE.parent.parent
 GRACE_SECONDS = 3
 UNBROKEN_SECONDS = 600
 
-# What is replaced by what, where the pattern stands outside of comments, texts and directives.
+# What is replaced by what, where the pattern stands outside of comments, texts, attributes and
+# directives.
 MUTATIONS = [
     (r' == ', ' != '), (r' != ', ' == '),
     (r' < ', ' <= '), (r' <= ', ' < '), (r' > ', ' >= '), (r' >= ', ' > '),
@@ -41,7 +42,7 @@ MUTATIONS = [
     (r'(?<![\w.\'"])(\d+)(?![\w.\'])', lambda m: str(int(m.group(1)) + 1)),
     (r'^(\s+)(break|continue);', r'\1;'),
 ]
-HIDDEN = re.compile(r'//.*|"(?:[^"\\]|\\.)*"|\'(?:[^\'\\]|\\.)*\'')
+HIDDEN = re.compile(r'//.*|"(?:[^"\\]|\\.)*"|\'(?:[^\'\\]|\\.)*\'|__attribute__\(\(.*\)\)')
 SKIPPED = re.compile(r'^\s*(#|//|QUELTA_ASSERT|static_assert|template|using|namespace|case .*:$)')
 
 

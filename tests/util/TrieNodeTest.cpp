@@ -250,14 +250,17 @@ TEST(TrieNodeTest, StoresACopyOfAValueOfItsOwn) {
     EXPECT_EQ(std::vector<std::string>(5001, value), find(trie, "k"));
 }
 
-TEST(TrieNodeTest, ListsTakeRoomOnlyWhenTheyAreFull) {
+TEST(TrieNodeTest, ListsTakeRoomOnlyWhenTheyAreFullAndLongOnesInLeaps) {
     Trie trie;
+    int moves = 0;
     for (int i = 0; i < 10000; ++i) {
         const std::size_t capacity = trie._dataList.capacity();
         const bool full = trie._dataList.size() == capacity;
         trie.addData("", "value");
         ASSERT_EQ(full, trie._dataList.capacity() != capacity) << i;
+        moves += full ? 1 : 0;
     }
+    EXPECT_GT(12, moves);  // doubling all the way would take 15
 }
 
 TEST(TrieNodeTest, KeysOfAHundredThousandBytesNeedNoStack) {
