@@ -72,19 +72,14 @@ Pathname Pathname::toParent() const {
 }
 
 Pathname Pathname::toLeaf() const {
-    const char* const begin = data();
-    const char* p = begin + size();
-    while (p > begin && p[-1] == sep) {
-        --p;
-    }
-    if (p == begin) {
+    const size_type last = find_last_not_of(sep);
+    if (last == npos) {
         // Not a copy of `root`, which other units' static objects may find not yet built.
         return Pathname(&sep, 1);
     }
-    const char* x = p;
-    while (x > begin && x[-1] != sep) {
-        --x;
-    }
+    const size_type slash = rfind(sep, last);
+    const char* const x = data() + (slash == npos ? 0 : slash + 1);
+    const char* const p = data() + last + 1;
     QUELTA_ASSERT(x < p);
     return Pathname(x, static_cast<unsigned long>(p - x));
 }

@@ -9,8 +9,10 @@
 //
 // Not thread-safe; one thread at a time per object.
 
+#include <algorithm>
 #include <cstddef>
 #include <exception>
+#include <iterator>
 #include <string>
 #include <utility>
 #include <vector>
@@ -89,11 +91,9 @@ private:
     static int index(char c) { return static_cast<unsigned char>(c); }
 
     int firstUsedSlot() const {
-        int i = 0;
-        while (i < ALPHABET_SIZE && _children[i] == nullptr) {
-            ++i;
-        }
-        return i;
+        const auto used = std::find_if(std::begin(_children), std::end(_children),
+                                       [](const TrieNode* child) { return child != nullptr; });
+        return static_cast<int>(used - std::begin(_children));
     }
 
     // Returns: the node that `key` leads to; nodes that are missing on the way are made.

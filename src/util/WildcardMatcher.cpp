@@ -65,7 +65,7 @@ const char* skipToSegment(const char* cursor, const char* segment) {
 // miss it.
 bool stepsReachEnd(const char* cursor, const char* end, const char* segment, std::size_t length) {
     const char* const place = end - length;
-    if (cursor >= place || std::memchr(segment + 1, segment[0], length - 1) == nullptr) {
+    if (cursor >= place || std::strchr(segment + 1, segment[0]) == nullptr) {
         return cursor <= place;
     }
     while (cursor < place) {

@@ -76,7 +76,8 @@ class Tree:
         subprocess.run(['rsync', '-a', '--checksum', '--no-times', '--delete', '--exclude=/build',
                         '--exclude=/.git', f'{ROOT}/', f'{self.root}/'], check=True)
         subprocess.run(['cmake', '-G', 'Ninja', '-S', self.root, '-B', self.build,
-                        '-DCMAKE_BUILD_TYPE=Debug', '-DCMAKE_CXX_FLAGS_DEBUG=-O0'],
+                        '-DCMAKE_BUILD_TYPE=Debug',
+                        '-DCMAKE_CXX_FLAGS_DEBUG=-O0 -D_GLIBCXX_ASSERTIONS'],
                        check=True, stdout=subprocess.DEVNULL)
 
     def make(self, target):
