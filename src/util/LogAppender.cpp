@@ -237,9 +237,7 @@ void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
         const ScopedLogLock lock(_mutex);
         writeLine(line, mdata.stamp.sec(), failure);
     }
-    if (failure.what != Problem::NONE) {
-        report(failure);
-    }
+    report(failure);
 }
 
 // Everything that `write` does under the lock.

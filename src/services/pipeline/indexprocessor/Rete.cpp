@@ -1,6 +1,7 @@
 #include "services/pipeline/indexprocessor/Rete.h"
 
 #include <algorithm>
+#include <compare>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -112,8 +113,8 @@ struct Pattern {
     }
 
     // The same order as that of the strings.
-    bool operator<(const Pattern& other) const {
-        return std::memcmp(characters, other.characters, SIZE) < 0;
+    std::strong_ordering operator<=>(const Pattern& other) const {
+        return std::memcmp(characters, other.characters, SIZE) <=> 0;
     }
 
     // Eight characters as a number that is ordered like them.
