@@ -1,31 +1,15 @@
 #include "util/WildcardMatcher.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
-#include <list>
-#include <memory>
-#include <mutex>
 #include <stdexcept>
+#include <utility>
 
 #include "util/Assert.h"
 #include "util/DCUtils.h"
 
 namespace {
-
-using CharArray = std::unique_ptr<char[]>;
-
-struct RetiredCopies {
-    char* needle;
-    char* buffer;
-};
-
-// Keeps the pattern copies that an assignment left behind reachable until the process ends.
-void retire(std::list<RetiredCopies>& copies) {
-    static std::mutex guard;
-    static auto& retired = *new std::list<RetiredCopies>;
-    const std::lock_guard<std::mutex> lock(guard);
-    retired.splice(retired.end(), copies);
-}
 
 int countSegments(const char* pattern) {
     int count = 0;
@@ -40,19 +24,15 @@ int countSegments(const char* pattern) {
     return count;
 }
 
-// Returns: the place behind `segment` at the beginning of `text`; null if it does not begin so.
+// Returns: the text after its prefix `segment`; null if it does not begin with it.
 const char* skipPrefix(const char* text, const char* segment) {
-    for (; *segment != '\0'; ++segment, ++text) {
-        if (*text != *segment) {
-            return nullptr;
-        }
-    }
-    return text;
+    const std::size_t length = std::strlen(segment);
+    return std::strncmp(text, segment, length) == 0 ? text + length : nullptr;
 }
 
-// Returns: the place behind the first occurrence of `segment` at or after `cursor`, or null.
+// Returns: the text after the first occurrence of `segment` at or after `cursor`, or null.
 const char* skipToSegment(const char* cursor, const char* segment) {
-    if (segment[1] == '\0') {
+    if (segment[1] == '\0') {  // strchr is several times faster than strstr
         const char* const found = std::strchr(cursor, segment[0]);
         return found == nullptr ? nullptr : found + 1;
     }
@@ -60,23 +40,16 @@ const char* skipToSegment(const char* cursor, const char* segment) {
     return found == nullptr ? nullptr : found + std::strlen(segment);
 }
 
-// Seeks `segment` from `cursor` on in steps that do not overlap, until one ends at `end`; that one
-// stands at the end of the text is known. Only where the segment may overlap itself can the steps
-// miss it.
+// Searches `segment` from `cursor` on, in steps that do not overlap, until one ends at `end`. The
+// text is known to end with the segment, so only a segment that may overlap itself needs the steps.
 bool stepsReachEnd(const char* cursor, const char* end, const char* segment, std::size_t length) {
-    const char* const place = end - length;
-    if (cursor >= place || std::strchr(segment + 1, segment[0]) == nullptr) {
-        return cursor <= place;
+    if (std::strchr(segment + 1, segment[0]) == nullptr) {
+        return cursor <= end - length;
     }
-    while (cursor < place) {
-        const bool here = std::memcmp(cursor, segment, length) == 0;
-        const char* const found = here ? cursor : std::strstr(cursor, segment);
-        if (found == place) {
-            return true;
-        }
-        cursor = found + length;
-    }
-    return cursor == place;
+    do {
+        cursor = skipToSegment(cursor, segment);
+    } while (cursor != nullptr && cursor != end);
+    return cursor != nullptr;
 }
 
 const char* printable(const char* segment) {
@@ -85,35 +58,22 @@ const char* printable(const char* segment) {
 
 }  // namespace
 
-WildcardMatcher::WildcardMatcher(const char* pattern)
-    : _needle(nullptr),
-      _buffer(nullptr),
-      _hardEnd(false),
-      _hardStart(false),
-      _subStringCount(0),
-      _isWord(0) {
+// Delegates, so that the destructor frees the first copy if the second cannot be allocated.
+WildcardMatcher::WildcardMatcher(const char* pattern) : WildcardMatcher() {
     init(pattern);
 }
 
 WildcardMatcher::WildcardMatcher(const WildcardMatcher& other) : WildcardMatcher(other._needle) {}
 
 WildcardMatcher::WildcardMatcher(WildcardMatcher&& other) noexcept
-    : _needle(other._needle),
-      _buffer(other._buffer),
-      _hardEnd(other._hardEnd),
-      _hardStart(other._hardStart),
-      _subStringCount(other._subStringCount),
-      _isWord(other._isWord) {
-    const std::size_t used = static_cast<std::size_t>(_subStringCount) * sizeof(char*);
-    std::memcpy(_subStrings, other._subStrings, used);
-    std::memset(_subStrings + _subStringCount, 0, sizeof(_subStrings) - used);
-    other._needle = nullptr;
-    other._buffer = nullptr;
-    other._hardEnd = false;
-    other._hardStart = false;
-    std::memset(other._subStrings, 0, used);
-    other._subStringCount = 0;
-    other._isWord = 0;
+    : _needle(std::exchange(other._needle, nullptr)),
+      _buffer(std::exchange(other._buffer, nullptr)),
+      _hardEnd(std::exchange(other._hardEnd, false)),
+      _hardStart(std::exchange(other._hardStart, false)),
+      _subStringCount(std::exchange(other._subStringCount, 0)),
+      _isWord(std::exchange(other._isWord, 0)) {
+    std::copy(std::begin(other._subStrings), std::end(other._subStrings), _subStrings);
+    other._subStrings[0] = nullptr;
 }
 
 WildcardMatcher& WildcardMatcher::operator=(const WildcardMatcher& other) {
@@ -128,20 +88,14 @@ WildcardMatcher::~WildcardMatcher() {
     delete[] _needle;
 }
 
-// Everything that can fail comes first, so that a refusal leaves the object as it was.
+// Deliberate: the copies that an earlier pattern left are not freed.
 void WildcardMatcher::init(const char* pattern) {
     if (pattern != nullptr && _subStringCount + countSegments(pattern) > MAX_SUBSTRINGS) {
         throw std::length_error("WildcardMatcher: too many literal segments in a pattern");
     }
-    CharArray needle(copystr(pattern));
-    CharArray buffer(copystr(pattern));
-    if (_needle != nullptr) {
-        std::list<RetiredCopies> copies{{_needle, _buffer}};
-        retire(copies);
-    }
-    _needle = needle.release();
-    _buffer = buffer.release();
-    std::memset(_subStrings, 0, sizeof(_subStrings));
+    _needle = copystr(pattern);
+    _buffer = copystr(pattern);
+    std::fill(std::begin(_subStrings), std::end(_subStrings), nullptr);
     if (pattern != nullptr && *pattern != '\0') {
         compile();
     }
@@ -170,69 +124,68 @@ void WildcardMatcher::compile() {
 
 bool WildcardMatcher::isMatch(const char* haystack) const {
     QUELTA_ASSERT(haystack != nullptr);
-    return isMatch(haystack, _hardEnd ? std::strlen(haystack) : 0);
+    return matches(haystack, _hardEnd ? haystack + std::strlen(haystack) : nullptr);
 }
 
-// Of the object itself this reads only the front: flags and segments up to the null behind the
-// last. An empty first entry means no segments at all, or an object that was assigned to.
 bool WildcardMatcher::isMatch(const char* haystack, std::size_t length) const {
-    const char* const* segment = _subStrings;
-    if (*segment == nullptr) {
-        return _subStringCount == 0;
+    return matches(haystack, haystack + length);
+}
+
+// An object that had segments when it was assigned to has null entries, which never match.
+bool WildcardMatcher::matches(const char* text, const char* end) const {
+    if (_subStringCount > 0 && _subStrings[0] == nullptr) {
+        return false;
     }
-    const char* const* const tableEnd = _subStrings + MAX_SUBSTRINGS;
-    const char* const* behind = segment + 1;
-    while (behind != tableEnd && *behind != nullptr) {
-        ++behind;
-    }
-    // What the text must end with is looked at first, as it refuses most texts at once.
+    // Most texts are refused by their end, so that is compared first.
+    const int last = _hardEnd ? _subStringCount - 1 : _subStringCount;
     std::size_t lastLength = 0;
     if (_hardEnd) {
-        lastLength = std::strlen(*--behind);
-        if (length < lastLength ||
-            std::memcmp(haystack + length - lastLength, *behind, lastLength) != 0) {
+        lastLength = std::strlen(_subStrings[last]);
+        if (static_cast<std::size_t>(end - text) < lastLength ||
+            std::memcmp(end - lastLength, _subStrings[last], lastLength) != 0) {
             return false;
         }
     }
-    const char* cursor = haystack;
-    if (_hardStart) {
-        if (segment == behind) {
-            return length == lastLength;  // a single word
-        }
-        cursor = skipPrefix(cursor, *segment++);
+    if (_isWord != 0) {
+        return text + lastLength == end;
     }
-    for (; cursor != nullptr && segment != behind; ++segment) {
-        cursor = skipToSegment(cursor, *segment);
+    const char* cursor = text;
+    int i = 0;
+    if (_hardStart) {
+        cursor = skipPrefix(cursor, _subStrings[i++]);
+    }
+    for (; cursor != nullptr && i < last; ++i) {
+        cursor = skipToSegment(cursor, _subStrings[i]);
     }
     if (cursor == nullptr || !_hardEnd) {
         return cursor != nullptr;
     }
-    return stepsReachEnd(cursor, haystack + length, *behind, lastLength);
+    return stepsReachEnd(cursor, end, _subStrings[last], lastLength);
 }
 
 bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& substrs) {
     QUELTA_ASSERT(haystack != nullptr);
     substrs.clear();
     if (_isWord != 0) {
-        return _subStrings[0] != nullptr && std::strcmp(haystack, _subStrings[0]) == 0;
+        return isMatch(haystack);
     }
     const char* cursor = haystack;
     int i = 0;
     bool matched = true;
     if (_hardStart) {
         const char* const start = _subStrings[i++];
-        const char* const behind = start == nullptr ? nullptr : skipPrefix(cursor, start);
-        matched = behind != nullptr;
-        cursor = matched ? behind : cursor;
+        const char* const rest = start == nullptr ? nullptr : skipPrefix(cursor, start);
+        matched = rest != nullptr;
+        cursor = matched ? rest : cursor;
     }
-    // Puts the text in front of the next occurrence on record and moves behind it.
+    // Appends the text before the next occurrence of `segment` and moves past the occurrence.
     const auto advance = [&](const char* segment) {
-        const char* const found = segment == nullptr ? nullptr : std::strstr(cursor, segment);
-        if (found == nullptr) {
+        const char* const rest = segment == nullptr ? nullptr : skipToSegment(cursor, segment);
+        if (rest == nullptr) {
             return false;
         }
-        substrs.emplace_back(cursor, found);
-        cursor = found + std::strlen(segment);
+        substrs.emplace_back(cursor, rest - std::strlen(segment));
+        cursor = rest;
         return true;
     };
     const int limit = _subStringCount - (_hardEnd ? 1 : 0);
@@ -244,7 +197,7 @@ bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& su
         return matched;
     }
     do {
-        matched = matched && advance(_subStrings[_subStringCount - 1]);
+        matched = matched && advance(_subStrings[limit]);
     } while (matched && *cursor != '\0');
     return matched;
 }

@@ -44,7 +44,7 @@ public:
     // Errors: std::bad_alloc.
     WildcardMatcher(const WildcardMatcher& other);
 
-    // Takes over the other's compiled form and leaves it as the empty pattern without a text.
+    // Takes the other's compiled form; the other becomes a matcher without pattern or segments.
     WildcardMatcher(WildcardMatcher&& other) noexcept;
 
     // Compiles the other's pattern text on top of what this object holds.
@@ -67,13 +67,14 @@ public:
     // The same for a text whose length in bytes, up to its NUL, is known.
     bool isMatch(const char* haystack, std::size_t length) const;
 
-    // Fetches what isMatch reads, for a caller who is going to ask many matchers in a row: first
-    // the object, and some matchers later the segments that it points at.
+    // Fetch into the cache what isMatch reads, for callers that try many matchers in a row:
+    // prefetch() the object, and some matchers later prefetchSegment() its first segment.
     void prefetch() const {
         __builtin_prefetch(this);
         __builtin_prefetch(&_subStrings[4]);
+        __builtin_prefetch(&_subStringCount);
     }
-    void prefetchSegments() const { __builtin_prefetch(_subStrings[0]); }
+    void prefetchSegment() const { __builtin_prefetch(_subStrings[0]); }
 
     // The same test. `substrs` is replaced by the texts that the stars covered, in pattern order;
     // after a failure it holds what was covered up to there.
@@ -91,20 +92,23 @@ public:
     const char* getOrigPattern() const { return _needle; }
 
 private:
+    WildcardMatcher() = default;
+
     void init(const char* pattern);
     void compile();
+    bool matches(const char* text, const char* end) const;
     MatchType getMatcherType() const;
     char* getHardStart() const;
     char* getHardEnd() const;
     char* getWord() const;
 
-    char* _needle;                      // the pattern as given, an array of its own
-    char* _buffer;                      // a second copy, every star overwritten by NUL
-    bool _hardEnd;                      // the last segment must end the text
-    bool _hardStart;                    // the first segment must begin the text
-    char* _subStrings[MAX_SUBSTRINGS];  // the segments, inside _buffer; null behind the last
-    int _subStringCount;                // entries in use, empty ones in front included
-    int _isWord;                        // 1 when the pattern has no star, else 0
+    char* _needle = nullptr;            // the pattern as given, an array of its own
+    char* _buffer = nullptr;            // a second copy, every star overwritten by NUL
+    bool _hardEnd = false;              // the last segment must end the text
+    bool _hardStart = false;            // the first segment must begin the text
+    char* _subStrings[MAX_SUBSTRINGS];  // the segments, inside _buffer; null after the last
+    int _subStringCount = 0;            // entries in use, empty ones at the front included
+    int _isWord = 0;                    // 1 when the pattern has no star, else 0
 };
 
 #endif  // QUELTA_UTIL_WILDCARDMATCHER_H_

@@ -7,15 +7,14 @@
 // Whoever changes a count calls update afterwards; Rete.h does both for conditions.
 //
 // Invariant: 0 <= _matchCount <= _needMatch, unless reset or a caller's own class says otherwise.
-// Operators point at children without owning them, and must not form a cycle.
+// Operators point at children without owning them, and must not form a cycle. An update recurses
+// along the children: a chain of some 200,000 operators needs more than the usual 8 MiB of stack.
 //
 // Not thread-safe; one thread at a time per object.
 
 #include <cstdint>
 #include <set>
 #include <string>
-#include <utility>
-#include <vector>
 
 class BoolOperator;
 
@@ -113,10 +112,6 @@ protected:
     StringSet _implications;
     OpSet _children;    // not owned
     const char* _type;  // null, or the type tag
-
-private:
-    static void takeOut(const std::string& implication, StringSet& implications);
-    bool updateSelf(StringSet& returnImplications);
 };
 
 // Fires while all the matches that it needs are present; without needs, from its first update.
@@ -132,58 +127,25 @@ public:
     bool shouldFire() override { return _matchCount >= _needMatch; }
 };
 
-// Implications mostly leave in their order, which spares the search.
-inline void BoolOperator::takeOut(const std::string& implication, StringSet& implications) {
-    if (!implications.empty() && *implications.begin() == implication) {
-        implications.erase(implications.begin());
-    } else {
-        implications.erase(implication);
-    }
-}
-
-// The part of update that concerns this operator alone.
-inline bool BoolOperator::updateSelf(StringSet& returnImplications) {
+inline bool BoolOperator::update(StringSet& returnImplications) {
     const bool fires = shouldFire();
-    if (fires == _fired) {
-        return false;
-    }
+    const bool changed = fires != _fired;
     _fired = fires;
-    if (fires) {
-        for (const std::string& implication : _implications) {
-            returnImplications.insert(returnImplications.end(), implication);
-        }
+    if (changed && fires) {
+        returnImplications.insert(_implications.begin(), _implications.end());
         for (BoolOperator* const child : _children) {
             child->incCount();
         }
-    } else {
+    } else if (changed) {
         for (const std::string& implication : _implications) {
-            takeOut(implication, returnImplications);
+            returnImplications.erase(implication);
         }
         for (BoolOperator* const child : _children) {
             child->decCount();
         }
     }
-    return true;
-}
-
-// The way down is kept in a list, as networks are deeper than the stack.
-inline bool BoolOperator::update(StringSet& returnImplications) {
-    const bool changed = updateSelf(returnImplications);
-    if (_children.empty()) {
-        return changed;
-    }
-    using Position = OpSet::const_iterator;
-    std::vector<std::pair<Position, Position>> path{{_children.begin(), _children.end()}};
-    while (!path.empty()) {
-        auto& [next, end] = path.back();
-        BoolOperator& child = **next;
-        if (++next == end) {
-            path.pop_back();
-        }
-        child.updateSelf(returnImplications);
-        if (!child._children.empty()) {
-            path.emplace_back(child._children.begin(), child._children.end());
-        }
+    for (BoolOperator* const child : _children) {
+        child->update(returnImplications);
     }
     return changed;
 }

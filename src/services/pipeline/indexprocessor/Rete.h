@@ -18,7 +18,6 @@
 #include <cstddef>
 #include <cstring>
 #include <map>
-#include <memory>
 #include <optional>
 #include <string>
 #include <utility>
@@ -122,6 +121,11 @@ public:
     std::string toString();
 
 private:
+    // How many candidates ahead a lookup prefetches. The matchers of a large network lie far apart
+    // in memory.
+    static constexpr std::size_t MATCHER_AHEAD = 16;
+    static constexpr std::size_t SEGMENT_AHEAD = 8;
+
     bool changeCondition(bool newState, const std::string& term, Candidates& wildcardMatches,
                          StringSet& implications);
     void changeOneCondition(bool newState, Conditional& cond, StringSet& implications);
@@ -159,29 +163,24 @@ inline RuleSystem::RuleSystem(const RuleSystem& other) : _allOperators(other._al
     QUELTA_ASSERT(_allOperators.empty());
 }
 
-// A pattern that is refused must change nothing, so it is compiled first. The operator is recorded
-// as owned before anything points at it.
+// A pattern that is refused must change nothing, so it is compiled first.
 inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& op) {
     std::optional<WildcardMatcher> matcher;
     if (keyword.find('*') != std::string::npos) {
         matcher.emplace(keyword.c_str());
     }
     addOperator(op);
-    // Names often come in order; then the place is behind the last and needs no search.
-    const bool last = !_conditions.empty() && _conditions.rbegin()->first < keyword;
-    auto place = last ? _conditions.end() : _conditions.lower_bound(keyword);
-    if (place == _conditions.end() || place->first != keyword) {
-        auto fresh = std::make_unique<Conditional>(keyword);
-        fresh->addOperator(op);
-        place = _conditions.emplace_hint(place, keyword, fresh.get());
-        static_cast<void>(fresh.release());
-    } else {
-        place->second->addOperator(op);
+    auto place = _conditions.find(keyword);
+    if (place == _conditions.end()) {
+        // Names often arrive in order; the hint then saves a second search.
+        place = _conditions.emplace_hint(place, keyword, new Conditional(keyword));
     }
+    Conditional* const condition = place->second;
+    condition->addOperator(op);
     op.incNeedMatch();
     if (matcher) {
         const std::string prefix = matcher->getPatternPrefix();
-        _wildcardTrie.addData(prefix, std::make_pair(std::move(*matcher), place->second));
+        _wildcardTrie.addData(prefix, std::make_pair(std::move(*matcher), condition));
     }
 }
 
@@ -198,11 +197,10 @@ inline bool RuleSystem::changeCondition(bool newState, const std::string& term,
     _wildcardTrie.findData(text, wildcardMatches);
     const std::size_t length = std::strlen(text.c_str());
     const std::size_t last = wildcardMatches.size() - 1;
-    // The matchers lie far apart, so those of later candidates are fetched while this one is tried.
     for (std::size_t i = 0; i < wildcardMatches.size(); ++i) {
-        wildcardMatches[std::min(i + 16, last)]->first.prefetch();
-        wildcardMatches[std::min(i + 8, last)]->first.prefetchSegments();
-        auto& [matcher, condition] = *wildcardMatches[i];
+        wildcardMatches[std::min(i + MATCHER_AHEAD, last)]->first.prefetch();
+        wildcardMatches[std::min(i + SEGMENT_AHEAD, last)]->first.prefetchSegment();
+        const auto& [matcher, condition] = *wildcardMatches[i];
         if (matcher.isMatch(text.c_str(), length)) {
             changeOneCondition(newState, *condition, implications);
             met = true;

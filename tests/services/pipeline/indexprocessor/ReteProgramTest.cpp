@@ -17,13 +17,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "services/pipeline/indexprocessor/RandomPatterns.h"
 #include "services/pipeline/indexprocessor/Rete.h"
-#include "support/AllocationProbe.h"
 #include "support/MatcherOracle.h"
 #include "support/TempDir.h"
 
 extern const char* const WORDS[183];
-int randint(int min, int max);
 void printImplications(StringSet& implications);
 void generateRandomText(std::string& text, bool isQuery);
 void testWildCards(RuleSystem* rs, int testcount);
@@ -177,7 +176,7 @@ TEST_F(ReteProgramTest, RandintTakesTheRemainderOfTheDraw) {
 using ReteProgramDeathTest = ReteProgramTest;
 
 TEST_F(ReteProgramDeathTest, AnEmptyRangeIsAsserted) {
-    EXPECT_DEATH(randint(1, 0), "Rete.cpp:[0-9]+: failed assertion `range != 0'");
+    EXPECT_DEATH(randint(1, 0), "RandomPatterns.cpp:[0-9]+: failed assertion `range != 0'");
 }
 
 // Runs the program up to its first draw, where it ends with status 7.
@@ -355,28 +354,6 @@ TEST_F(ReteProgramTest, CutsPatternsAsTheDrawsSay) {
     EXPECT_THAT(names, ElementsAre("*z", "a*bc*fghijklmnopqrstuvwxyz"));
 }
 
-// Of the hashes of these two the upper halves and the ten lowest bits are the same, so that nothing
-// but their characters tells them apart.
-TEST_F(ReteProgramTest, PatternsWithTheSameSlotAndTagStayTwo) {
-    using Cuts = std::vector<std::pair<long, long>>;
-    for (const Cuts& cuts : {Cuts{{21, 22}, {7, 9}, {24, 24}, {4, 5}, {3, 6}, {18, 19}},
-                             Cuts{{18, 19}, {2, 5}, {21, 21}, {11, 14}, {11, 13}, {16, 17}}}) {
-        scripted.push_back(static_cast<long>(cuts.size()) - 1);
-        for (const auto& [start, end] : cuts) {
-            scripted.push_back(start);
-            scripted.push_back(end - start);
-        }
-    }
-    RuleSystem rs;
-    printed([&] { testWildCards(&rs, 2); });
-    EXPECT_TRUE(scripted.empty());
-    std::vector<std::string> names;
-    for (const auto& [name, condition] : rs._conditions) {
-        names.push_back(name);
-    }
-    EXPECT_THAT(names, ElementsAre("ab*fghijklm*r*tu*w*xyz", "abc*g*jklmnopqrstu*wxy*z"));
-}
-
 TEST_F(ReteProgramTest, DrawsAndPrintsExactlyAsAPlainGenerator) {
     for (const int testcount : {1, 2, 10, 100, 1000, 20000}) {
         std::vector<long> values;
@@ -395,34 +372,6 @@ TEST_F(ReteProgramTest, DrawsAndPrintsExactlyAsAPlainGenerator) {
             ++name;
         }
     }
-}
-
-// The allocations of a run that makes these draws `times` times over.
-std::size_t allocationsFor(const std::vector<long>& values, int testcount, int times) {
-    for (int i = 0; i < times; ++i) {
-        scripted.insert(scripted.end(), values.begin(), values.end());
-    }
-    RuleSystem rs;
-    std::size_t count = 0;
-    printed([&] {
-        AllocationProbe probe;
-        testWildCards(&rs, times * testcount);
-        count = probe.count();
-    });
-    return count;
-}
-
-TEST_F(ReteProgramTest, PatternsDrawnAgainTakeNoMemory) {
-    REQUIRE_ALLOCATION_PROBE();
-    constexpr int COUNT = 5000;
-    std::vector<long> values;
-    recorded = &values;
-    {
-        RuleSystem rs;
-        printed([&] { testWildCards(&rs, COUNT); });
-    }
-    recorded = nullptr;
-    EXPECT_EQ(allocationsFor(values, COUNT, 1), allocationsFor(values, COUNT, 10));
 }
 
 TEST_F(ReteProgramTest, EachPatternFeedsItsOwnOperatorThatImpliesIt) {

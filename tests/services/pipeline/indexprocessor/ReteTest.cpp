@@ -19,7 +19,6 @@
 #include <gtest/gtest.h>
 
 #include "support/FieldOrder.h"
-#include "support/SmallStack.h"
 
 namespace {
 
@@ -728,23 +727,6 @@ TEST_F(ReteTest, PatternsOfStarsAreStoredAndMatchEveryTerm) {
               rs._wildcardTrie._dataList.at(0).first.getMatcherType());
     EXPECT_TRUE(set("anything"));
     EXPECT_THAT(implied, ElementsAre("i"));
-}
-
-TEST_F(ReteTest, ChainsOfAHundredThousandOperatorsNeedNoStack) {
-    onSmallStack([this] {
-        constexpr int LENGTH = 100000;
-        AndOperator* last = &rule("a", "0");
-        for (int i = 1; i < LENGTH; ++i) {
-            last = &makeOperator(std::to_string(i), last);
-        }
-        set("a");
-        EXPECT_EQ(static_cast<std::size_t>(LENGTH), implied.size());
-        EXPECT_TRUE(last->hasFired());
-        reset("a");
-        EXPECT_THAT(implied, IsEmpty());
-        EXPECT_FALSE(last->hasFired());
-        rs.clearRules();
-    });
 }
 
 TEST_F(ReteTest, DescribesItself) {
