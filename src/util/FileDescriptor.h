@@ -34,12 +34,12 @@ public:
     // Returns: the bytes transferred. Fewer than `len` mean end of file, or an error after these
     // bytes; 0 means end of file or that nothing was written; -1 an error before the first byte.
     // Deliberate: an error that follows some bytes is not reported; the next call will meet it.
-    [[nodiscard]] ssize_t read(void* buf, unsigned long len) const noexcept;
-    [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const noexcept;
-    [[nodiscard]] ssize_t write(const std::string& text) const noexcept;
+    [[nodiscard]] ssize_t read(void* buf, unsigned long len) const;
+    [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const;
+    [[nodiscard]] ssize_t write(const std::string& text) const;
     // Writes `count` buffers with a single call.
     // Returns: the call's result: bytes written, perhaps fewer than given, or -1.
-    [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const noexcept;
+    [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const;
 
     // Writes a text in printf's notation. Write errors are not reported.
     // Errors: std::bad_alloc for a text beyond 255 bytes when memory is exhausted.
@@ -49,28 +49,28 @@ public:
 
     // Makes the descriptor close (or stay open) when the process executes another program; does
     // nothing when it cannot or when it is so already.
-    void setCloseOnExec(bool on) const noexcept;
+    void setCloseOnExec(bool on) const;
 
     // Replaces *result by what fstat tells.
-    [[nodiscard]] bool stat(struct stat* result) const noexcept;
+    [[nodiscard]] bool stat(struct stat* result) const;
     // Replaces *size by the file's size in bytes.
     // Errors: false, and *size as it was.
-    [[nodiscard]] bool getSize(long long* size) const noexcept;
+    [[nodiscard]] bool getSize(long long* size) const;
     // Moves to an offset in bytes from the start of the file.
-    bool seek_set(long long offset) const noexcept;
+    bool seek_set(long long offset) const;
     // Moves to the end of the file.
     // Returns: the offset of the end, in bytes, or -1.
-    long long seekEof() const noexcept;
+    long long seekEof() const;
     // Returns: the offset in bytes from the start of the file, or -1.
-    [[nodiscard]] long long curPos() const noexcept;
+    [[nodiscard]] long long curPos() const;
     // Waits until the file's data are on its device.
-    void sync() const noexcept;
+    void sync() const;
 
     // Copies from the current offset to the end of the file, and stops at the first failure; the
     // destination then stays as far as it got.
     // Errors: false with errno; ENOSPC when the destination takes no more.
     // Cost: 8192 bytes of stack, no heap.
-    bool copyTo(FileDescriptor dest) const noexcept;
+    bool copyTo(FileDescriptor dest) const;
     // The same into a file that is created with this one's permission bits, or emptied first; it
     // must not be the file that is read.
     bool copyTo(const Pathname& dest) const;
@@ -78,11 +78,11 @@ public:
     // Closes the descriptor; does nothing and returns true when there is none.
     // Returns: whether the call returned 0. The descriptor is -1 afterwards in any case, as it is
     // released even when the call was interrupted.
-    bool close() noexcept;
+    bool close();
 
 protected:
     // Closes the descriptor and leaves errno as it was.
-    void close_saveErrno() noexcept;
+    void close_saveErrno();
 
     int _osdep;  // the operating system's number; negative for no file
 };
@@ -95,32 +95,35 @@ protected:
 class ScopedFileDescriptor : public FileDescriptor {
 public:
     // No file.
-    ScopedFileDescriptor() noexcept : FileDescriptor(-1) {}
-    ScopedFileDescriptor(const ScopedFileDescriptor& other) noexcept = default;
-    // Takes over an open file.
-    ScopedFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
+    ScopedFileDescriptor() : FileDescriptor(-1) {}
+    ScopedFileDescriptor(const ScopedFileDescriptor& other) = default;
     // Opens the file for reading; not valid() when that fails.
-    explicit ScopedFileDescriptor(const Pathname& path);
+    ScopedFileDescriptor(const Pathname& path);
+    // Takes over an open file.
+    explicit ScopedFileDescriptor(const FileDescriptor& other) : FileDescriptor(other) {}
     ~ScopedFileDescriptor() { close_saveErrno(); }
 
-    ScopedFileDescriptor& operator=(const FileDescriptor& other) noexcept;
-    ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other) noexcept;
+    ScopedFileDescriptor& operator=(const FileDescriptor& other);
+    ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other);
+    // The temporary owner that a path converts to would close what is assigned.
+    ScopedFileDescriptor& operator=(const Pathname& path) = delete;
 };
 
 // The same, but opens its file without blocking, so that a FIFO or device does not hang the caller.
 class ScopedSaferFileDescriptor : public FileDescriptor {
 public:
     // No file.
-    ScopedSaferFileDescriptor() noexcept : FileDescriptor(-1) {}
-    ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) noexcept = default;
-    // Takes over an open file.
-    ScopedSaferFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
+    ScopedSaferFileDescriptor() : FileDescriptor(-1) {}
+    ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) = default;
     // Opens the file for reading; not valid() when that fails.
-    explicit ScopedSaferFileDescriptor(const Pathname& path);
+    ScopedSaferFileDescriptor(const Pathname& path);
+    // Takes over an open file.
+    explicit ScopedSaferFileDescriptor(const FileDescriptor& other) : FileDescriptor(other) {}
     ~ScopedSaferFileDescriptor() { close_saveErrno(); }
 
-    ScopedSaferFileDescriptor& operator=(const FileDescriptor& other) noexcept;
-    ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other) noexcept;
+    ScopedSaferFileDescriptor& operator=(const FileDescriptor& other);
+    ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other);
+    ScopedSaferFileDescriptor& operator=(const Pathname& path) = delete;
 };
 
 #endif  // QUELTA_UTIL_FILEDESCRIPTOR_H_

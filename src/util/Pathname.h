@@ -114,52 +114,52 @@ public:
     // --- One system call each --------------------------------------------------------------------
 
     // Replaces *result by what stat tells, links followed.
-    bool stat(struct stat* result) const noexcept;
+    bool stat(struct stat* result) const;
     // Returns: whether it exists and is a directory (a regular file).
-    [[nodiscard]] bool isDir() const noexcept;
-    [[nodiscard]] bool isReg() const noexcept;
+    [[nodiscard]] bool isDir() const;
+    [[nodiscard]] bool isReg() const;
     // Replaces *mtime by the time of the last change, in seconds since the epoch, and *size by the
     // size in bytes. Errors: false, and the argument as it was.
-    bool getMtime(long* mtime) const noexcept;
-    bool getSize(long long* size) const noexcept;
+    bool getMtime(long* mtime) const;
+    bool getSize(long long* size) const;
     // Returns: whether `access` grants existence, reading, writing, both, to the real user.
-    [[nodiscard]] bool exists() const noexcept;
-    [[nodiscard]] bool r_ok() const noexcept;
-    [[nodiscard]] bool w_ok() const noexcept;
-    [[nodiscard]] bool rw_ok() const noexcept;
+    [[nodiscard]] bool exists() const;
+    [[nodiscard]] bool r_ok() const;
+    [[nodiscard]] bool w_ok() const;
+    [[nodiscard]] bool rw_ok() const;
 
     // Returns: a new stream, or null. Owns: the caller closes it with std::fclose.
-    [[nodiscard]] std::FILE* fopen(const char* mode) const noexcept;
+    [[nodiscard]] std::FILE* fopen(const char* mode) const;
     // Requires: one of the four modes; asserted.
     bool mkdir(MkdirMode mode) const;
-    bool rmdir() const noexcept;
-    bool unlink() const noexcept;
-    bool remove() const noexcept;
+    bool rmdir() const;
+    bool unlink() const;
+    bool remove() const;
     // Cuts or extends the file to a length in bytes.
-    bool truncate(long long length) const noexcept;
+    bool truncate(long long length) const;
     // Fills `buf` with up to `size` bytes of the link's text, without a NUL.
     // Deliberate: true only when the call returned 0, as for all its siblings, hence false whenever
     // there was text; look at the buffer.
-    bool readlink(char* buf, unsigned long size) const noexcept;
+    bool readlink(char* buf, unsigned long size) const;
     // Creates `link`, whose text is this path.
-    bool symlinkTo(const Pathname& link) const noexcept;
-    bool renameTo(const Pathname& dest) const noexcept;
+    bool symlinkTo(const Pathname& link) const;
+    bool renameTo(const Pathname& dest) const;
 
     // Each opens the file with one call. Returns: the descriptor, -1 with errno on failure.
     // Owns: the caller closes it.
-    [[nodiscard]] FileDescriptor openReadOnly() const noexcept;
+    [[nodiscard]] FileDescriptor openReadOnly() const;
     // Does not block, neither now (on a FIFO or device) nor in later reads.
-    [[nodiscard]] FileDescriptor openReadOnlySafer() const noexcept;
+    [[nodiscard]] FileDescriptor openReadOnlySafer() const;
     // For writing; fails when the file exists.
-    [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const;
     // For writing; empties an existing file.
-    [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const;
     // The same with the permission bits of the file `model`; opens nothing when fstat refuses them.
-    [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const;
     // For writing; each write goes to the end.
-    [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const;
     // For reading and writing. Deliberate: empties an existing file, whatever the name suggests.
-    [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const;
 
     // Copies the contents and permission bits to another file, replacing it.
     // Errors: false, with errno of the step that failed; see FileDescriptor::copyTo.
