@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
-#include <exception>
 #include <memory>
 #include <new>
 
@@ -20,15 +19,7 @@ static_assert(sizeof ELLIPSE_BREAKERS - 1 == 28);
 char BREAKER_MAP[256];  // built by the first getPunct
 bool initd = false;     // whether it has been
 
-// copystr serves static objects of every unit, and so may run before this unit's logger is made and
-// after it is gone.
-constinit bool loggerExists = false;
-struct ModuleLogger {
-    Logger logger{"DCUtils"};
-    ModuleLogger() { loggerExists = true; }
-    ~ModuleLogger() { loggerExists = false; }
-};
-ModuleLogger moduleLogger;
+Logger logger("DCUtils");
 
 // The functions of <cctype> take a byte's unsigned value.
 bool isSpace(char c) {
@@ -52,11 +43,8 @@ char* copystr(const char* input) {
     const std::size_t size = std::strlen(input) + 1;
     char* const copy = new (std::nothrow) char[size];
     if (copy == nullptr) {
-        if (loggerExists) {
-            moduleLogger.logger.error(
-                "Could not allocate space for string of size %lu in DCUtils::copystr",
-                static_cast<unsigned long>(size));
-        }
+        logger.error("Could not allocate space for string of size %lu in DCUtils::copystr",
+                     static_cast<unsigned long>(size));
         throw std::bad_alloc();
     }
     std::memcpy(copy, input, size);
@@ -190,12 +178,7 @@ void getPunct(const std::string& text, std::string& out, unsigned max_len) {
         initMap(BREAKER_MAP, ELLIPSE_BREAKERS);
         initd = true;
     }
-    try {
-        out.reserve(out.size() + 2 * std::size_t{max_len} + 1);  // an item takes two at most
-    } catch (const std::exception&) {
-        // A limit far beyond the text needs no such room.
-    }
-
+    out.reserve(out.size() + 2 * std::size_t{max_len} + 1);  // an item takes two at most
     unsigned items = 0;
     for (const char* p = text.c_str(); *p != '\0' && *p != '\n' && items < max_len; ++p) {
         const char entry = BREAKER_MAP[static_cast<unsigned char>(*p)];
