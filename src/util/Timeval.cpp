@@ -9,24 +9,21 @@
 
 namespace {
 
-constexpr long long maxSec = std::numeric_limits<std::int32_t>::max();
-constexpr long usecsPerSec = 1000000;
-constexpr unsigned long long maxMsecs = maxSec * 1000ULL;
+constexpr long long MAX_SEC = std::numeric_limits<std::int32_t>::max();
+constexpr long USECS_PER_SEC = 1000000;
+constexpr unsigned long long MAX_MSECS = MAX_SEC * 1000ULL;
 
-// a - b in whole seconds, rounded down, and the microseconds above them. The sums are unsigned, so
-// that instants which only a 64-bit time_t can hold do no worse than wrap around.
+// a - b in whole seconds, rounded down, and the microseconds above them.
 struct Difference {
     Difference(const struct timeval& a, const struct timeval& b)
-        : seconds(static_cast<unsigned long long>(a.tv_sec) -
-                  static_cast<unsigned long long>(b.tv_sec)),
-          micros(a.tv_usec - b.tv_usec) {
+        : seconds(a.tv_sec - b.tv_sec), micros(a.tv_usec - b.tv_usec) {
         if (micros < 0) {
             --seconds;
-            micros += usecsPerSec;
+            micros += USECS_PER_SEC;
         }
     }
 
-    unsigned long long seconds;
+    long long seconds;
     long micros;  // 0..999999
 };
 
@@ -51,12 +48,12 @@ bool isDigit(char c) {
 // The digits before the point, in milliseconds.
 // Returns: the first character behind them; `hitMax` is set when they do not fit.
 const char* readWholeSeconds(const char* p, unsigned long long& msecs, bool& hitMax) {
-    constexpr unsigned long long firstTooLarge = 18446744073709552ULL;
+    constexpr unsigned long long FIRST_TOO_LARGE = 18446744073709552ULL;
     unsigned long long value = 0;
     for (; isDigit(*p); ++p) {
         if (!hitMax) {
             value = value * 10 + static_cast<unsigned>(*p - '0');
-            hitMax = value >= firstTooLarge;
+            hitMax = value >= FIRST_TOO_LARGE;
         }
     }
     msecs = value * 1000;
@@ -92,19 +89,17 @@ Timeval Timeval::now() {
 }
 
 long long Timeval::msec() const noexcept {
-    const auto whole = static_cast<unsigned long long>(_tv.tv_sec) * 1000;
-    return static_cast<long long>(whole + static_cast<unsigned long long>(_tv.tv_usec / 1000));
+    return sec() * 1000 + _tv.tv_usec / 1000;
 }
 
 void Timeval::set(long long seconds, long long microseconds) noexcept {
-    long long carry = microseconds / usecsPerSec;
-    long long rest = microseconds % usecsPerSec;
+    long long carry = microseconds / USECS_PER_SEC;
+    long long rest = microseconds % USECS_PER_SEC;
     if (rest < 0) {
         --carry;
-        rest += usecsPerSec;
+        rest += USECS_PER_SEC;
     }
-    _tv.tv_sec = static_cast<time_t>(static_cast<unsigned long long>(seconds) +
-                                     static_cast<unsigned long long>(carry));
+    _tv.tv_sec = seconds + carry;
     _tv.tv_usec = static_cast<suseconds_t>(rest);
 }
 
@@ -115,12 +110,12 @@ void Timeval::setToNow() {
 }
 
 void Timeval::setToMax() noexcept {
-    _tv.tv_sec = maxSec;
-    _tv.tv_usec = usecsPerSec - 1;
+    _tv.tv_sec = MAX_SEC;
+    _tv.tv_usec = USECS_PER_SEC - 1;
 }
 
 void Timeval::addSec(unsigned int secs) noexcept {
-    if (_tv.tv_sec > maxSec - static_cast<long long>(secs)) {
+    if (_tv.tv_sec > MAX_SEC - static_cast<long long>(secs)) {
         setToMax();
         return;
     }
@@ -128,16 +123,16 @@ void Timeval::addSec(unsigned int secs) noexcept {
 }
 
 void Timeval::addMsec(unsigned long long msecs) {
-    if (msecs >= maxMsecs) {
+    if (msecs >= MAX_MSECS) {
         setToMax();
         return;
     }
     auto secs = static_cast<unsigned int>(msecs / 1000);
     _tv.tv_usec += static_cast<suseconds_t>(msecs % 1000 * 1000);
-    if (_tv.tv_usec >= usecsPerSec) {
+    if (_tv.tv_usec >= USECS_PER_SEC) {
         QUELTA_ASSERT(_tv.tv_usec < 2000000);
         ++secs;
-        _tv.tv_usec -= usecsPerSec;
+        _tv.tv_usec -= USECS_PER_SEC;
     }
     addSec(secs);
 }
@@ -150,14 +145,12 @@ void Timeval::localtime(struct tm& result) const {
 
 long long Timeval::msecDifference(const Timeval& a, const Timeval& b) noexcept {
     const Difference d(a._tv, b._tv);
-    return static_cast<long long>(d.seconds * 1000 +
-                                  static_cast<unsigned long long>((d.micros + 999) / 1000));
+    return d.seconds * 1000 + (d.micros + 999) / 1000;
 }
 
 long long Timeval::usecDifference(const Timeval& a, const Timeval& b) noexcept {
     const Difference d(a._tv, b._tv);
-    return static_cast<long long>(d.seconds * 1000000 +
-                                  static_cast<unsigned long long>(d.micros / 1000));
+    return d.seconds * 1000000 + d.micros / 1000;
 }
 
 std::string Timeval::describeDifference(const Timeval& a, const Timeval& b) {
