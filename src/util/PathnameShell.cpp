@@ -1,6 +1,6 @@
 #include "util/Pathname.h"
 
-// Words of a shell command line: quoting a path as one, and taking one off a line.
+// Words of a shell command line: quotes a path as one, and splits one off a line.
 
 #include <algorithm>
 #include <string_view>
@@ -21,8 +21,8 @@ bool containsAny(std::string_view text, std::string_view characters) {
     return text.find_first_of(characters) != text.npos;
 }
 
-// Reads one word from `pos` on, which is left at the blank or the end behind it.
-// Returns: false when a quote or a backslash is not completed; `word` then holds what came before.
+// Reads one word starting at `pos`, and leaves `pos` at the blank after it or at the end.
+// Returns: false if a quote or a backslash is not completed; `word` then holds what came before.
 bool readWord(std::string_view input, std::size_t& pos, std::string& word) {
     enum State { BASE, IN_DOUBLE_QUOTE, IN_SINGLE_QUOTE };
     State state = BASE;
@@ -91,7 +91,7 @@ bool Pathname::splitArgShellQuoted(const std::string& input, Pathname& firstArg,
     const bool complete = readWord(input, pos, word);
     std::string remainder = input.substr(pos);
     const bool found = complete && !word.empty();
-    // Last of all, because either may be the same object as the input.
+    // At the end, because either may be the same object as the input.
     firstArg = std::move(word);
     if (found) {
         rest = std::move(remainder);

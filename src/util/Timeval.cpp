@@ -27,7 +27,7 @@ struct Difference {
     long micros;  // 0..999999
 };
 
-// Appends three significant figures in a field of width 5, and the unit.
+// Returns: the value with one to three decimals, at least 5 characters wide, and the unit.
 std::string describe(double value, const char* unit) {
     const int precision = value >= 99.5 ? 1 : value >= 9.95 ? 2 : 3;
     char number[40];
@@ -45,8 +45,8 @@ bool isDigit(char c) {
     return c >= '0' && c <= '9';
 }
 
-// The digits before the point, in milliseconds.
-// Returns: the first character behind them; `hitMax` is set when they do not fit.
+// Reads the digits before the point as milliseconds.
+// Returns: the first character after them; `hitMax` is set if they do not fit.
 const char* readWholeSeconds(const char* p, unsigned long long& msecs, bool& hitMax) {
     constexpr unsigned long long FIRST_TOO_LARGE = 18446744073709552ULL;
     unsigned long long value = 0;
@@ -60,8 +60,8 @@ const char* readWholeSeconds(const char* p, unsigned long long& msecs, bool& hit
     return p;
 }
 
-// The digits behind the point, added to `msecs`.
-// Returns: the first character behind them.
+// Reads the digits after the point and adds them to `msecs`.
+// Returns: the first character after them.
 const char* readFraction(const char* p, unsigned long long& msecs, bool& hitMax) {
     unsigned tenths = 0;  // of a millisecond
     unsigned unit = 1000;
@@ -181,7 +181,7 @@ bool convert_string_to_milliseconds(const char* oldp, unsigned long long* res,
     const char* const number = p;
     bool hitMax = false;
     p = readWholeSeconds(p, *res, hitMax);
-    // A point before anything but a digit or the end belongs to what follows the number.
+    // A '.' followed by neither a digit nor the end is not part of the number.
     if (*p == '.' && (isDigit(p[1]) || p[1] == '\0')) {
         p = readFraction(p + 1, *res, hitMax);
     }
