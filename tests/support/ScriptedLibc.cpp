@@ -96,7 +96,7 @@ RecordedCalls::~RecordedCalls() {
     recorder = nullptr;
 }
 
-// The recorder is out of the way meanwhile, as its own work may call what is recorded.
+// Recording is off inside, because it may itself call wrapped functions.
 template <typename... Arguments>
 void record(const char* function, Arguments... arguments) {
     RecordedCalls* const current = recorder;

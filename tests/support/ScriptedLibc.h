@@ -43,79 +43,61 @@ struct poptOption;
 // clang-format off
 #define SCRIPTED_LIBC(FUNCTION, TRANSFER, VARIADIC) \
     FUNCTION(int, access, (const char* path, int mode), (path, mode), (path, mode)) \
-    FUNCTION(std::clock_t, clock, (), (), ()) \
+    FUNCTION(clock_t, clock, (), (), ()) \
     FUNCTION(int, close, (int fd), (fd), ()) \
     VARIADIC(int, fcntl, (int fd, int command, int value), (fd, command, value), (command)) \
     FUNCTION(FILE*, fopen, (const char* path, const char* mode), (path, mode), (path, mode)) \
     FUNCTION(int, fstat, (int fd, struct stat* result), (fd, result), ()) \
     FUNCTION(int, fsync, (int fd), (fd), ()) \
     FUNCTION(int, gettimeofday, (struct timeval* now, void* zone), (now, zone), ()) \
-    FUNCTION(struct tm*, localtime_r, \
-        (const time_t* time, struct tm* result), \
-        (time, result), ()) \
+    FUNCTION(struct tm*, localtime_r, (const time_t* t, struct tm* result), (t, result), ()) \
     FUNCTION(int, mkdir, (const char* path, mode_t mode), (path, mode), (path, mode)) \
-    VARIADIC(int, open, \
-        (const char* path, int flags, mode_t mode), \
+    VARIADIC(int, open, (const char* path, int flags, mode_t mode), \
         (path, flags, mode), (path, flags, mode)) \
     FUNCTION(poptContext_s*, poptGetContext, \
-        (const char* name, int argc, const char** argv, const struct poptOption* options, \
-         unsigned flags), \
-        (name, argc, argv, options, flags), ()) \
-    FUNCTION(int, pthread_cond_broadcast, (pthread_cond_t* cond), (cond), ()) \
+        (const char* name, int argc, const char** argv, const struct poptOption* o, unsigned flags), \
+        (name, argc, argv, o, flags), ()) \
+    FUNCTION(int, pthread_cond_broadcast, (pthread_cond_t* c), (c), ()) \
     FUNCTION(int, pthread_cond_clockwait, \
-        (pthread_cond_t* cond, pthread_mutex_t* mutex, clockid_t clock, \
-         const struct timespec* deadline), \
-        (cond, mutex, clock, deadline), ()) \
-    FUNCTION(int, pthread_cond_destroy, (pthread_cond_t* cond), (cond), ()) \
-    FUNCTION(int, pthread_cond_init, \
-        (pthread_cond_t* cond, const pthread_condattr_t* attr), \
-        (cond, attr), ()) \
-    FUNCTION(int, pthread_cond_signal, (pthread_cond_t* cond), (cond), ()) \
-    FUNCTION(int, pthread_cond_wait, \
-        (pthread_cond_t* cond, pthread_mutex_t* mutex), \
-        (cond, mutex), ()) \
+        (pthread_cond_t* c, pthread_mutex_t* m, clockid_t id, const struct timespec* end), \
+        (c, m, id, end), ()) \
+    FUNCTION(int, pthread_cond_destroy, (pthread_cond_t* c), (c), ()) \
+    FUNCTION(int, pthread_cond_init, (pthread_cond_t* c, const pthread_condattr_t* a), \
+        (c, a), ()) \
+    FUNCTION(int, pthread_cond_signal, (pthread_cond_t* c), (c), ()) \
+    FUNCTION(int, pthread_cond_wait, (pthread_cond_t* c, pthread_mutex_t* m), (c, m), ()) \
     FUNCTION(int, pthread_create, \
-        (pthread_t* thread, const pthread_attr_t* attr, void* (*start)(void*), void* arg), \
-        (thread, attr, start, arg), ()) \
-    FUNCTION(int, pthread_detach, (pthread_t thread), (thread), ()) \
-    FUNCTION(int, pthread_join, (pthread_t thread, void** result), (thread, result), ()) \
+        (pthread_t* t, const pthread_attr_t* a, void* (*f)(void*), void* arg), \
+        (t, a, f, arg), ()) \
+    FUNCTION(int, pthread_detach, (pthread_t t), (t), ()) \
+    FUNCTION(int, pthread_join, (pthread_t t, void** result), (t, result), ()) \
     FUNCTION(int, pthread_key_delete, (pthread_key_t key), (key), ()) \
-    FUNCTION(int, pthread_mutex_destroy, (pthread_mutex_t* mutex), (mutex), ()) \
-    FUNCTION(int, pthread_mutex_init, \
-        (pthread_mutex_t* mutex, const pthread_mutexattr_t* attr), \
-        (mutex, attr), ()) \
-    FUNCTION(int, pthread_mutex_lock, (pthread_mutex_t* mutex), (mutex), ()) \
-    FUNCTION(int, pthread_mutex_trylock, (pthread_mutex_t* mutex), (mutex), ()) \
-    FUNCTION(int, pthread_mutex_unlock, (pthread_mutex_t* mutex), (mutex), ()) \
+    FUNCTION(int, pthread_mutex_destroy, (pthread_mutex_t* m), (m), ()) \
+    FUNCTION(int, pthread_mutex_init, (pthread_mutex_t* m, const pthread_mutexattr_t* a), \
+        (m, a), ()) \
+    FUNCTION(int, pthread_mutex_lock, (pthread_mutex_t* m), (m), ()) \
+    FUNCTION(int, pthread_mutex_trylock, (pthread_mutex_t* m), (m), ()) \
+    FUNCTION(int, pthread_mutex_unlock, (pthread_mutex_t* m), (m), ()) \
     FUNCTION(long, random, (), (), ()) \
-    TRANSFER(ssize_t, read, (int fd, void* buf, std::size_t size), (fd, buf, size), (size)) \
-    FUNCTION(ssize_t, readlink, \
-        (const char* path, char* buf, std::size_t size), \
+    TRANSFER(ssize_t, read, (int fd, void* buf, size_t size), (fd, buf, size), (size)) \
+    FUNCTION(ssize_t, readlink, (const char* path, char* buf, size_t size), \
         (path, buf, size), (path, size)) \
     FUNCTION(int, remove, (const char* path), (path), (path)) \
     FUNCTION(int, rename, (const char* from, const char* to), (from, to), (from, to)) \
     FUNCTION(int, rmdir, (const char* path), (path), (path)) \
     FUNCTION(int, stat, (const char* path, struct stat* result), (path, result), (path)) \
-    FUNCTION(std::size_t, strftime, \
-        (char* buf, std::size_t size, const char* format, const struct tm* time), \
-        (buf, size, format, time), (size, format)) \
-    FUNCTION(int, symlink, \
-        (const char* target, const char* link), \
-        (target, link), (target, link)) \
-    FUNCTION(std::time_t, time, (std::time_t* result), (result), ()) \
+    FUNCTION(size_t, strftime, (char* buf, size_t size, const char* fmt, const struct tm* t), \
+        (buf, size, fmt, t), (size, fmt)) \
+    FUNCTION(int, symlink, (const char* to, const char* link), (to, link), (to, link)) \
+    FUNCTION(time_t, time, (time_t* result), (result), ()) \
     FUNCTION(int, truncate, (const char* path, off_t length), (path, length), (path, length)) \
     FUNCTION(int, unlink, (const char* path), (path), (path)) \
-    FUNCTION(int, vsnprintf, \
-        (char* buf, std::size_t size, const char* format, std::va_list args), \
-        (buf, size, format, args), (size)) \
-    TRANSFER(ssize_t, write, \
-        (int fd, const void* buf, std::size_t size), \
-        (fd, buf, size), (size)) \
-    FUNCTION(ssize_t, writev, \
-        (int fd, const struct iovec* buffers, int count), \
-        (fd, buffers, count), (count)) \
-    FUNCTION(int, __xpg_strerror_r, \
-        (int number, char* buf, std::size_t size), \
+    FUNCTION(int, vsnprintf, (char* buf, size_t size, const char* fmt, va_list ap), \
+        (buf, size, fmt, ap), (size)) \
+    TRANSFER(ssize_t, write, (int fd, const void* buf, size_t size), (fd, buf, size), (size)) \
+    FUNCTION(ssize_t, writev, (int fd, const struct iovec* v, int count), \
+        (fd, v, count), (count)) \
+    FUNCTION(int, __xpg_strerror_r, (int number, char* buf, size_t size), \
         (number, buf, size), (size))
 // clang-format on
 
