@@ -53,36 +53,19 @@ thread_local State state = {};
 }  // namespace
 
 #if !QUELTA_HAS_FEATURE(thread_sanitizer)
-void* operator new(std::size_t size) {
-    return allocate(size);
-}
-void* operator new[](std::size_t size) {
-    return allocate(size);
-}
-void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
-    return allocateOrNull(size);
-}
-void* operator new[](std::size_t size, const std::nothrow_t&) noexcept {
-    return allocateOrNull(size);
-}
-void operator delete(void* block) noexcept {
-    release(block);
-}
-void operator delete[](void* block) noexcept {
-    release(block);
-}
-void operator delete(void* block, std::size_t) noexcept {
-    release(block);
-}
-void operator delete[](void* block, std::size_t) noexcept {
-    release(block);
-}
-void operator delete(void* block, const std::nothrow_t&) noexcept {
-    release(block);
-}
-void operator delete[](void* block, const std::nothrow_t&) noexcept {
-    release(block);
-}
+using Nothrow = const std::nothrow_t&;
+// clang-format off
+void* operator new(std::size_t size) { return allocate(size); }
+void* operator new[](std::size_t size) { return allocate(size); }
+void* operator new(std::size_t size, Nothrow) noexcept { return allocateOrNull(size); }
+void* operator new[](std::size_t size, Nothrow) noexcept { return allocateOrNull(size); }
+void operator delete(void* block) noexcept { release(block); }
+void operator delete[](void* block) noexcept { release(block); }
+void operator delete(void* block, std::size_t) noexcept { release(block); }
+void operator delete[](void* block, std::size_t) noexcept { release(block); }
+void operator delete(void* block, Nothrow) noexcept { release(block); }
+void operator delete[](void* block, Nothrow) noexcept { release(block); }
+// clang-format on
 bool AllocationProbe::available() {
     return true;
 }

@@ -33,10 +33,6 @@ template <typename Number>
 std::string textOf(Number number) {
     return std::to_string(number);
 }
-template <typename Pointed>
-std::string textOf(Pointed*) {
-    return "pointer";
-}
 
 }  // namespace
 

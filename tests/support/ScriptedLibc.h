@@ -55,8 +55,8 @@ struct poptOption;
     VARIADIC(int, open, (const char* path, int flags, mode_t mode), \
         (path, flags, mode), (path, flags, mode)) \
     FUNCTION(poptContext_s*, poptGetContext, \
-        (const char* name, int argc, const char** argv, const struct poptOption* o, unsigned flags), \
-        (name, argc, argv, o, flags), ()) \
+        (const char* name, int argc, const char** argv, const struct poptOption* o, unsigned f), \
+        (name, argc, argv, o, f), ()) \
     FUNCTION(int, pthread_cond_broadcast, (pthread_cond_t* c), (c), ()) \
     FUNCTION(int, pthread_cond_clockwait, \
         (pthread_cond_t* c, pthread_mutex_t* m, clockid_t id, const struct timespec* end), \

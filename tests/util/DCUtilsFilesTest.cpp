@@ -19,15 +19,20 @@ using namespace std::string_literals;
 
 using OpenFile = std::unique_ptr<FILE, int (*)(FILE*)>;
 
-OpenFile opened(const std::string& path, const char* mode = "r") {
-    return OpenFile(std::fopen(path.c_str(), mode), std::fclose);
-}
+class DCUtilsFilesTest : public testing::Test {
+protected:
+    // Opens a file with these contents.
+    OpenFile opened(const std::string& contents, const char* mode = "r") const {
+        writeFile(_path, contents);
+        return OpenFile(std::fopen(_path.c_str(), mode), std::fclose);
+    }
 
-// Reads lines into a buffer of `bufSize` bytes until there is none.
-std::vector<std::string> linesOf(const std::string& contents, int bufSize) {
-    const TempDir dir;
-    writeFile(dir.file("text"), contents);
-    const OpenFile file = opened(dir.file("text"));
+    const TempDir _dir;
+    const Pathname _path{_dir.file("text")};
+};
+
+// Reads lines into a buffer of `bufSize` bytes until there is no more.
+std::vector<std::string> linesOf(const OpenFile& file, int bufSize) {
     std::vector<std::string> lines;
     std::vector<char> buf(static_cast<std::size_t>(bufSize), 'x');
     while (readLine(file.get(), buf.data(), bufSize)) {
@@ -38,7 +43,7 @@ std::vector<std::string> linesOf(const std::string& contents, int bufSize) {
 
 using Lines = std::vector<std::string>;
 
-TEST(DCUtilsFilesTest, ReadsLinesAndDiscardsTheRestOfLongOnes) {
+TEST_F(DCUtilsFilesTest, ReadsLinesAndDiscardsTheRestOfLongOnes) {
     const struct {
         const char* contents;
         int bufSize;
@@ -56,14 +61,12 @@ TEST(DCUtilsFilesTest, ReadsLinesAndDiscardsTheRestOfLongOnes) {
         {"abc\n\nb", 3, {"a", "\n", "b"}},
     };
     for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, linesOf(row.contents, row.bufSize)) << row.contents;
+        EXPECT_EQ(row.expected, linesOf(opened(row.contents), row.bufSize)) << row.contents;
     }
 }
 
-TEST(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
-    const TempDir dir;
-    writeFile(dir.file("text"), "ab\n");
-    const OpenFile file = opened(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
+    const OpenFile file = opened("ab\n");
     char buf[8];
     std::memset(buf, 'x', sizeof buf);
     EXPECT_TRUE(readLine(file.get(), buf, sizeof buf));
@@ -72,10 +75,8 @@ TEST(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
     EXPECT_EQ(std::string(sizeof buf, '\0'), std::string(buf, sizeof buf));
 }
 
-TEST(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
-    const TempDir dir;
-    writeFile(dir.file("text"), "abc\n");
-    const OpenFile file = opened(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
+    const OpenFile file = opened("abc\n");
     for (const int bufSize : {2, 1, 0, -1}) {
         char buf[] = "xyz";
         EXPECT_FALSE(readLine(file.get(), buf, bufSize)) << bufSize;
@@ -86,34 +87,30 @@ TEST(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
     EXPECT_EQ('a', std::getc(file.get()));
 }
 
-TEST(DCUtilsFilesTest, AReadErrorIsReportedLikeTheEnd) {
-    const TempDir dir;
-    const OpenFile file = opened(dir.file("text"), "w");
+TEST_F(DCUtilsFilesTest, AReadErrorIsReportedLikeTheEnd) {
+    const OpenFile file = opened("", "w");
     char buf[8];
     EXPECT_FALSE(readLine(file.get(), buf, sizeof buf));
 }
 
-TEST(DCUtilsFilesTest, WritesTexts) {
-    const TempDir dir;
-    const Pathname path(dir.file("out"));
+TEST_F(DCUtilsFilesTest, WritesTexts) {
     const struct {
         const char *text, *expected;
     } rows[] = {{"one\ntwo", "one\ntwo"}, {"", ""}, {"x", "x"}, {nullptr, ""}};
     for (const auto& row : rows) {
-        writeFile(path, "what was there before");
-        EXPECT_TRUE(writeText(path, row.text));
-        EXPECT_EQ(row.expected, readFile(path));
+        writeFile(_path, "what was there before");
+        EXPECT_TRUE(writeText(_path, row.text));
+        EXPECT_EQ(row.expected, readFile(_path));
     }
 }
 
-TEST(DCUtilsFilesTest, AFileThatCannotBeOpenedIsNeitherWrittenNorRead) {
-    const TempDir dir;
-    EXPECT_FALSE(writeText(Pathname(dir.file("missing/out")), "x"));
-    EXPECT_FALSE(writeText(Pathname(dir.path()), "x"));
-    EXPECT_EQ(nullptr, readText(Pathname(dir.file("missing"))));
+TEST_F(DCUtilsFilesTest, AFileThatCannotBeOpenedIsNeitherWrittenNorRead) {
+    EXPECT_FALSE(writeText(Pathname(_dir.file("missing/out")), "x"));
+    EXPECT_FALSE(writeText(Pathname(_dir.path()), "x"));
+    EXPECT_EQ(nullptr, readText(Pathname(_dir.file("missing"))));
 }
 
-TEST(DCUtilsFilesTest, WritingIsNotChecked) {
+TEST_F(DCUtilsFilesTest, WritingIsNotChecked) {
     if (::access("/dev/full", W_OK) != 0) {
         GTEST_SKIP() << "no /dev/full";
     }
@@ -127,25 +124,22 @@ void expectText(const std::string& expected, const Pathname& path) {
     EXPECT_EQ(expected + '\0', std::string(text.get(), expected.size() + 1)) << path;
 }
 
-TEST(DCUtilsFilesTest, ReadsWholeFiles) {
-    const TempDir dir;
-    const Pathname path(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ReadsWholeFiles) {
     for (const std::string& contents :
          {""s, "x"s, "one\ntwo\n"s, "a\0b"s, "\xff\xfe"s, std::string(100000, 'y')}) {
-        writeFile(path, contents);
-        expectText(contents, path);
+        writeFile(_path, contents);
+        expectText(contents, _path);
     }
 }
 
-TEST(DCUtilsFilesTest, ReadsADirectoryAsAnEmptyText) {
-    const TempDir dir;  // it opens and has a size, but no bytes can be read
-    expectText("", Pathname(dir.path()));
+TEST_F(DCUtilsFilesTest, ReadsADirectoryAsAnEmptyText) {
+    // It opens and has a size, but no bytes can be read.
+    expectText("", Pathname(_dir.path()));
 }
 
-TEST(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
+TEST_F(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
     // A FIFO and a file in /proc have the size 0.
-    const TempDir dir;
-    const Pathname fifo(dir.file("fifo"));
+    const Pathname fifo(_dir.file("fifo"));
     ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
     for (const std::size_t size : {0u, 1u, 2u, 3u, 4u, 7u, 8u, 70000u}) {
         const std::string contents(size, 'z');

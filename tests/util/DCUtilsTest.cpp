@@ -4,7 +4,6 @@
 
 #include <cerrno>
 #include <climits>
-#include <cmath>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
@@ -13,6 +12,7 @@
 #include <vector>
 
 #include "support/AllStrings.h"
+#include "support/Examples.h"
 
 namespace {
 
@@ -24,7 +24,6 @@ std::string taken(char* array) {
     return array == nullptr ? "(null)" : array;
 }
 
-// The text that the array-returning functions leave null for null, and what they give otherwise.
 TEST(DCUtilsTest, NullGivesNullOrFalse) {
     for (char* (*function)(const char*) :
          {&copystr, static_cast<char* (*)(const char*)>(&strip),
@@ -105,21 +104,12 @@ TEST(DCUtilsTest, FindsLowerCaseTextsWhateverTheCaseOfTheText) {
 }
 
 TEST(DCUtilsTest, StripsWhiteSpaceAroundAText) {
-    const struct {
-        const char *text, *expected;
-    } rows[] = {
-        {"", ""},
-        {"  ", ""},
-        {" a b ", "a b"},
-        {"a", "a"},
-        {"\t\n\v\f\r x", "x"},
-        {"x \t\r\n", "x"},
-        {"\xa0x\xa0", "\xa0x\xa0"},
-        {" \x01 ", "\x01"},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, taken(strip(row.text))) << '"' << row.text << '"';
-        EXPECT_EQ(row.expected, strip(std::string(row.text))) << '"' << row.text << '"';
+    for (const std::string text : {"", "a", "a b", "\xa0x\xa0", "\x01"}) {
+        for (const std::string blanks : {"", " ", "\t\n\v\f\r ", "  \n"}) {
+            EXPECT_EQ(text, taken(strip((blanks + text).c_str())));
+            EXPECT_EQ(text, taken(strip((text + blanks).c_str())));
+            EXPECT_EQ(text, strip(blanks + text + blanks));
+        }
     }
 }
 
@@ -185,32 +175,13 @@ TEST(DCUtilsTest, SubstitutesEnvironmentVariables) {
     ::setenv("1b", "one-b", 1);
     ::setenv("QT_DOLLAR", "$QT_NAME", 1);
     ::unsetenv("QT_UNSET");
-    const struct {
-        const char *text, *expected;
-    } rows[] = {
-        {"", ""},
-        {"plain", "plain"},
-        {"$QT_NAME", "value"},
-        {"<$QT_NAME>", "<value>"},
-        {"$QT_NAME/$QT_NAME", "value/value"},
-        {"$QT_NAME$QT_NAME", "valuevalue"},
-        {"a$QT_EMPTY.", "a."},
-        {"a$QT_UNSET.", "a."},
-        {"a$1b", "aone-b"},
-        {"$QT_NAMEx", ""},
-        {"${QT_NAME}", "{QT_NAME}"},
-        {"$$", ""},
-        {"$", ""},
-        {"a$ b", "a b"},
-        {"$$QT_NAME", "value"},
-        {"\\$QT_NAME", "\\value"},
-        {"$QT_DOLLAR", "$QT_NAME"},
-        {"$QT_NAME\xe4", "value\xe4"},
-        {"$\xe4", "\xe4"},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, taken(substituteEnvs(row.text))) << row.text;
-    }
+    expectEach(
+        [](const std::string& text) { return taken(substituteEnvs(text.c_str())); },
+        {" > ", "plain > plain", "$QT_NAME > value", "[$QT_NAME] > [value]",
+         "$QT_NAME/$QT_NAME > value/value", "$QT_NAME$QT_NAME > valuevalue", "a$QT_EMPTY. > a.",
+         "a$QT_UNSET. > a.", "a$1b > aone-b", "$QT_NAMEx > ", "${QT_NAME} > {QT_NAME}", "$$ > ",
+         "$ > ", "a$ b > a b", "$$QT_NAME > value", "\\$QT_NAME > \\value", "$QT_DOLLAR > $QT_NAME",
+         "$QT_NAME\xe4 > value\xe4", "$\xe4 > \xe4"});
 }
 
 TEST(DCUtilsTest, FillsAnEscapeMap) {
@@ -226,39 +197,19 @@ TEST(DCUtilsTest, FillsAnEscapeMap) {
     EXPECT_EQ(expected + char(77), std::string(map, sizeof map));
 }
 
-std::string punctOf(const std::string& text, unsigned max_len) {
-    std::string out;
-    getPunct(text, out, max_len);
-    return out;
-}
-
 TEST(DCUtilsTest, OutlinesThePunctuationOfALine) {
-    const struct {
-        std::string text;
-        unsigned max_len;
-        const char* expected;
-    } rows[] = {
-        {"cp /a/b.txt dir/1.0", 10, "_//._/."},
-        {"a, b; c", 10, ",_;_"},
-        {"a,b,c", 2, ",,"},
-        {"a,b,c", 1, ","},
-        {"a,b,c", 0, ""},
-        {"", 10, ""},
-        {"\n,,", 10, ""},
-        {",\n;", 10, ","},
-        {",\0;"s, 10, ","},
-        {"\0,"s, 10, ""},
-        {"one\ttwo", 5, "t"},
-        {"x:\\word", 10, ":\\\\"},
-        {"a\rb", 10, "\\r"},
-        {"say \"x\"", 10, "_\\\"\\\""},
-        {"\\\\\\", 2, "\\\\\\\\"},
-        {" ,;-#$%&+./:=?@'|*(){}<>[]^!", 28, "_,;-#$%&+./:=?@'|*(){}<>[]^!"},
-        {"_~`\x7f\x80\xff", 10, ""},
+    const auto outline = [](const std::string& text, unsigned max_len = 28) {
+        std::string out;
+        getPunct(text, out, max_len);
+        return out;
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, punctOf(row.text, row.max_len)) << row.text << ' ' << row.max_len;
-    }
+    expectEach(outline, {"cp /a/b.txt dir/1.0 > _//._/.", "a, b; c > ,_;_", " > ", "\n,, > ",
+                         ",\n; > ,", ",\0; > ,"s, "\0, > "s, "one\ttwo > t", "x:\\word > :\\\\",
+                         "a\rb > \\r", "say \"x\" > _\\\"\\\"", "_~`\x7f\x80\xff > "});
+    EXPECT_EQ("_,;-#$%&+./:=?@'|*(){}<>[]^!", outline(" ,;-#$%&+./:=?@'|*(){}<>[]^!"));
+    EXPECT_EQ(",,", outline("a,b,c", 2));
+    EXPECT_EQ("", outline("a,b,c", 0));
+    EXPECT_EQ("\\\\\\\\", outline("\\\\\\", 2));
 }
 
 TEST(DCUtilsTest, AppendsTheOutlineAfterReservingItsRoom) {
@@ -305,72 +256,37 @@ TEST(DCUtilsTest, WritesNumbersInDecimal) {
 }
 
 TEST(DCUtilsTest, ReadsLongs) {
-    const struct {
-        std::string text;
-        long value;
-        bool successful;
-    } rows[] = {
-        {"0", 0, true},
-        {"12", 12, true},
-        {"-12", -12, true},
-        {"+12", 12, true},
-        {" \t\n12", 12, true},
-        {"007", 7, true},
-        {"9223372036854775807", LONG_MAX, true},
-        {"-9223372036854775808", LONG_MIN, true},
-        {"9223372036854775808", LONG_MAX, false},
-        {"-9223372036854775809", LONG_MIN, false},
-        {"12x", 12, false},
-        {"12 ", 12, false},
-        {"0x10", 0, false},
-        {"", 0, false},
-        {" ", 0, false},
-        {"x", 0, false},
-        {"-", 0, false},
-        {"12\0"s, 12, false},
-    };
-    for (const auto& row : rows) {
-        for (const int stale : {0, ERANGE}) {
+    for (const int stale : {0, EDOM, ERANGE}) {
+        const auto read = [stale](const std::string& text) {
+            bool successful = false;
             errno = stale;
-            bool successful = !row.successful;
-            EXPECT_EQ(row.value, getLong(row.text, successful)) << row.text;
-            EXPECT_EQ(row.successful, successful) << row.text;
-            EXPECT_EQ(0, errno) << row.text;
-        }
+            const long value = getLong(text, successful);
+            EXPECT_EQ(0, errno) << text;
+            return std::to_string(value) + (successful ? "" : " failed");
+        };
+        expectEach(read, {"0 > 0", "12 > 12", "-12 > -12", "+12 > 12", " \t\n12 > 12", "007 > 7",
+                          "9223372036854775807 > 9223372036854775807",
+                          "-9223372036854775808 > -9223372036854775808"});
+        expectEach(read, {"9223372036854775808 > 9223372036854775807 failed",
+                          "-9223372036854775809 > -9223372036854775808 failed", "12x > 12 failed",
+                          "12  > 12 failed", "0x10 > 0 failed", " > 0 failed", "  > 0 failed",
+                          "x > 0 failed", "- > 0 failed", "12\0 > 12 failed"s});
     }
 }
 
 TEST(DCUtilsTest, ReadsDoubles) {
     constexpr double FAILURE = -9.99e99;
-    const struct {
-        std::string text;
-        double expected;
-    } rows[] = {
-        {"0", 0},
-        {"1", 1},
-        {"-1", -1},
-        {"-.5", -0.5},
-        {"1e3", 1000},
-        {"1.5", 1.5},
-        {"9.5", 9.5},
-        {"5.", 5},
-        {"0x10", 16},
-        {"-inf", -HUGE_VAL},
-        {"1.0 ", FAILURE},
-        {"1x", FAILURE},
-        {"-", FAILURE},
-        {"1e999", FAILURE},
-        {"-1e999", FAILURE},
-        {"1e-999", FAILURE},
-        {"1\0"s, FAILURE},
-        {"1,5", FAILURE},
-    };
-    for (const auto& row : rows) {
-        for (const int stale : {0, EDOM, ERANGE}) {
+    for (const int stale : {0, EDOM, ERANGE}) {
+        const auto read = [stale](const std::string& text) {
             errno = stale;
-            EXPECT_EQ(row.expected, getDouble(row.text)) << row.text;
-            EXPECT_EQ(0, errno) << row.text;
-        }
+            const double value = getDouble(text);
+            EXPECT_EQ(0, errno) << text;
+            return value == FAILURE ? "failed" : std::to_string(value).substr(0, 6);
+        };
+        expectEach(read, {"0 > 0.0000", "1 > 1.0000", "-1 > -1.000", "-.5 > -0.500", "1e3 > 1000.0",
+                          "9.5 > 9.5000", "5. > 5.0000", "0x10 > 16.000", "-inf > -inf"});
+        expectEach(read, {"1.0  > failed", "1x > failed", "- > failed", "1e999 > failed",
+                          "-1e999 > failed", "1e-999 > failed", "1\0 > failed"s, "1,5 > failed"});
     }
     for (const char* const text : {"", "+1", ".5", " 1", "inf", "nan", "x"}) {
         EXPECT_EQ(FAILURE, getDouble(text)) << text;

@@ -5,9 +5,12 @@
 
 #include <climits>
 #include <cstdint>
+#include <cstdio>
 #include <random>
+#include <sstream>
 #include <string>
 
+#include "support/Examples.h"
 #include "support/TimeZone.h"
 
 namespace {
@@ -79,57 +82,38 @@ TEST(TimevalTest, SetToMaxIsTheLargestInstant) {
     EXPECT_EQ("2147483647:999999", str(t));
 }
 
+// A function of one text, an instant and a number, that gives the sum.
+template <typename Number>
+auto sumOf(void (Timeval::*add)(Number)) {
+    return [add](const std::string& text) {
+        long long seconds = 0, microseconds = 0;
+        unsigned long long number = 0;
+        EXPECT_EQ(3,
+                  std::sscanf(text.c_str(), "%lld:%lld + %llu", &seconds, &microseconds, &number));
+        Timeval sum = at(seconds, microseconds);
+        (sum.*add)(static_cast<Number>(number));
+        return str(sum);
+    };
+}
+
 TEST(TimevalTest, AddSecSaturates) {
-    const struct {
-        Timeval start;
-        unsigned secs;
-        const char* expected;
-    } rows[] = {{at(0, 0), 0, "0:0"},
-                {at(1, 2), 3, "4:2"},
-                {at(0, 5), 2147483647u, "2147483647:5"},
-                {at(0, 5), 2147483648u, "2147483647:999999"},
-                {at(MAX_SEC, 5), 0, "2147483647:5"},
-                {at(MAX_SEC, 5), 1, "2147483647:999999"},
-                {at(1, 0), UINT_MAX, "2147483647:999999"},
-                {at(-5, 0), 3000000000u, "2147483647:999999"},
-                {at(-2000000000, 9), 3000000000u, "1000000000:9"},
-                {at(-2147483648LL, 9), UINT_MAX, "2147483647:9"},
-                // An instant that only a 64-bit time_t holds.
-                {at(MAX_SEC + 1, 0), 0, "2147483647:999999"}};
-    for (const auto& row : rows) {
-        Timeval t = row.start;
-        t.addSec(row.secs);
-        EXPECT_EQ(row.expected, str(t)) << str(row.start) << " + " << row.secs;
-    }
+    expectEach(
+        sumOf(&Timeval::addSec),
+        {"1:2 + 3 > 4:2", "0:5 + 2147483647 > 2147483647:5", "0:5 + 2147483648 > 2147483647:999999",
+         "2147483647:5 + 0 > 2147483647:5", "2147483647:5 + 1 > 2147483647:999999",
+         "-2000000000:9 + 3000000000 > 1000000000:9", "-2147483648:9 + 4294967295 > 2147483647:9"});
+    // An instant that only a 64-bit time_t holds.
+    expectEach(sumOf(&Timeval::addSec), {"2147483648:0 + 0 > 2147483647:999999"});
 }
 
 TEST(TimevalTest, AddMsecCarriesAndSaturates) {
-    const struct {
-        Timeval start;
-        unsigned long long msecs;
-        const char* expected;
-    } rows[] = {{at(0, 0), 0, "0:0"},
-                {at(0, 0), 1, "0:1000"},
-                {at(7, 250000), 1500, "8:750000"},
-                {at(7, 999999), 999, "8:998999"},
-                {at(7, 999000), 1, "8:0"},
-                {at(7, 998999), 1, "7:999999"},
-                {at(0, 0), 2147483646999ULL, "2147483646:999000"},
-                {at(0, 0), 2147483647000ULL, "2147483647:999999"},
-                {at(-100, 0), 2147483647000ULL, "2147483647:999999"},
-                {at(0, 0), ULLONG_MAX, "2147483647:999999"},
-                {at(1, 1000), 2147483646999ULL, "2147483647:999999"},
-                {at(0, 1000), 2147483646999ULL, "2147483647:0"},
-                {at(MAX_SEC, 999999), 0, "2147483647:999999"},
-                {at(MAX_SEC, 0), 999, "2147483647:999000"},
-                {at(MAX_SEC, 1000), 999, "2147483647:999999"},
-                {at(MAX_SEC, 999999), 1, "2147483647:999999"},
-                {at(-1, 999999), 1, "0:999"}};
-    for (const auto& row : rows) {
-        Timeval t = row.start;
-        t.addMsec(row.msecs);
-        EXPECT_EQ(row.expected, str(t)) << str(row.start) << " + " << row.msecs;
-    }
+    expectEach(
+        sumOf(&Timeval::addMsec),
+        {"0:0 + 1 > 0:1000", "7:999999 + 999 > 8:998999", "7:999000 + 1 > 8:0",
+         "0:0 + 2147483646999 > 2147483646:999000", "0:0 + 2147483647000 > 2147483647:999999",
+         "-100:0 + 2147483647000 > 2147483647:999999", "1:1000 + 2147483646999 > 2147483647:999999",
+         "0:1000 + 2147483646999 > 2147483647:0", "2147483647:999999 + 1 > 2147483647:999999",
+         "-1:999999 + 1 > 0:999", "0:0 + 18446744073709551615 > 2147483647:999999"});
 }
 
 TEST(TimevalTest, AddMsecAssertsThatTheMicrosecondsWereInRange) {
@@ -198,97 +182,62 @@ TEST(TimevalTest, OrdersBySecondsThenMicroseconds) {
     }
 }
 
+// A function of one text, two instants, that gives their difference.
+template <typename Result>
+auto differenceOf(Result (*difference)(const Timeval&, const Timeval&)) {
+    return [difference](const std::string& text) {
+        long long values[4] = {};
+        EXPECT_EQ(4, std::sscanf(text.c_str(), "%lld:%lld - %lld:%lld", &values[0], &values[1],
+                                 &values[2], &values[3]));
+        std::ostringstream out;
+        out << difference(at(values[0], values[1]), at(values[2], values[3]));
+        return out.str();
+    };
+}
+
 TEST(TimevalTest, MsecDifferenceRoundsTheSubSecondPartUp) {
-    const struct {
-        Timeval a, b;
-        long long expected;
-    } rows[] = {
-        {at(5, 5), at(5, 5), 0},
-        {at(5, 6), at(5, 5), 1},
-        {at(5, 1005), at(5, 5), 1},
-        {at(5, 1006), at(5, 5), 2},
-        {at(10, 0), at(9, 999999), 1},
-        {at(10, 0), at(8, 0), 2000},
-        {at(10, 0), at(8, 999000), 1001},
-        // A second is borrowed and its rest rounded up: less than a millisecond earlier is 0.
-        {at(5, 5), at(5, 6), 0},
-        {at(5, 0), at(5, 999), 0},
-        {at(5, 0), at(5, 1000), -1},
-        {at(5, 0), at(5, 1001), -1},
-        {at(8, 0), at(10, 0), -2000},
-        {at(MAX_SEC, 999999), at(-2147483648LL, 0), 4294967296000LL},
-        {at(-2147483648LL, 0), at(MAX_SEC, 999999), -4294967295999LL}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::msecDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
+    const auto msecs = differenceOf(&Timeval::msecDifference);
+    expectEach(msecs, {"5:5 - 5:5 > 0", "5:6 - 5:5 > 1", "5:1005 - 5:5 > 1", "5:1006 - 5:5 > 2",
+                       "10:0 - 9:999999 > 1", "10:0 - 8:0 > 2000", "10:0 - 8:999000 > 1001",
+                       "2147483647:999999 - -2147483648:0 > 4294967296000"});
+    // A second is borrowed and its rest rounded up: less than a millisecond earlier is 0.
+    expectEach(msecs, {"5:5 - 5:6 > 0", "5:0 - 5:999 > 0", "5:0 - 5:1000 > -1", "5:0 - 5:1001 > -1",
+                       "8:0 - 10:0 > -2000", "-2147483648:0 - 2147483647:999999 > -4294967295999"});
 }
 
 TEST(TimevalTest, UsecDifferenceCountsTheSubSecondPartInMilliseconds) {
-    const struct {
-        Timeval a, b;
-        long long expected;
-    } rows[] = {{at(1, 500000), at(0, 0), 1000500},
-                {at(0, 2500), at(0, 0), 2},
-                {at(0, 999), at(0, 0), 0},
-                {at(0, 1000), at(0, 0), 1},
-                {at(1, 0), at(0, 1), 999},
-                {at(5, 5), at(5, 5), 0},
-                {at(0, 0), at(0, 1), -999001},
-                {at(0, 0), at(1, 500000), -1999500},
-                {at(MAX_SEC, 999999), at(-2147483648LL, 0), 4294967295000999LL}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::usecDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
+    expectEach(
+        differenceOf(&Timeval::usecDifference),
+        {"1:500000 - 0:0 > 1000500", "0:2500 - 0:0 > 2", "0:999 - 0:0 > 0", "0:1000 - 0:0 > 1",
+         "1:0 - 0:1 > 999", "5:5 - 5:5 > 0", "0:0 - 0:1 > -999001", "0:0 - 1:500000 > -1999500",
+         "2147483647:999999 - -2147483648:0 > 4294967295000999"});
 }
 
 TEST(TimevalTest, DescribesADifferenceInItsUnit) {
-    const struct {
-        Timeval a, b;
-        const char* expected;
-    } rows[] = {{at(5, 5), at(5, 5), "0 microseconds"},
-                {at(0, 999), at(0, 0), "0 microseconds"},
-                {at(0, 1000), at(0, 0), "1 microsecond"},
-                {at(0, 2500), at(0, 0), "2 microseconds"},
-                {at(0, 999999), at(0, 0), "999 microseconds"},
-                // From a second on the count is above 3000.
-                {at(1, 0), at(0, 0), "1000 milliseconds"},
-                {at(1, 500000), at(0, 0), "1000 milliseconds"},
-                {at(2, 999000), at(0, 0), "2000 milliseconds"},
-                {at(2, 2000), at(1, 1000), "1000 milliseconds"},
-                {at(3, 0), at(0, 0), "3000 milliseconds"},
-                {at(3, 1), at(0, 1), "3000.0 milliseconds"},
-                {at(1, 1), at(0, 0), "1000.0 milliseconds"},
-                {at(1, 500), at(0, 500), "1000.0 milliseconds"},
-                {at(1, 999000), at(0, 1), "1001.0 milliseconds"},
-                {at(3, 1000), at(0, 0), "3.000 seconds"},
-                {at(5, 0), at(0, 0), "5.000 seconds"},
-                {at(9, 0), at(0, 0), "9.000 seconds"},
-                {at(10, 0), at(0, 0), "10.00 seconds"},
-                {at(99, 0), at(0, 0), "99.00 seconds"},
-                {at(100, 0), at(0, 0), "100.0 seconds"},
-                {at(8000, 0), at(0, 0), "8000.0 seconds"},
-                {at(8000, 1000), at(0, 0), "2.222 hours"},
-                {at(35819, 0), at(0, 0), "9.950 hours"},
-                {at(35820, 0), at(0, 0), " 9.95 hours"},
-                {at(36000, 0), at(0, 0), "10.00 hours"},
-                {at(358199, 0), at(0, 0), "99.50 hours"},
-                {at(358200, 0), at(0, 0), " 99.5 hours"},
-                {at(36000000, 0), at(0, 0), "10000.0 hours"},
-                {at(MAX_SEC, 999999), at(-2147483648LL, 0), "1193046.5 hours"},
-                // An earlier instant has a sign, even before the blanks that fill the field.
-                {at(5, 0), at(5, 1), "-0 microseconds"},
-                {at(5, 0), at(5, 1000), "-1 microsecond"},
-                {at(0, 0), at(2, 0), "-2000 milliseconds"},
-                {at(0, 0), at(5, 0), "-5.000 seconds"},
-                {at(0, 0), at(36000, 0), "-10.00 hours"},
-                {at(0, 0), at(35820, 0), "- 9.95 hours"},
-                {at(0, 0), at(358200, 0), "- 99.5 hours"}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::describeDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
+    const auto text = differenceOf(&Timeval::describeDifference);
+    expectEach(text, {"5:5 - 5:5 > 0 microseconds", "0:999 - 0:0 > 0 microseconds",
+                      "0:1000 - 0:0 > 1 microsecond", "0:2500 - 0:0 > 2 microseconds",
+                      "0:999999 - 0:0 > 999 microseconds"});
+    // From a second on the count is above 3000.
+    expectEach(text, {"1:0 - 0:0 > 1000 milliseconds", "1:500000 - 0:0 > 1000 milliseconds",
+                      "2:999000 - 0:0 > 2000 milliseconds", "2:2000 - 1:1000 > 1000 milliseconds",
+                      "3:0 - 0:0 > 3000 milliseconds", "3:1 - 0:1 > 3000.0 milliseconds",
+                      "1:1 - 0:0 > 1000.0 milliseconds", "1:500 - 0:500 > 1000.0 milliseconds",
+                      "1:999000 - 0:1 > 1001.0 milliseconds"});
+    expectEach(text, {"3:1000 - 0:0 > 3.000 seconds", "5:0 - 0:0 > 5.000 seconds",
+                      "9:0 - 0:0 > 9.000 seconds", "10:0 - 0:0 > 10.00 seconds",
+                      "99:0 - 0:0 > 99.00 seconds", "100:0 - 0:0 > 100.0 seconds",
+                      "8000:0 - 0:0 > 8000.0 seconds"});
+    expectEach(text, {"8000:1000 - 0:0 > 2.222 hours", "35819:0 - 0:0 > 9.950 hours",
+                      "35820:0 - 0:0 >  9.95 hours", "36000:0 - 0:0 > 10.00 hours",
+                      "358199:0 - 0:0 > 99.50 hours", "358200:0 - 0:0 >  99.5 hours",
+                      "36000000:0 - 0:0 > 10000.0 hours",
+                      "2147483647:999999 - -2147483648:0 > 1193046.5 hours"});
+    // An earlier instant has a sign, even before the blanks that fill the field.
+    expectEach(text, {"5:0 - 5:1 > -0 microseconds", "5:0 - 5:1000 > -1 microsecond",
+                      "0:0 - 2:0 > -2000 milliseconds", "0:0 - 5:0 > -5.000 seconds",
+                      "0:0 - 36000:0 > -10.00 hours", "0:0 - 35820:0 > - 9.95 hours",
+                      "0:0 - 358200:0 > - 99.5 hours"});
 }
 
 TEST(TimevalTest, SinceIsTheDifferenceFromNow) {
