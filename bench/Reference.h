@@ -1,12 +1,9 @@
 #ifndef QUELTA_BENCH_REFERENCE_H_
 #define QUELTA_BENCH_REFERENCE_H_
 
-// Two slow matchers, each written from its rules, against which every peer's answers are checked
-// before it is timed.
-//
-// They differ in the last segment of a pattern such as "*aa". The rules of this system search for
-// it from left to right without overlap, so "*aa" does not match "aaa"; the usual meaning of a
-// star, which the libraries share, only asks that the text end with it.
+// The answers of the slow matcher of the tests, against which every peer is checked before it is
+// timed. The libraries give a star its usual meaning, which differs in the last segment; see
+// support/MatcherOracle.h.
 
 #include <string>
 #include <string_view>

@@ -1,5 +1,5 @@
 // Numbers and truth values as text: ltoa, getLong, getDouble, toBool and bool2str, against versions
-// that count in 128 bits or go another way.
+// that count in 128 bits or work differently.
 
 #include <algorithm>
 #include <cctype>
@@ -41,7 +41,7 @@ Number longSlowly(const std::string& text) {
     const std::size_t start = at;
     Wide value = 0;
     for (; at < text.size() && isDigit(text[at]); ++at) {
-        // One digit more than 64 bits hold is enough to know that it does not fit.
+        // One digit more than fits in 64 bits is enough.
         value = std::min<Wide>(value * 10 + (text[at] - '0'), Wide(MOST) * 10);
     }
     if (at == start) {
@@ -58,7 +58,7 @@ void checkLong(const std::string& text) {
     errno = EINTR;
     checkEqual("getLong", expected.value, getLong(text, successful));
     checkEqual("getLong's success", expected.successful, successful);
-    checkEqual("errno behind getLong", 0, errno);
+    checkEqual("errno after getLong", 0, errno);
 }
 
 void checkLtoa(long value) {
@@ -72,7 +72,7 @@ void checkLtoa(long value) {
     checkLong(expected);
 }
 
-// Whether the text is digits, a fraction and an exponent, with a '-' at most: what both strtod and
+// Whether the text is an optional '-', digits, a fraction and an exponent, which strtod and
 // from_chars read in the same way.
 bool isPlainNumber(const std::string& text) {
     std::size_t at = text.substr(0, 1) == "-" ? 1 : 0;

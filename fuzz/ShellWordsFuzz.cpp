@@ -1,4 +1,4 @@
-// Shell words: the input as a line to take apart, and as a path to quote and get back.
+// Shell words: the input as a line to split, and as a path to quote and get back.
 
 #include <string>
 
@@ -12,7 +12,7 @@ namespace {
 
 using fuzz::checkEqual;
 
-// Takes the line apart word by word, with the slow version beside.
+// Splits the line word by word, and compares each step with the slow version.
 void checkSplit(std::string line) {
     for (bool found = true; found;) {
         std::string slowWord;
@@ -35,8 +35,8 @@ void checkRoundTrip(const std::string& text) {
     std::string rest = "before";
     const bool found = Pathname::splitArgShellQuoted(quoted + " next", word, rest);
     checkEqual("whether the quoted path is a word", !text.empty(), found);
-    checkEqual("path behind quoting and splitting", text, word);
-    checkEqual("rest behind the quoted path", text.empty() ? "before" : " next", rest);
+    checkEqual("path after quoting and splitting", text, word);
+    checkEqual("rest after the quoted path", text.empty() ? "before" : " next", rest);
 }
 
 }  // namespace

@@ -29,7 +29,7 @@ std::string lowerSlowly(const std::string& text) {
     return lower;
 }
 
-// Replaces by walking over `searched`, which stands at the same offsets as `text`.
+// Replaces by walking over `searched`, which has the same offsets as `text`.
 std::string replaceSlowly(const std::string& text, const std::string& searched,
                           const std::string& find, const std::string& replace) {
     std::string result;
@@ -110,7 +110,7 @@ void checkCopies(const std::string& text) {
     checkEqual("lowercase in place", expected, inPlace);
 }
 
-// Lines of at most `bufSize - 2` bytes; the buffer has exactly the size that is told.
+// Lines of at most `bufSize - 2` bytes; the buffer has exactly `bufSize` bytes.
 void checkLines(std::string bytes, std::size_t bufSize) {
     if (bytes.empty()) {
         return;
@@ -147,7 +147,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     std::string out = "kept";
     getPunct(bytes, out, limit);
     checkEqual("getPunct", "kept" + punctSlowly(bytes, limit), out);
-    // A NUL where the buffer ends reads as a line that fits; such lines are left out.
+    // A NUL at the end of the buffer looks like a line that fits, so lines with a NUL are left out.
     checkLines(text, 3 + find.size());
     checkEqual("pad", std::string(4 * find.size(), ' '), pad(static_cast<unsigned>(find.size())));
     return 0;

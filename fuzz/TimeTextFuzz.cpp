@@ -26,7 +26,7 @@ bool isDigit(char c) {
     return c >= '0' && c <= '9';
 }
 
-// The digits from `at` on, which is left behind them.
+// Returns: the digits starting at `at`; leaves `at` after them.
 std::string takeDigits(const std::string& text, std::size_t& at) {
     std::string digits;
     while (at < text.size() && isDigit(text[at])) {

@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
-#include <exception>
 #include <memory>
 #include <new>
 
@@ -18,17 +17,9 @@ namespace {
 constexpr char ELLIPSE_BREAKERS[] = " ,;-#$%&+./:=?@'|*(){}<>[]^!";
 static_assert(sizeof ELLIPSE_BREAKERS - 1 == 28);
 char BREAKER_MAP[256];  // built by the first getPunct
-bool initd = false;     // whether it has been
+bool initd = false;     // whether BREAKER_MAP is built
 
-// copystr serves static objects of every unit, and so may run before this unit's logger is made and
-// after it is gone.
-constinit bool loggerExists = false;
-struct ModuleLogger {
-    Logger logger{"DCUtils"};
-    ModuleLogger() { loggerExists = true; }
-    ~ModuleLogger() { loggerExists = false; }
-};
-ModuleLogger moduleLogger;
+Logger logger("DCUtils");
 
 // The functions of <cctype> take a byte's unsigned value.
 bool isSpace(char c) {
@@ -52,11 +43,8 @@ char* copystr(const char* input) {
     const std::size_t size = std::strlen(input) + 1;
     char* const copy = new (std::nothrow) char[size];
     if (copy == nullptr) {
-        if (loggerExists) {
-            moduleLogger.logger.error(
-                "Could not allocate space for string of size %lu in DCUtils::copystr",
-                static_cast<unsigned long>(size));
-        }
+        logger.error("Could not allocate space for string of size %lu in DCUtils::copystr",
+                     static_cast<unsigned long>(size));
         throw std::bad_alloc();
     }
     std::memcpy(copy, input, size);
@@ -135,7 +123,7 @@ char* replaceString(const char* text, const char* find, const char* replace) {
     }
     const std::unique_ptr<char[]> lower(lowercase(text));
     std::string result;
-    const char* searched = lower.get();  // stands at the same offset as `rest`
+    const char* searched = lower.get();  // at the same offset as `rest`
     const char* rest = text;
     while (const char* const found = std::strstr(searched, find)) {
         result.append(rest, static_cast<std::size_t>(found - searched));
@@ -164,8 +152,8 @@ char* substituteEnvs(const char* inStr) {
         while (isNameCharacter(*p)) {
             ++p;
         }
-        // No name, or a name that is not set: nothing takes the place.
-        // NOLINTNEXTLINE(concurrency-mt-unsafe): nobody changes the environment beside this
+        // An empty or unset name is replaced by nothing.
+        // NOLINTNEXTLINE(concurrency-mt-unsafe): no other thread changes the environment
         if (const char* const value = std::getenv(std::string(name, p).c_str())) {
             result += value;
         }
@@ -190,12 +178,7 @@ void getPunct(const std::string& text, std::string& out, unsigned max_len) {
         initMap(BREAKER_MAP, ELLIPSE_BREAKERS);
         initd = true;
     }
-    try {
-        out.reserve(out.size() + 2 * std::size_t{max_len} + 1);  // an item takes two at most
-    } catch (const std::exception&) {
-        // A limit far beyond the text needs no such room.
-    }
-
+    out.reserve(out.size() + 2 * std::size_t{max_len} + 1);  // an item is two characters at most
     unsigned items = 0;
     for (const char* p = text.c_str(); *p != '\0' && *p != '\n' && items < max_len; ++p) {
         const char entry = BREAKER_MAP[static_cast<unsigned char>(*p)];
@@ -227,7 +210,7 @@ bool toBool(const char* str) {
 }
 
 char* ltoa(char* buf, long val, int* len) {
-    // Negated as an unsigned number, since the most negative long has no positive counterpart.
+    // Negated as an unsigned number, because LONG_MIN has no positive counterpart.
     unsigned long magnitude = static_cast<unsigned long>(val);
     char* first = buf;
     if (val < 0) {

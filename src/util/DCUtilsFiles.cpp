@@ -3,6 +3,7 @@
 #include <cstring>
 #include <memory>
 #include <new>
+#include <utility>
 
 #include "util/DCUtils.h"
 #include "util/ErrnoKeeper.h"
@@ -17,40 +18,6 @@ struct FileCloser {
     }
 };
 using OpenFile = std::unique_ptr<FILE, FileCloser>;
-
-using Text = std::unique_ptr<char[]>;
-
-// A longer array with the first `used` bytes of `text`; null when memory is exhausted.
-Text enlarged(const Text& text, std::size_t used, std::size_t capacity) {
-    Text larger(new (std::nothrow) char[capacity]);
-    if (larger != nullptr) {
-        std::copy_n(text.get(), used, larger.get());
-    }
-    return larger;
-}
-
-// The file's bytes and a NUL, in an array of `capacity` bytes that grows when the file does; null
-// when memory is exhausted.
-Text readToEnd(FILE* f, std::size_t capacity) {
-    Text text = enlarged(nullptr, 0, capacity);
-    std::size_t used = 0;
-    int c = text == nullptr ? EOF : std::getc(f);
-    while (c != EOF) {
-        if (used + 1 == capacity) {
-            capacity *= 2;
-            text = enlarged(text, used, capacity);
-            if (text == nullptr) {
-                return nullptr;
-            }
-        }
-        text[used++] = static_cast<char>(c);
-        c = std::getc(f);
-    }
-    if (text != nullptr) {
-        text[used] = '\0';
-    }
-    return text;
-}
 
 }  // namespace
 
@@ -87,9 +54,23 @@ char* readText(const Pathname& filename) {
     if (file == nullptr || !filename.getSize(&size)) {
         return nullptr;
     }
-    Text text = readToEnd(file.get(), static_cast<std::size_t>(size) + 1);
+    auto capacity = static_cast<std::size_t>(size);  // bytes without the NUL
+    std::unique_ptr<char[]> text(new (std::nothrow) char[capacity + 1]);
     if (text == nullptr) {
         std::printf("Unable to alloc %lld for reading file %s\n", size, filename.c_str());
+        return nullptr;
     }
+    std::size_t used = 0;
+    for (int c = std::getc(file.get()); c != EOF; c = std::getc(file.get())) {
+        if (used == capacity) {
+            // Files in /proc, pipes and growing files are longer than their size.
+            capacity = 2 * capacity + 1;
+            std::unique_ptr<char[]> larger(new char[capacity + 1]);
+            std::copy_n(text.get(), used, larger.get());
+            text = std::move(larger);
+        }
+        text[used++] = static_cast<char>(c);
+    }
+    text[used] = '\0';
     return text.release();
 }

@@ -17,7 +17,7 @@ namespace {
 
 // The one loop that completes a transfer: `call(done, remaining)` is one system call.
 template <typename Call>
-ssize_t transferAll(unsigned long len, Call call) noexcept {
+ssize_t transferAll(unsigned long len, Call call) {
     unsigned long done = 0;
     for (;;) {
         const ssize_t count = call(done, len - done);
@@ -34,23 +34,23 @@ ssize_t transferAll(unsigned long len, Call call) noexcept {
 
 }  // namespace
 
-ssize_t FileDescriptor::read(void* buf, unsigned long len) const noexcept {
+ssize_t FileDescriptor::read(void* buf, unsigned long len) const {
     return transferAll(len, [this, buf](unsigned long done, unsigned long remaining) {
         return ::read(_osdep, static_cast<char*>(buf) + done, remaining);
     });
 }
 
-ssize_t FileDescriptor::write(const void* buf, unsigned long len) const noexcept {
+ssize_t FileDescriptor::write(const void* buf, unsigned long len) const {
     return transferAll(len, [this, buf](unsigned long done, unsigned long remaining) {
         return ::write(_osdep, static_cast<const char*>(buf) + done, remaining);
     });
 }
 
-ssize_t FileDescriptor::write(const std::string& text) const noexcept {
+ssize_t FileDescriptor::write(const std::string& text) const {
     return write(text.data(), text.size());
 }
 
-ssize_t FileDescriptor::writev(const struct iovec* buffers, unsigned int count) const noexcept {
+ssize_t FileDescriptor::writev(const struct iovec* buffers, unsigned int count) const {
     return ::writev(_osdep, buffers, static_cast<int>(count));
 }
 
@@ -78,16 +78,11 @@ void FileDescriptor::vformat(const char* fmt, std::va_list args) const {
 void FileDescriptor::format(const char* fmt, ...) const {
     std::va_list args;
     va_start(args, fmt);
-    try {
-        vformat(fmt, args);
-    } catch (...) {
-        va_end(args);
-        throw;
-    }
+    vformat(fmt, args);
     va_end(args);
 }
 
-void FileDescriptor::setCloseOnExec(bool on) const noexcept {
+void FileDescriptor::setCloseOnExec(bool on) const {
     const int flags = ::fcntl(_osdep, F_GETFD);
     if (flags < 0) {
         return;
@@ -98,11 +93,11 @@ void FileDescriptor::setCloseOnExec(bool on) const noexcept {
     }
 }
 
-bool FileDescriptor::stat(struct stat* result) const noexcept {
+bool FileDescriptor::stat(struct stat* result) const {
     return ::fstat(_osdep, result) == 0;
 }
 
-bool FileDescriptor::getSize(long long* size) const noexcept {
+bool FileDescriptor::getSize(long long* size) const {
     struct stat info;
     if (!stat(&info)) {
         return false;
@@ -111,23 +106,23 @@ bool FileDescriptor::getSize(long long* size) const noexcept {
     return true;
 }
 
-bool FileDescriptor::seek_set(long long offset) const noexcept {
+bool FileDescriptor::seek_set(long long offset) const {
     return ::lseek(_osdep, offset, SEEK_SET) != -1;
 }
 
-long long FileDescriptor::seekEof() const noexcept {
+long long FileDescriptor::seekEof() const {
     return ::lseek(_osdep, 0, SEEK_END);
 }
 
-long long FileDescriptor::curPos() const noexcept {
+long long FileDescriptor::curPos() const {
     return ::lseek(_osdep, 0, SEEK_CUR);
 }
 
-void FileDescriptor::sync() const noexcept {
+void FileDescriptor::sync() const {
     static_cast<void>(::fsync(_osdep));
 }
 
-bool FileDescriptor::copyTo(FileDescriptor dest) const noexcept {
+bool FileDescriptor::copyTo(FileDescriptor dest) const {
     char chunk[8192];
     for (;;) {
         const ssize_t length = read(chunk, sizeof chunk);
@@ -157,7 +152,7 @@ bool FileDescriptor::copyTo(const Pathname& dest) const {
     return copy.valid() && copyTo(copy);
 }
 
-bool FileDescriptor::close() noexcept {
+bool FileDescriptor::close() {
     if (!valid()) {
         return true;
     }
@@ -166,7 +161,7 @@ bool FileDescriptor::close() noexcept {
     return closed;
 }
 
-void FileDescriptor::close_saveErrno() noexcept {
+void FileDescriptor::close_saveErrno() {
     const ErrnoKeeper keeper;
     close();
 }
@@ -174,7 +169,7 @@ void FileDescriptor::close_saveErrno() noexcept {
 ScopedFileDescriptor::ScopedFileDescriptor(const Pathname& path)
     : FileDescriptor(path.openReadOnly()) {}
 
-ScopedFileDescriptor& ScopedFileDescriptor::operator=(const FileDescriptor& other) noexcept {
+ScopedFileDescriptor& ScopedFileDescriptor::operator=(const FileDescriptor& other) {
     if (this != &other) {
         close_saveErrno();
         FileDescriptor::operator=(other);
@@ -182,15 +177,14 @@ ScopedFileDescriptor& ScopedFileDescriptor::operator=(const FileDescriptor& othe
     return *this;
 }
 
-ScopedFileDescriptor& ScopedFileDescriptor::operator=(const ScopedFileDescriptor& other) noexcept {
+ScopedFileDescriptor& ScopedFileDescriptor::operator=(const ScopedFileDescriptor& other) {
     return *this = static_cast<const FileDescriptor&>(other);
 }
 
 ScopedSaferFileDescriptor::ScopedSaferFileDescriptor(const Pathname& path)
     : FileDescriptor(path.openReadOnlySafer()) {}
 
-ScopedSaferFileDescriptor& ScopedSaferFileDescriptor::operator=(
-    const FileDescriptor& other) noexcept {
+ScopedSaferFileDescriptor& ScopedSaferFileDescriptor::operator=(const FileDescriptor& other) {
     if (this != &other) {
         close_saveErrno();
         FileDescriptor::operator=(other);
@@ -199,6 +193,6 @@ ScopedSaferFileDescriptor& ScopedSaferFileDescriptor::operator=(
 }
 
 ScopedSaferFileDescriptor& ScopedSaferFileDescriptor::operator=(
-    const ScopedSaferFileDescriptor& other) noexcept {
+    const ScopedSaferFileDescriptor& other) {
     return *this = static_cast<const FileDescriptor&>(other);
 }

@@ -1,13 +1,13 @@
 #ifndef QUELTA_UTIL_FILEDESCRIPTOR_H_
 #define QUELTA_UTIL_FILEDESCRIPTOR_H_
 
-// A POSIX file descriptor as a value. Files are opened by the open operations of Pathname, which
-// is why this header brings paths along.
+// A POSIX file descriptor as a value. Files are opened with Pathname's open operations, so this
+// header includes Pathname.h.
 //
 // The plain class copies the number, owns nothing and never closes by itself; the two scoped
 // classes close at the end of their scope. Any negative number means "no file". Every failure is a
-// result (-1, 0 or false) with errno as the system call left it; nothing is thrown or logged but
-// by the allocation of a long formatted text.
+// result (-1, 0 or false) with errno as the system call left it; nothing is logged, and only the
+// allocation of a long formatted text can throw.
 // Not thread-safe; one thread at a time per object. Several threads may use one open file as far as
 // the operating system allows.
 
@@ -22,105 +22,109 @@
 
 class FileDescriptor {
 public:
-    // Takes an open descriptor's number, or a negative one for no file. Implicit, so that a number
-    // serves wherever a descriptor is taken.
+    // Takes the number of an open descriptor, or a negative one for no file. Implicit, so that a
+    // number can be passed where a descriptor is expected.
     FileDescriptor(int descriptor) noexcept : _osdep(descriptor) {}
 
-    // Returns: whether this stands for a file.
+    // Returns: whether there is a file.
     [[nodiscard]] bool valid() const noexcept { return _osdep >= 0; }
 
-    // Reads or writes `len` bytes with as many calls as it takes, at least one, again after each
-    // interruption by a signal.
-    // Returns: the bytes transferred. Fewer than `len` mean end of file, or an error after these
-    // bytes; 0 means end of file or that nothing was written; -1 an error before the first byte.
-    // Deliberate: an error that follows some bytes is not reported; the next call will meet it.
-    [[nodiscard]] ssize_t read(void* buf, unsigned long len) const noexcept;
-    [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const noexcept;
-    [[nodiscard]] ssize_t write(const std::string& text) const noexcept;
+    // Reads or writes `len` bytes with as many calls as necessary, at least one. A call that a
+    // signal interrupts is repeated.
+    // Returns: the number of bytes transferred. Fewer than `len` mean end of file, or an error
+    // after these bytes; 0 means end of file or that nothing was written; -1 means an error before
+    // the first byte.
+    // Deliberate: an error after some bytes is not reported; the next call will meet it.
+    [[nodiscard]] ssize_t read(void* buf, unsigned long len) const;
+    [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const;
+    [[nodiscard]] ssize_t write(const std::string& text) const;
     // Writes `count` buffers with a single call.
-    // Returns: the call's result: bytes written, perhaps fewer than given, or -1.
-    [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const noexcept;
+    // Returns: the number of bytes written, which may be fewer than given, or -1.
+    [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const;
 
-    // Writes a text in printf's notation. Write errors are not reported.
-    // Errors: std::bad_alloc for a text beyond 255 bytes when memory is exhausted.
+    // Formats like printf and writes the text. Write errors are not reported.
+    // Errors: std::bad_alloc if memory is exhausted by a text of more than 255 bytes.
     // Cost: no allocation up to 255 bytes.
     void vformat(const char* fmt, std::va_list args) const __attribute__((format(printf, 2, 0)));
     void format(const char* fmt, ...) const __attribute__((format(printf, 2, 3)));
 
     // Makes the descriptor close (or stay open) when the process executes another program; does
-    // nothing when it cannot or when it is so already.
-    void setCloseOnExec(bool on) const noexcept;
+    // nothing if the flag is already so or cannot be changed.
+    void setCloseOnExec(bool on) const;
 
-    // Replaces *result by what fstat tells.
-    [[nodiscard]] bool stat(struct stat* result) const noexcept;
+    // Fills *result by fstat.
+    [[nodiscard]] bool stat(struct stat* result) const;
     // Replaces *size by the file's size in bytes.
-    // Errors: false, and *size as it was.
-    [[nodiscard]] bool getSize(long long* size) const noexcept;
+    // Errors: false, and *size is unchanged.
+    [[nodiscard]] bool getSize(long long* size) const;
     // Moves to an offset in bytes from the start of the file.
-    bool seek_set(long long offset) const noexcept;
+    bool seek_set(long long offset) const;
     // Moves to the end of the file.
     // Returns: the offset of the end, in bytes, or -1.
-    long long seekEof() const noexcept;
+    long long seekEof() const;
     // Returns: the offset in bytes from the start of the file, or -1.
-    [[nodiscard]] long long curPos() const noexcept;
+    [[nodiscard]] long long curPos() const;
     // Waits until the file's data are on its device.
-    void sync() const noexcept;
+    void sync() const;
 
-    // Copies from the current offset to the end of the file, and stops at the first failure; the
-    // destination then stays as far as it got.
-    // Errors: false with errno; ENOSPC when the destination takes no more.
+    // Copies from the current offset to the end of the file, and stops at the first failure; what
+    // was copied by then stays.
+    // Errors: false with errno; ENOSPC if a write of the destination returns 0.
     // Cost: 8192 bytes of stack, no heap.
-    bool copyTo(FileDescriptor dest) const noexcept;
-    // The same into a file that is created with this one's permission bits, or emptied first; it
+    bool copyTo(FileDescriptor dest) const;
+    // The same into a file that is created with this one's permission bits, or emptied first. It
     // must not be the file that is read.
     bool copyTo(const Pathname& dest) const;
 
-    // Closes the descriptor; does nothing and returns true when there is none.
-    // Returns: whether the call returned 0. The descriptor is -1 afterwards in any case, as it is
-    // released even when the call was interrupted.
-    bool close() noexcept;
+    // Closes the descriptor; does nothing and returns true if there is none.
+    // Returns: whether the call returned 0. The descriptor is -1 afterwards in any case, because
+    // the system releases it even if the call is interrupted.
+    bool close();
 
 protected:
-    // Closes the descriptor and leaves errno as it was.
-    void close_saveErrno() noexcept;
+    // Closes the descriptor and restores errno.
+    void close_saveErrno();
 
     int _osdep;  // the operating system's number; negative for no file
 };
 
 // Owns its descriptor: closes it at destruction and before it takes another by assignment.
 //
-// Deliberate: copying and assigning share the number, and each owner closes it. So a copy must
-// not outlive the intent; nothing here copies one. Assignment to itself changes nothing, but what
-// counts is the object: another object with the same number is closed first, too.
+// Deliberate: copying and assigning share the number, and each owner closes it. So do not copy one;
+// nothing in this library does. Self-assignment is a no-op, but only for the same object: assigning
+// another object with the same number closes that number first.
 class ScopedFileDescriptor : public FileDescriptor {
 public:
     // No file.
-    ScopedFileDescriptor() noexcept : FileDescriptor(-1) {}
-    ScopedFileDescriptor(const ScopedFileDescriptor& other) noexcept = default;
+    ScopedFileDescriptor() : FileDescriptor(-1) {}
+    ScopedFileDescriptor(const ScopedFileDescriptor& other) = default;
+    // Opens the file for reading; not valid() if that fails.
+    ScopedFileDescriptor(const Pathname& path);
     // Takes over an open file.
-    ScopedFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
-    // Opens the file for reading; not valid() when that fails.
-    explicit ScopedFileDescriptor(const Pathname& path);
+    explicit ScopedFileDescriptor(const FileDescriptor& other) : FileDescriptor(other) {}
     ~ScopedFileDescriptor() { close_saveErrno(); }
 
-    ScopedFileDescriptor& operator=(const FileDescriptor& other) noexcept;
-    ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other) noexcept;
+    ScopedFileDescriptor& operator=(const FileDescriptor& other);
+    ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other);
+    // The temporary owner that a path converts to would close what is assigned.
+    ScopedFileDescriptor& operator=(const Pathname& path) = delete;
 };
 
 // The same, but opens its file without blocking, so that a FIFO or device does not hang the caller.
 class ScopedSaferFileDescriptor : public FileDescriptor {
 public:
     // No file.
-    ScopedSaferFileDescriptor() noexcept : FileDescriptor(-1) {}
-    ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) noexcept = default;
+    ScopedSaferFileDescriptor() : FileDescriptor(-1) {}
+    ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) = default;
+    // Opens the file for reading; not valid() if that fails.
+    ScopedSaferFileDescriptor(const Pathname& path);
     // Takes over an open file.
-    ScopedSaferFileDescriptor(const FileDescriptor& other) noexcept : FileDescriptor(other) {}
-    // Opens the file for reading; not valid() when that fails.
-    explicit ScopedSaferFileDescriptor(const Pathname& path);
+    explicit ScopedSaferFileDescriptor(const FileDescriptor& other) : FileDescriptor(other) {}
     ~ScopedSaferFileDescriptor() { close_saveErrno(); }
 
-    ScopedSaferFileDescriptor& operator=(const FileDescriptor& other) noexcept;
-    ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other) noexcept;
+    ScopedSaferFileDescriptor& operator=(const FileDescriptor& other);
+    ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other);
+    ScopedSaferFileDescriptor& operator=(const Pathname& path) = delete;
 };
 
 #endif  // QUELTA_UTIL_FILEDESCRIPTOR_H_

@@ -13,7 +13,7 @@ Pathname& Pathname::operator/=(const std::string& elem) {
     if (elem.empty()) {
         return *this;
     }
-    // Both are read before this path changes, as elem may be this path.
+    // Read both before this path changes, because elem may be this path.
     const size_type length = elem.size();
     const size_type start = std::min(elem.find_first_not_of(sep), length);
     addTrailingSep();
@@ -74,7 +74,8 @@ Pathname Pathname::toParent() const {
 Pathname Pathname::toLeaf() const {
     const size_type last = find_last_not_of(sep);
     if (last == npos) {
-        // Not a copy of `root`, which other units' static objects may find not yet built.
+        // Not a copy of `root`, which may not be constructed yet when other units' static objects
+        // call this.
         return Pathname(&sep, 1);
     }
     const size_type slash = rfind(sep, last);
@@ -89,7 +90,7 @@ std::string Pathname::ext() const {
     if (found == npos || (*this)[found] == sep) {
         return std::string();
     }
-    return substr(found + 1);  // empty behind a '.' at the end
+    return substr(found + 1);  // empty after a '.' at the end
 }
 
 std::string Pathname::basenameWithoutExt() const {
@@ -103,17 +104,17 @@ std::string Pathname::basenameWithoutExt() const {
 void Pathname::removeDotDotSlash() {
     enum State { GROUND, START, GOT_ONE_DOT, GOT_TWO_DOTS };
     State state = START;
-    size_type kept = 0;
-    // What is kept before a ".." ends in '/' or is empty, so the scan goes on in START and one pass
-    // finds what scanning anew after each deletion would.
+    size_type length = 0;
+    // The text before a ".." ends in '/' or is empty, so the scan continues in START, and one pass
+    // finds the same as a new scan after each deletion.
     for (size_type i = 0; i < size(); ++i) {
         const char c = (*this)[i];
         if (c == sep && state == GOT_TWO_DOTS) {
-            kept -= 2;
+            length -= 2;
             state = START;
             continue;
         }
-        (*this)[kept++] = c;
+        (*this)[length++] = c;
         if (c == sep) {
             state = START;
         } else if (c == '.' && state == START) {
@@ -125,10 +126,10 @@ void Pathname::removeDotDotSlash() {
         }
     }
     if (state == GOT_TWO_DOTS) {
-        // The '/' before the dots goes, too, unless it is the whole path that is left.
-        kept -= kept <= 3 ? 2 : 3;
+        // The '/' before the dots is removed too, unless it is all that is left.
+        length -= length <= 3 ? 2 : 3;
     }
-    resize(kept);
+    resize(length);
 }
 
 void Pathname::removeDoubleSeps() {

@@ -4,10 +4,10 @@
 // A file-system path: a string of bytes with '/' between its elements, ordered and compared as the
 // string it is.
 //
-// Three groups of operations: editing, which looks at the text alone and never at a file system;
-// thin wrappers around one system call each, which pass the text unchanged; and quoting for the
-// shell. Wrappers neither throw nor log: they return true when the call returned 0, and leave errno
-// as the call set it.
+// Three groups of operations: editing, which works on the text and never on a file system; thin
+// wrappers around one system call each, which pass the text unchanged; and quoting for the shell.
+// Wrappers neither throw nor log: they return true if the call returned 0, and leave errno as the
+// call set it.
 // Not thread-safe; one thread at a time per object. The static paths are safe to share.
 
 #include <sys/stat.h>
@@ -38,7 +38,7 @@ public:
         MKDIR_WORLD_READ = 3
     };
 
-    // Strings convert without a word, because a path is one; `path` must not be null.
+    // Implicit, because a path is a string; `path` must not be null.
     Pathname() = default;
     Pathname(const char* path) : std::string(path) {}
     Pathname(std::string path) noexcept : std::string(std::move(path)) {}
@@ -60,9 +60,9 @@ public:
     [[nodiscard]] Pathname operator/(const std::string& elem) const;
     [[nodiscard]] Pathname operator/(const char* elem) const;
 
-    // Makes sure of one '/' at the end; the empty path becomes "/".
+    // Ensures that the path ends in '/'; the empty path becomes "/".
     void addTrailingSep();
-    // Drops every '/' at the end but the path's first character.
+    // Removes every trailing '/' except the path's first character.
     void removeTrailingSeps();
     // Removes the last element with the '/' around it: "/a/b/" becomes "/a", "/a" becomes "/", "/"
     // stays. Deliberate: "a" becomes the empty path, not ".".
@@ -70,24 +70,25 @@ public:
     // Returns: what stripElement leaves.
     [[nodiscard]] Pathname toParent() const;
     // Returns: the last element without '/': "b" of "/a/b//".
-    // Deliberate: "/" for the empty path as for one of separators only, so a leaf is never empty.
+    // Deliberate: "/" both for the empty path and for a path of separators only, so a leaf is never
+    // empty.
     [[nodiscard]] Pathname toLeaf() const;
 
-    // Returns: the text behind the last '.' of the last element; empty when there is none, or when
-    // the path ends in '.' or '/'.
+    // Returns: the text after the last '.' of the last element; empty if there is none, or if the
+    // path ends in '.' or '/'.
     // Deliberate: a name's first dot counts (".bashrc" has the extension "bashrc"), though
     // basenameWithoutExt does not cut there.
     [[nodiscard]] std::string ext() const;
-    // Returns: the last element without its last '.' and what follows; empty when the path ends in
+    // Returns: the last element without its last '.' and what follows; empty if the path ends in
     // '/'. Deliberate: a dot that is the element's first character stays (".bashrc"), and a dot at
-    // the end goes ("file." gives "file"), other than in ext.
+    // the end is removed ("file." gives "file"), unlike in ext.
     [[nodiscard]] std::string basenameWithoutExt() const;
 
     // Deletes every ".." element, so that the path cannot climb out of a directory.
     // Deliberate: the element before stays ("a/../b" becomes "a/b"); nothing is resolved.
     // Cost: linear.
     void removeDotDotSlash();
-    // Makes one '/' of each run of them, at the start, too.
+    // Collapses each run of '/' into one, also at the start.
     // Cost: linear.
     void removeDoubleSeps();
     [[nodiscard]] static Pathname removeDoubleSeps(const Pathname& path);
@@ -97,83 +98,82 @@ public:
 
     // Returns: the path as a word of a shell command line, quoted for blanks, quotes, '$', '\\' and
     // "#&*;=?[]|".
-    // Deliberate: parentheses, redirections, backquotes, '~', '!' and braces stay bare. This
-    // serves names that the caller trusts; it is no defence against names from strangers.
+    // Deliberate: parentheses, redirections, backquotes, '~', '!' and braces are not quoted. Use
+    // this for trusted names only; it does not make untrusted names safe.
     [[nodiscard]] std::string shellQuoted() const;
 
-    // Takes the first word off `input`, with the quotes and backslashes of shellQuoted undone.
-    // `firstArg` is replaced by the word, `rest` by what follows it, from the blank on; `rest` may
-    // be the same object as `input`.
-    // Returns: true when there is a word; false, and `rest` as it was, when there is none or a
-    // quote or backslash is not completed.
-    // Deliberate: an empty quoted word counts as none; a backslash within double quotes escapes any
-    // character.
+    // Splits the first word off `input`, undoing shellQuoted. `firstArg` is replaced by the word,
+    // `rest` by what follows it, starting at the blank; `rest` may be the same object as `input`.
+    // Returns: true if there is a word. Otherwise, or if a quote or backslash is not completed,
+    // false, and `rest` is unchanged.
+    // Deliberate: an empty quoted word does not count as a word; a backslash within double quotes
+    // escapes any character.
     static bool splitArgShellQuoted(const std::string& input, Pathname& firstArg,
                                     std::string& rest);
 
     // --- One system call each --------------------------------------------------------------------
 
-    // Replaces *result by what stat tells, links followed.
-    bool stat(struct stat* result) const noexcept;
+    // Fills *result by stat, which follows links.
+    bool stat(struct stat* result) const;
     // Returns: whether it exists and is a directory (a regular file).
-    [[nodiscard]] bool isDir() const noexcept;
-    [[nodiscard]] bool isReg() const noexcept;
+    [[nodiscard]] bool isDir() const;
+    [[nodiscard]] bool isReg() const;
     // Replaces *mtime by the time of the last change, in seconds since the epoch, and *size by the
-    // size in bytes. Errors: false, and the argument as it was.
-    bool getMtime(long* mtime) const noexcept;
-    bool getSize(long long* size) const noexcept;
-    // Returns: whether `access` grants existence, reading, writing, both, to the real user.
-    [[nodiscard]] bool exists() const noexcept;
-    [[nodiscard]] bool r_ok() const noexcept;
-    [[nodiscard]] bool w_ok() const noexcept;
-    [[nodiscard]] bool rw_ok() const noexcept;
+    // size in bytes. Errors: false, and the argument is unchanged.
+    bool getMtime(long* mtime) const;
+    bool getSize(long long* size) const;
+    // Returns: whether the path exists, or the real user may read it, write it, do both.
+    [[nodiscard]] bool exists() const;
+    [[nodiscard]] bool r_ok() const;
+    [[nodiscard]] bool w_ok() const;
+    [[nodiscard]] bool rw_ok() const;
 
     // Returns: a new stream, or null. Owns: the caller closes it with std::fclose.
-    [[nodiscard]] std::FILE* fopen(const char* mode) const noexcept;
+    [[nodiscard]] std::FILE* fopen(const char* mode) const;
     // Requires: one of the four modes; asserted.
     bool mkdir(MkdirMode mode) const;
-    bool rmdir() const noexcept;
-    bool unlink() const noexcept;
-    bool remove() const noexcept;
+    bool rmdir() const;
+    bool unlink() const;
+    bool remove() const;
     // Cuts or extends the file to a length in bytes.
-    bool truncate(long long length) const noexcept;
+    bool truncate(long long length) const;
     // Fills `buf` with up to `size` bytes of the link's text, without a NUL.
-    // Deliberate: true only when the call returned 0, as for all its siblings, hence false whenever
-    // there was text; look at the buffer.
-    bool readlink(char* buf, unsigned long size) const noexcept;
+    // Deliberate: true only if the call returned 0, like all other wrappers, so false whenever
+    // there was text. Look at the buffer.
+    bool readlink(char* buf, unsigned long size) const;
     // Creates `link`, whose text is this path.
-    bool symlinkTo(const Pathname& link) const noexcept;
-    bool renameTo(const Pathname& dest) const noexcept;
+    bool symlinkTo(const Pathname& link) const;
+    bool renameTo(const Pathname& dest) const;
 
     // Each opens the file with one call. Returns: the descriptor, -1 with errno on failure.
     // Owns: the caller closes it.
-    [[nodiscard]] FileDescriptor openReadOnly() const noexcept;
+    [[nodiscard]] FileDescriptor openReadOnly() const;
     // Does not block, neither now (on a FIFO or device) nor in later reads.
-    [[nodiscard]] FileDescriptor openReadOnlySafer() const noexcept;
-    // For writing; fails when the file exists.
-    [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openReadOnlySafer() const;
+    // For writing; fails if the file exists.
+    [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const;
     // For writing; empties an existing file.
-    [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const noexcept;
-    // The same with the permission bits of the file `model`; opens nothing when fstat refuses them.
-    [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const;
+    // The same with the permission bits of the file `model`; fails if fstat does.
+    [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const;
     // For writing; each write goes to the end.
-    [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const noexcept;
-    // For reading and writing. Deliberate: empties an existing file, whatever the name suggests.
-    [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const noexcept;
+    [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const;
+    // For reading and writing. Deliberate: empties an existing file, despite the name.
+    [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const;
 
     // Copies the contents and permission bits to another file, replacing it.
     // Errors: false, with errno of the step that failed; see FileDescriptor::copyTo.
     bool copyTo(const Pathname& dest) const;
 };
 
-// Returns: the permission bits of a mode; 0644 for a value that is none.
+// Returns: the permission bits of a mode; 0644 for any other value.
 [[nodiscard]] mode_t createmode_to_perm(Pathname::CreateMode mode) noexcept;
 
 // Paths in the order of insertion; duplicates allowed.
 // Not thread-safe; one thread at a time per object.
 class PathList : public std::vector<Pathname> {
 public:
-    static constexpr char listSep = ':';  // the usual separator
+    static constexpr char listSep = ':';  // the default separator
 
     PathList() = default;
     // The elements of a separated list; see push_back_separated.

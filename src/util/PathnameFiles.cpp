@@ -13,21 +13,21 @@
 
 static_assert(sizeof(off_t) == 8, "sizes need 64 bits; build with -D_FILE_OFFSET_BITS=64");
 
-bool Pathname::stat(struct stat* result) const noexcept {
+bool Pathname::stat(struct stat* result) const {
     return ::stat(c_str(), result) == 0;
 }
 
-bool Pathname::isDir() const noexcept {
+bool Pathname::isDir() const {
     struct stat info;
     return stat(&info) && S_ISDIR(info.st_mode);
 }
 
-bool Pathname::isReg() const noexcept {
+bool Pathname::isReg() const {
     struct stat info;
     return stat(&info) && S_ISREG(info.st_mode);
 }
 
-bool Pathname::getMtime(long* mtime) const noexcept {
+bool Pathname::getMtime(long* mtime) const {
     struct stat info;
     if (!stat(&info)) {
         return false;
@@ -36,7 +36,7 @@ bool Pathname::getMtime(long* mtime) const noexcept {
     return true;
 }
 
-bool Pathname::getSize(long long* size) const noexcept {
+bool Pathname::getSize(long long* size) const {
     struct stat info;
     if (!stat(&info)) {
         return false;
@@ -45,23 +45,23 @@ bool Pathname::getSize(long long* size) const noexcept {
     return true;
 }
 
-bool Pathname::exists() const noexcept {
+bool Pathname::exists() const {
     return ::access(c_str(), F_OK) == 0;
 }
 
-bool Pathname::r_ok() const noexcept {
+bool Pathname::r_ok() const {
     return ::access(c_str(), R_OK) == 0;
 }
 
-bool Pathname::w_ok() const noexcept {
+bool Pathname::w_ok() const {
     return ::access(c_str(), W_OK) == 0;
 }
 
-bool Pathname::rw_ok() const noexcept {
+bool Pathname::rw_ok() const {
     return ::access(c_str(), R_OK | W_OK) == 0;
 }
 
-std::FILE* Pathname::fopen(const char* mode) const noexcept {
+std::FILE* Pathname::fopen(const char* mode) const {
     return ::fopen(c_str(), mode);
 }
 
@@ -79,51 +79,51 @@ bool Pathname::mkdir(MkdirMode mode) const {
     return ::mkdir(c_str(), permissions) == 0;
 }
 
-bool Pathname::rmdir() const noexcept {
+bool Pathname::rmdir() const {
     return ::rmdir(c_str()) == 0;
 }
 
-bool Pathname::unlink() const noexcept {
+bool Pathname::unlink() const {
     return ::unlink(c_str()) == 0;
 }
 
-bool Pathname::remove() const noexcept {
+bool Pathname::remove() const {
     return ::remove(c_str()) == 0;
 }
 
-bool Pathname::truncate(long long length) const noexcept {
+bool Pathname::truncate(long long length) const {
     return ::truncate(c_str(), length) == 0;
 }
 
-bool Pathname::readlink(char* buf, unsigned long size) const noexcept {
+bool Pathname::readlink(char* buf, unsigned long size) const {
     return ::readlink(c_str(), buf, size) == 0;
 }
 
-bool Pathname::symlinkTo(const Pathname& link) const noexcept {
+bool Pathname::symlinkTo(const Pathname& link) const {
     return ::symlink(c_str(), link.c_str()) == 0;
 }
 
-bool Pathname::renameTo(const Pathname& dest) const noexcept {
+bool Pathname::renameTo(const Pathname& dest) const {
     return ::rename(c_str(), dest.c_str()) == 0;
 }
 
-FileDescriptor Pathname::openReadOnly() const noexcept {
+FileDescriptor Pathname::openReadOnly() const {
     return ::open(c_str(), O_RDONLY);
 }
 
-FileDescriptor Pathname::openReadOnlySafer() const noexcept {
+FileDescriptor Pathname::openReadOnlySafer() const {
     return ::open(c_str(), O_RDONLY | O_NONBLOCK);
 }
 
-FileDescriptor Pathname::openCreateOnly(CreateMode mode) const noexcept {
+FileDescriptor Pathname::openCreateOnly(CreateMode mode) const {
     return ::open(c_str(), O_WRONLY | O_CREAT | O_EXCL, createmode_to_perm(mode));
 }
 
-FileDescriptor Pathname::openCreateOrReplace(CreateMode mode) const noexcept {
+FileDescriptor Pathname::openCreateOrReplace(CreateMode mode) const {
     return ::open(c_str(), O_WRONLY | O_CREAT | O_TRUNC, createmode_to_perm(mode));
 }
 
-FileDescriptor Pathname::openCreateOrReplace(FileDescriptor model) const noexcept {
+FileDescriptor Pathname::openCreateOrReplace(FileDescriptor model) const {
     struct stat info;
     if (!model.stat(&info)) {
         return -1;
@@ -131,11 +131,11 @@ FileDescriptor Pathname::openCreateOrReplace(FileDescriptor model) const noexcep
     return ::open(c_str(), O_WRONLY | O_CREAT | O_TRUNC, info.st_mode & 0777);
 }
 
-FileDescriptor Pathname::openCreateOrAppend(CreateMode mode) const noexcept {
+FileDescriptor Pathname::openCreateOrAppend(CreateMode mode) const {
     return ::open(c_str(), O_WRONLY | O_CREAT | O_APPEND, createmode_to_perm(mode));
 }
 
-FileDescriptor Pathname::openReadWriteOrCreate(CreateMode mode) const noexcept {
+FileDescriptor Pathname::openReadWriteOrCreate(CreateMode mode) const {
     return ::open(c_str(), O_RDWR | O_CREAT | O_TRUNC, createmode_to_perm(mode));
 }
 

@@ -1,6 +1,6 @@
 #include "util/Pathname.h"
 
-// Words of a shell command line: quoting a path as one, and taking one off a line.
+// Words of a shell command line: quotes a path as one, and splits one off a line.
 
 #include <algorithm>
 #include <string_view>
@@ -9,9 +9,9 @@
 
 namespace {
 
-constexpr std::string_view whitespace = "\t\n ";
-constexpr std::string_view alwaysSpecial = "\"$\\";
-constexpr std::string_view special = "#&*;=?[]|";
+constexpr std::string_view WHITESPACE = "\t\n ";
+constexpr std::string_view ALWAYS_SPECIAL = "\"$\\";
+constexpr std::string_view SPECIAL = "#&*;=?[]|";
 
 bool isIn(char c, std::string_view characters) {
     return characters.find(c) != characters.npos;
@@ -21,8 +21,8 @@ bool containsAny(std::string_view text, std::string_view characters) {
     return text.find_first_of(characters) != text.npos;
 }
 
-// Reads one word from `pos` on, which is left at the blank or the end behind it.
-// Returns: false when a quote or a backslash is not completed; `word` then holds what came before.
+// Reads one word starting at `pos`, and leaves `pos` at the blank after it or at the end.
+// Returns: false if a quote or a backslash is not completed; `word` then holds what came before.
 bool readWord(std::string_view input, std::size_t& pos, std::string& word) {
     enum State { BASE, IN_DOUBLE_QUOTE, IN_SINGLE_QUOTE };
     State state = BASE;
@@ -32,7 +32,7 @@ bool readWord(std::string_view input, std::size_t& pos, std::string& word) {
         if (saw_backslash) {
             word += c;
             saw_backslash = false;
-        } else if (state == BASE && isIn(c, whitespace)) {
+        } else if (state == BASE && isIn(c, WHITESPACE)) {
             break;
         } else if (c == '\\' && state != IN_SINGLE_QUOTE) {
             saw_backslash = true;
@@ -57,9 +57,9 @@ std::string Pathname::shellQuoted() const {
     if (empty()) {
         return "\"\"";
     }
-    const bool has_whitespace = containsAny(*this, whitespace);
-    const bool has_alwaysspecial = containsAny(*this, alwaysSpecial);
-    const bool has_special = containsAny(*this, special);
+    const bool has_whitespace = containsAny(*this, WHITESPACE);
+    const bool has_alwaysspecial = containsAny(*this, ALWAYS_SPECIAL);
+    const bool has_special = containsAny(*this, SPECIAL);
     const bool has_singlequote = find('\'') != npos;
     if (!has_whitespace && !has_alwaysspecial && !has_special && !has_singlequote) {
         return *this;
@@ -73,7 +73,7 @@ std::string Pathname::shellQuoted() const {
     }
     for (const char c : *this) {
         // Within double quotes only some characters need the backslash.
-        if (isIn(c, alwaysSpecial) || (!has_whitespace && (c == '\'' || isIn(c, special)))) {
+        if (isIn(c, ALWAYS_SPECIAL) || (!has_whitespace && (c == '\'' || isIn(c, SPECIAL)))) {
             result += '\\';
         }
         result += c;
@@ -87,11 +87,11 @@ std::string Pathname::shellQuoted() const {
 bool Pathname::splitArgShellQuoted(const std::string& input, Pathname& firstArg,
                                    std::string& rest) {
     Pathname word;
-    std::size_t pos = std::min(input.find_first_not_of(whitespace), input.size());
+    std::size_t pos = std::min(input.find_first_not_of(WHITESPACE), input.size());
     const bool complete = readWord(input, pos, word);
     std::string remainder = input.substr(pos);
     const bool found = complete && !word.empty();
-    // Last of all, because either may be the same object as the input.
+    // At the end, because either may be the same object as the input.
     firstArg = std::move(word);
     if (found) {
         rest = std::move(remainder);

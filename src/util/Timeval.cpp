@@ -9,28 +9,25 @@
 
 namespace {
 
-constexpr long long maxSec = std::numeric_limits<std::int32_t>::max();
-constexpr long usecsPerSec = 1000000;
-constexpr unsigned long long maxMsecs = maxSec * 1000ULL;
+constexpr long long MAX_SEC = std::numeric_limits<std::int32_t>::max();
+constexpr long USECS_PER_SEC = 1000000;
+constexpr unsigned long long MAX_MSECS = MAX_SEC * 1000ULL;
 
-// a - b in whole seconds, rounded down, and the microseconds above them. The sums are unsigned, so
-// that instants which only a 64-bit time_t can hold do no worse than wrap around.
+// a - b in whole seconds, rounded down, and the microseconds above them.
 struct Difference {
     Difference(const struct timeval& a, const struct timeval& b)
-        : seconds(static_cast<unsigned long long>(a.tv_sec) -
-                  static_cast<unsigned long long>(b.tv_sec)),
-          micros(a.tv_usec - b.tv_usec) {
+        : seconds(a.tv_sec - b.tv_sec), micros(a.tv_usec - b.tv_usec) {
         if (micros < 0) {
             --seconds;
-            micros += usecsPerSec;
+            micros += USECS_PER_SEC;
         }
     }
 
-    unsigned long long seconds;
+    long long seconds;
     long micros;  // 0..999999
 };
 
-// Appends three significant figures in a field of width 5, and the unit.
+// Returns: the value with one to three decimals, at least 5 characters wide, and the unit.
 std::string describe(double value, const char* unit) {
     const int precision = value >= 99.5 ? 1 : value >= 9.95 ? 2 : 3;
     char number[40];
@@ -48,23 +45,23 @@ bool isDigit(char c) {
     return c >= '0' && c <= '9';
 }
 
-// The digits before the point, in milliseconds.
-// Returns: the first character behind them; `hitMax` is set when they do not fit.
+// Reads the digits before the point as milliseconds.
+// Returns: the first character after them; `hitMax` is set if they do not fit.
 const char* readWholeSeconds(const char* p, unsigned long long& msecs, bool& hitMax) {
-    constexpr unsigned long long firstTooLarge = 18446744073709552ULL;
+    constexpr unsigned long long FIRST_TOO_LARGE = 18446744073709552ULL;
     unsigned long long value = 0;
     for (; isDigit(*p); ++p) {
         if (!hitMax) {
             value = value * 10 + static_cast<unsigned>(*p - '0');
-            hitMax = value >= firstTooLarge;
+            hitMax = value >= FIRST_TOO_LARGE;
         }
     }
     msecs = value * 1000;
     return p;
 }
 
-// The digits behind the point, added to `msecs`.
-// Returns: the first character behind them.
+// Reads the digits after the point and adds them to `msecs`.
+// Returns: the first character after them.
 const char* readFraction(const char* p, unsigned long long& msecs, bool& hitMax) {
     unsigned tenths = 0;  // of a millisecond
     unsigned unit = 1000;
@@ -92,19 +89,17 @@ Timeval Timeval::now() {
 }
 
 long long Timeval::msec() const noexcept {
-    const auto whole = static_cast<unsigned long long>(_tv.tv_sec) * 1000;
-    return static_cast<long long>(whole + static_cast<unsigned long long>(_tv.tv_usec / 1000));
+    return sec() * 1000 + _tv.tv_usec / 1000;
 }
 
 void Timeval::set(long long seconds, long long microseconds) noexcept {
-    long long carry = microseconds / usecsPerSec;
-    long long rest = microseconds % usecsPerSec;
+    long long carry = microseconds / USECS_PER_SEC;
+    long long rest = microseconds % USECS_PER_SEC;
     if (rest < 0) {
         --carry;
-        rest += usecsPerSec;
+        rest += USECS_PER_SEC;
     }
-    _tv.tv_sec = static_cast<time_t>(static_cast<unsigned long long>(seconds) +
-                                     static_cast<unsigned long long>(carry));
+    _tv.tv_sec = seconds + carry;
     _tv.tv_usec = static_cast<suseconds_t>(rest);
 }
 
@@ -115,12 +110,12 @@ void Timeval::setToNow() {
 }
 
 void Timeval::setToMax() noexcept {
-    _tv.tv_sec = maxSec;
-    _tv.tv_usec = usecsPerSec - 1;
+    _tv.tv_sec = MAX_SEC;
+    _tv.tv_usec = USECS_PER_SEC - 1;
 }
 
 void Timeval::addSec(unsigned int secs) noexcept {
-    if (_tv.tv_sec > maxSec - static_cast<long long>(secs)) {
+    if (_tv.tv_sec > MAX_SEC - static_cast<long long>(secs)) {
         setToMax();
         return;
     }
@@ -128,16 +123,16 @@ void Timeval::addSec(unsigned int secs) noexcept {
 }
 
 void Timeval::addMsec(unsigned long long msecs) {
-    if (msecs >= maxMsecs) {
+    if (msecs >= MAX_MSECS) {
         setToMax();
         return;
     }
     auto secs = static_cast<unsigned int>(msecs / 1000);
     _tv.tv_usec += static_cast<suseconds_t>(msecs % 1000 * 1000);
-    if (_tv.tv_usec >= usecsPerSec) {
+    if (_tv.tv_usec >= USECS_PER_SEC) {
         QUELTA_ASSERT(_tv.tv_usec < 2000000);
         ++secs;
-        _tv.tv_usec -= usecsPerSec;
+        _tv.tv_usec -= USECS_PER_SEC;
     }
     addSec(secs);
 }
@@ -150,14 +145,12 @@ void Timeval::localtime(struct tm& result) const {
 
 long long Timeval::msecDifference(const Timeval& a, const Timeval& b) noexcept {
     const Difference d(a._tv, b._tv);
-    return static_cast<long long>(d.seconds * 1000 +
-                                  static_cast<unsigned long long>((d.micros + 999) / 1000));
+    return d.seconds * 1000 + (d.micros + 999) / 1000;
 }
 
 long long Timeval::usecDifference(const Timeval& a, const Timeval& b) noexcept {
     const Difference d(a._tv, b._tv);
-    return static_cast<long long>(d.seconds * 1000000 +
-                                  static_cast<unsigned long long>(d.micros / 1000));
+    return d.seconds * 1000000 + d.micros / 1000;
 }
 
 std::string Timeval::describeDifference(const Timeval& a, const Timeval& b) {
@@ -188,7 +181,7 @@ bool convert_string_to_milliseconds(const char* oldp, unsigned long long* res,
     const char* const number = p;
     bool hitMax = false;
     p = readWholeSeconds(p, *res, hitMax);
-    // A point before anything but a digit or the end belongs to what follows the number.
+    // A '.' followed by neither a digit nor the end is not part of the number.
     if (*p == '.' && (isDigit(p[1]) || p[1] == '\0')) {
         p = readFraction(p + 1, *res, hitMax);
     }

@@ -3,8 +3,8 @@
 
 // An instant of wall-clock time: seconds and microseconds since the epoch.
 //
-// Additions saturate at one largest instant, 2147483647 s and 999999 us, on every host: stamps mean
-// the same wherever time_t is wider. After every operation 0 <= _tv.tv_usec <= 999999.
+// Additions saturate at one largest instant, 2147483647 s and 999999 us, so that it does not depend
+// on the width of time_t. After every operation 0 <= _tv.tv_usec <= 999999.
 // Not thread-safe; one thread at a time per object.
 
 #include <sys/time.h>
@@ -28,19 +28,19 @@ public:
 
     // Sets the instant; `microseconds` outside 0..999999 carry into (or borrow from) the seconds.
     void set(long long seconds, long long microseconds) noexcept;
-    // Errors: aborts the process when there is no time to be had.
+    // Errors: aborts the process if the clock cannot be read.
     void setToNow();
     // Sets the largest instant.
     void setToMax() noexcept;
 
-    // Adds seconds; the largest instant when the sum lies above 2147483647 s.
+    // Adds seconds; the result is the largest instant if the sum exceeds 2147483647 s.
     void addSec(unsigned int secs) noexcept;
-    // Adds milliseconds; the largest instant when `msecs` is 2147483647000 or more, or the sum lies
-    // above 2147483647 s.
+    // Adds milliseconds; the result is the largest instant if `msecs` is 2147483647000 or more, or
+    // if the sum exceeds 2147483647 s.
     void addMsec(unsigned long long msecs);
 
     // Replaces `result` by this instant, to the second, in the local time zone.
-    // Errors: aborts the process when the year does not fit.
+    // Errors: aborts the process if the year does not fit.
     // Threads: safe from any thread.
     void localtime(struct tm& result) const;
 
@@ -53,15 +53,15 @@ public:
     [[nodiscard]] bool operator>=(const Timeval& other) const noexcept { return !(*this < other); }
 
     // Returns: a minus b in milliseconds, the sub-second part rounded up: 1 us later counts as 1.
-    // Deliberate: the sub-second part is what remains above whole seconds rounded down, so 1 us
-    // earlier counts as 0.
+    // Deliberate: whole seconds are rounded down first, so 1 us earlier counts as 0.
     [[nodiscard]] static long long msecDifference(const Timeval& a, const Timeval& b) noexcept;
     // Returns: a minus b, with 1000000 for each whole second.
     // Deliberate: the sub-second part is added in milliseconds, rounded down, and not in
-    // microseconds: 1.5 s count as 1000500. describeDifference is built upon it.
+    // microseconds: 1.5 s count as 1000500. describeDifference is based on it.
     [[nodiscard]] static long long usecDifference(const Timeval& a, const Timeval& b) noexcept;
-    // Returns: usecDifference in words: up to three significant figures and a unit, such as
-    // "5.000 seconds", behind "-" when a lies before b.
+    // Returns: usecDifference as text: a whole number, or one with one to three decimals, and a
+    // unit
+    // ("5.000 seconds"), preceded by "-" if a is before b.
     [[nodiscard]] static std::string describeDifference(const Timeval& a, const Timeval& b);
 
     // The differences above from this instant to now, positive for an instant in the past.
@@ -85,12 +85,13 @@ public:
     }
 };
 
-// Reads a decimal number of seconds, with an optional fraction, behind spaces and tabs.
+// Reads a decimal number of seconds, with an optional fraction, after optional spaces and tabs.
 //
-// `res` is replaced by the milliseconds, rounded half up, but never down to 0 for a time that is
-// not zero; all ones when they do not fit. `charCount` (null allowed) is replaced by the characters
-// read from `oldp` on, blanks included. A unit behind the number is the caller's to read.
-// Returns: true when there was a number; a lone "." is one, 0. Otherwise *res and *charCount are 0.
+// `res` is replaced by the milliseconds, rounded half up, but never to 0 for a time that is not
+// zero; all ones if they do not fit. `charCount` (null allowed) is replaced by the number of
+// characters read from `oldp` on, blanks included. A unit after the number is left to the caller.
+// Returns: true if there was a number; a lone "." is the number 0. Otherwise *res and *charCount
+// are 0.
 bool convert_string_to_milliseconds(const char* oldp, unsigned long long* res,
                                     unsigned long* charCount);
 

@@ -10,7 +10,7 @@ import re
 import sys
 
 NAMED = re.compile(r'`([A-Z]\w+\.[A-Z]\w+)`')
-DEFINED = re.compile(r'^TEST(?:_F|_P)?\(\s*(\w+)\s*,\s*(\w+)\s*\)', re.MULTILINE)
+DEFINED = re.compile(r'^(?:TYPED_)?TEST(?:_F|_P)?\(\s*(\w+)\s*,\s*(\w+)\s*\)', re.MULTILINE)
 
 
 def main():

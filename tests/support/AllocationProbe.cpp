@@ -14,6 +14,7 @@ namespace {
 struct State {
     bool counting;
     std::size_t failing;
+    std::size_t largest;
     std::size_t count;
     long live;
 };
@@ -22,7 +23,7 @@ thread_local State state = {};
 
 [[maybe_unused]] void* allocate(std::size_t size) {
     if (state.counting) {
-        if (++state.count == state.failing) {
+        if (++state.count == state.failing || size > state.largest) {
             throw std::bad_alloc();
         }
         ++state.live;
@@ -52,36 +53,19 @@ thread_local State state = {};
 }  // namespace
 
 #if !QUELTA_HAS_FEATURE(thread_sanitizer)
-void* operator new(std::size_t size) {
-    return allocate(size);
-}
-void* operator new[](std::size_t size) {
-    return allocate(size);
-}
-void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
-    return allocateOrNull(size);
-}
-void* operator new[](std::size_t size, const std::nothrow_t&) noexcept {
-    return allocateOrNull(size);
-}
-void operator delete(void* block) noexcept {
-    release(block);
-}
-void operator delete[](void* block) noexcept {
-    release(block);
-}
-void operator delete(void* block, std::size_t) noexcept {
-    release(block);
-}
-void operator delete[](void* block, std::size_t) noexcept {
-    release(block);
-}
-void operator delete(void* block, const std::nothrow_t&) noexcept {
-    release(block);
-}
-void operator delete[](void* block, const std::nothrow_t&) noexcept {
-    release(block);
-}
+using Nothrow = const std::nothrow_t&;
+// clang-format off
+void* operator new(std::size_t size) { return allocate(size); }
+void* operator new[](std::size_t size) { return allocate(size); }
+void* operator new(std::size_t size, Nothrow) noexcept { return allocateOrNull(size); }
+void* operator new[](std::size_t size, Nothrow) noexcept { return allocateOrNull(size); }
+void operator delete(void* block) noexcept { release(block); }
+void operator delete[](void* block) noexcept { release(block); }
+void operator delete(void* block, std::size_t) noexcept { release(block); }
+void operator delete[](void* block, std::size_t) noexcept { release(block); }
+void operator delete(void* block, Nothrow) noexcept { release(block); }
+void operator delete[](void* block, Nothrow) noexcept { release(block); }
+// clang-format on
 bool AllocationProbe::available() {
     return true;
 }
@@ -92,10 +76,13 @@ bool AllocationProbe::available() {
 #endif
 
 AllocationProbe::AllocationProbe(std::size_t failing) {
-    state = {true, failing, 0, 0};
+    state = {true, failing, std::size_t(-1), 0, 0};
 }
 AllocationProbe::~AllocationProbe() {
     stop();
+}
+void AllocationProbe::refuseBeyond(std::size_t bytes) {
+    state.largest = bytes;
 }
 std::size_t AllocationProbe::count() const {
     return state.count;

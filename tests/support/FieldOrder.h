@@ -5,7 +5,7 @@
 #include <functional>
 #include <initializer_list>
 
-// Whether these fields of one object lie behind each other in the order given.
+// Whether these fields of one object are at ascending addresses, in the order given.
 inline bool standInOrder(std::initializer_list<const void*> fields) {
     return std::adjacent_find(fields.begin(), fields.end(), std::greater_equal<const void*>()) ==
            fields.end();

@@ -1,11 +1,12 @@
 #ifndef QUELTA_TESTS_SUPPORT_MATCHERORACLE_H_
 #define QUELTA_TESTS_SUPPORT_MATCHERORACLE_H_
 
-// A slow matcher on strings and positions, written from the rules of matching, to compare with.
-// It shares no code and no technique with the real one.
+// A slow matcher, written from the rules of matching, that tests, fuzz targets and benchmarks
+// compare with. It shares no code and no technique with the real one.
 
 #include <cstddef>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace oracle {
@@ -15,23 +16,28 @@ struct Match {
     std::vector<std::string> parts;
 };
 
-// The literal pieces between the stars of a pattern, empty ones left out.
-inline std::vector<std::string> pieces(const std::string& pattern) {
-    std::vector<std::string> found;
-    std::string piece;
-    for (const char c : pattern + '*') {
-        if (c != '*') {
-            piece += c;
-        } else if (!piece.empty()) {
-            found.push_back(piece);
-            piece.clear();
+// Where a last segment that no star follows must be: found by searching from left to right without
+// overlap, which is the rule of this system, or simply at the end of the text, which is the usual
+// meaning of a star. "*aa" does not match "aaa" by the first and does by the second.
+enum class LastSegment { SEARCHED, AT_THE_END };
+
+// The literal segments between the stars of a pattern, without the empty ones.
+inline std::vector<std::string_view> pieces(std::string_view pattern) {
+    std::vector<std::string_view> found;
+    std::size_t start = 0;
+    for (std::size_t at = 0; at <= pattern.size(); ++at) {
+        if (at == pattern.size() || pattern[at] == '*') {
+            if (at != start) {
+                found.push_back(pattern.substr(start, at - start));
+            }
+            start = at + 1;
         }
     }
     return found;
 }
 
-// The first place at or behind `from` where `piece` stands in `text`, compared byte by byte.
-inline std::size_t locate(const std::string& text, const std::string& piece, std::size_t from) {
+// The first place at or after `from` where `piece` occurs in `text`, compared byte by byte.
+inline std::size_t locate(std::string_view text, std::string_view piece, std::size_t from) {
     for (std::size_t at = from; at + piece.size() <= text.size(); ++at) {
         std::size_t same = 0;
         while (same < piece.size() && text[at + same] == piece[same]) {
@@ -41,62 +47,67 @@ inline std::size_t locate(const std::string& text, const std::string& piece, std
             return at;
         }
     }
-    return std::string::npos;
+    return std::string_view::npos;
 }
 
-inline Match match(const std::string& pattern, const std::string& text) {
-    if (!pattern.empty() && pattern.find('*') == std::string::npos) {
+inline Match match(std::string_view pattern, std::string_view text,
+                   LastSegment last = LastSegment::SEARCHED) {
+    if (!pattern.empty() && pattern.find('*') == std::string_view::npos) {
         return {pattern == text, {}};
     }
-    std::vector<std::string> middle = pieces(pattern);
+    std::vector<std::string_view> middle = pieces(pattern);
     const bool anchoredFront = !pattern.empty() && pattern.front() != '*';
     const bool anchoredBack = !pattern.empty() && pattern.back() != '*';
     Match result{false, {}};
     std::size_t at = 0;
+    const auto capture = [&](std::size_t end) {
+        result.parts.emplace_back(text.substr(at, end - at));
+    };
+    const auto captureRest = [&](bool matched) {
+        if (!anchoredBack) {
+            capture(text.size());
+        }
+        result.matched = matched;
+        return result;
+    };
     if (anchoredFront) {
-        const std::string front = middle.front();
+        const std::string_view front = middle.front();
         middle.erase(middle.begin());
         if (text.substr(0, front.size()) != front) {
-            if (!anchoredBack) {
-                result.parts.push_back(text);
-            }
-            return result;
+            return captureRest(false);
         }
         at = front.size();
     }
-    std::string back;
+    std::string_view back;
     if (anchoredBack) {
         back = middle.back();
         middle.pop_back();
     }
-    for (const std::string& piece : middle) {
+    for (const std::string_view piece : middle) {
         const std::size_t found = locate(text, piece, at);
-        if (found == std::string::npos) {
-            if (!anchoredBack) {
-                result.parts.push_back(text.substr(at));
-            }
-            return result;
+        if (found == std::string_view::npos) {
+            return captureRest(false);
         }
-        result.parts.push_back(text.substr(at, found - at));
+        capture(found);
         at = found + piece.size();
     }
     if (!anchoredBack) {
-        result.parts.push_back(text.substr(at));
-        result.matched = true;
+        return captureRest(true);
+    }
+    if (last == LastSegment::AT_THE_END) {
+        result.matched = text.substr(at).ends_with(back);
         return result;
     }
-    for (;;) {
+    do {
         const std::size_t found = locate(text, back, at);
-        if (found == std::string::npos) {
+        if (found == std::string_view::npos) {
             return result;
         }
-        result.parts.push_back(text.substr(at, found - at));
+        capture(found);
         at = found + back.size();
-        if (at == text.size()) {
-            result.matched = true;
-            return result;
-        }
-    }
+    } while (at != text.size());
+    result.matched = true;
+    return result;
 }
 
 }  // namespace oracle

@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_NUMBEREDLINES_H_
 #define QUELTA_TESTS_SUPPORT_NUMBEREDLINES_H_
 
-// Lines that show when they are torn, lost or doubled, and the generations of a log file in which
-// they are looked for. `scaled` lets a longer run ask for more of them.
+// Lines that show whether they are torn, lost or doubled, and the generations of a log file that
+// should contain them. `scaled` lets a longer run ask for more of them.
 
 #include <gtest/gtest.h>
 
@@ -22,13 +22,13 @@ inline unsigned scaled(const char* variable, unsigned usual) {
     return value != nullptr ? static_cast<unsigned>(std::strtoul(value, nullptr, 10)) : usual;
 }
 
-// Text, without a line feed, that follows from its numbers; up to some 110 characters.
+// A text, without a newline, that is determined by its numbers; at most about 110 characters.
 inline std::string numberedLine(unsigned series, unsigned number) {
     return std::to_string(series) + " " + std::to_string(number) + " " +
            std::string(number * 7 % 90, static_cast<char>('a' + series % 26)) + ".";
 }
 
-// The generations of a log file, oldest first; gaps in the numbers are no matter.
+// The generations of a log file, oldest first; there may be gaps in the numbers.
 inline std::vector<std::string> generationsOf(const std::string& file) {
     const std::filesystem::path base(file);
     std::map<unsigned long, std::string, std::greater<>> found;
@@ -57,7 +57,7 @@ inline std::string textOfGenerations(const std::string& file) {
     return all;
 }
 
-// Expects `count` lines of each series, whole, in their own order, none missing and none twice.
+// Expects `count` whole lines of each series, in their order, none missing and none twice.
 inline void expectEveryLine(const std::string& text, unsigned series, unsigned count) {
     std::vector<unsigned> next(series, 0);
     std::istringstream in(text);

@@ -105,7 +105,7 @@ inline std::string basenameWithoutExt(const std::string& path) {
     return last;
 }
 
-// The state machine as a table, started anew after every deletion.
+// The state machine as a table, restarted after every deletion.
 inline std::string removeDotDotSlash(std::string path) {
     enum { GROUND, START, GOT_ONE_DOT, GOT_TWO_DOTS };
     const int onDot[] = {GROUND, GOT_ONE_DOT, GOT_TWO_DOTS, GROUND};
@@ -136,7 +136,7 @@ inline std::string removeDoubleSeps(std::string path) {
     return path;
 }
 
-// Takes one shell word off: one character at a time, a branch for each state.
+// Splits one shell word off: one character at a time, a branch for each state.
 inline bool splitArg(const std::string& input, std::string& word, std::string& rest) {
     word.clear();
     std::string line = input;

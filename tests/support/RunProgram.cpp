@@ -14,10 +14,10 @@
 
 namespace {
 
-constexpr uid_t nobody = 65534;
+constexpr uid_t NOBODY = 65534;
 
-// What the status of a child that never became the program looks like.
-constexpr int notStarted = 126;
+// The exit status of a child that could not execute the program.
+constexpr int NOT_STARTED = 126;
 
 bool limit(int resource, rlim_t value) {
     const struct rlimit both = {value, value};
@@ -26,7 +26,7 @@ bool limit(int resource, rlim_t value) {
 
 bool giveUpRights() {
     return ::geteuid() != 0 ||
-           (::setgroups(0, nullptr) == 0 && ::setgid(nobody) == 0 && ::setuid(nobody) == 0);
+           (::setgroups(0, nullptr) == 0 && ::setgid(NOBODY) == 0 && ::setuid(NOBODY) == 0);
 }
 
 bool becomeFile(int fd, const std::string& path, int flags) {
@@ -60,8 +60,8 @@ Program& Program::input(const std::string& text) {
     return *this;
 }
 
-Program& Program::in(const std::string& folder) {
-    _folder = folder;
+Program& Program::in(const std::string& directory) {
+    _directory = directory;
     return *this;
 }
 
@@ -105,7 +105,7 @@ ProgramRun Program::run() const {
     result.status = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
     result.out = readFile(files.file("out"));
     result.err = readFile(files.file("err"));
-    EXPECT_FALSE(result.status == notStarted && result.err.empty()) << "not started: " << _path;
+    EXPECT_FALSE(result.status == NOT_STARTED && result.err.empty()) << "not started: " << _path;
     return result;
 }
 
@@ -133,12 +133,12 @@ void Program::becomeProgram(int programFd, const std::string& files) const {
     }
     envp.push_back(nullptr);
 
-    const bool ready = (_folder.empty() || ::chdir(_folder.c_str()) == 0) && redirect(files) &&
-                       limit(RLIMIT_CORE, 0) &&
+    const bool ready = (_directory.empty() || ::chdir(_directory.c_str()) == 0) &&
+                       redirect(files) && limit(RLIMIT_CORE, 0) &&
                        (_memoryLimit == 0 || limit(RLIMIT_AS, _memoryLimit)) &&
                        (!_withoutRights || giveUpRights());
     if (ready) {
         ::fexecve(programFd, argv.data(), envp.data());
     }
-    ::_exit(notStarted);
+    ::_exit(NOT_STARTED);
 }

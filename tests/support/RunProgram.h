@@ -1,15 +1,16 @@
 #ifndef QUELTA_TESTS_SUPPORT_RUNPROGRAM_H_
 #define QUELTA_TESTS_SUPPORT_RUNPROGRAM_H_
 
-// Runs a built program as its user would, with everything around it chosen by the test, and gives
-// back all that it left: how it ended, and both its outputs whole.
+// Runs a built program in an environment that the test chooses, and returns its status and both its
+// outputs.
 //
 //     Program program(path);
 //     program.set("QUELTA_HOME", dir.path()).input("a term\n");
 //     const ProgramRun run = program.run();
 //     EXPECT_EQ(0, run.status);
 //
-// The environment is empty but for PATH, what sanitizers and coverage read, and what the test sets.
+// The environment is empty except for PATH, the variables of sanitizers and coverage, and what the
+// test sets.
 // Not thread-safe; one thread at a time per object.
 
 #include <sys/types.h>
@@ -32,19 +33,19 @@ public:
     Program& set(const std::string& name, const std::string& value);
     Program& input(const std::string& text);
 
-    // The folder it runs in; this process's own unless set.
-    Program& in(const std::string& folder);
-    // Instead of being collected, standard output goes to this file, or is closed from the start.
+    // The directory that it runs in; this process's own unless set.
+    Program& in(const std::string& directory);
+    // Writes standard output to this file, or closes it, instead of collecting it.
     Program& outputTo(const std::string& path);
     Program& closeOutput();
 
-    // The most bytes of address space that it may use; 0 for no limit.
+    // Limits its address space, in bytes; 0 for no limit.
     Program& memoryLimit(unsigned long bytes);
-    // Gives up root's rights, if there are any. The program is opened before, so it may lie where
-    // that user cannot go.
+    // Drops root's privileges, if there are any. The program is opened before, so it may be where
+    // that user has no access.
     Program& withoutRights();
 
-    // Returns: what became of it; a failure of the test when it could not be started.
+    // Returns: how it ended. The test fails if it could not be started.
     ProgramRun run() const;
 
 private:
@@ -55,7 +56,7 @@ private:
     std::vector<std::string> _args;
     std::map<std::string, std::string> _environment;
     std::string _input;
-    std::string _folder;
+    std::string _directory;
     std::string _output;
     bool _outputClosed = false;
     bool _withoutRights = false;

@@ -1,12 +1,12 @@
 #ifndef QUELTA_TESTS_SUPPORT_STDERRCAPTURE_H_
 #define QUELTA_TESTS_SUPPORT_STDERRCAPTURE_H_
 
-// Collects what is written to descriptor 2, by whatever means, while the object lives.
+// Collects everything written to descriptor 2 while the object lives.
 //
 //     StderrCapture err;
 //     ...
 //     EXPECT_EQ("text\n", err.text());
-// Not thread-safe to make and destroy; other threads may write meanwhile.
+// Not thread-safe to construct and destroy; other threads may write while it lives.
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -29,7 +29,7 @@ public:
     StderrCapture(const StderrCapture&) = delete;
     StderrCapture& operator=(const StderrCapture&) = delete;
 
-    // What has been written so far, also by child processes.
+    // Returns: everything written so far, by child processes too.
     std::string text() const {
         std::string all;
         char buf[4096];
@@ -43,7 +43,7 @@ public:
 
 private:
     std::FILE* const _file;
-    const int _stderr;  // the descriptor that was there before
+    const int _stderr;  // a duplicate of the original descriptor
 };
 
 #endif  // QUELTA_TESTS_SUPPORT_STDERRCAPTURE_H_

@@ -4,13 +4,14 @@
 
 #include <algorithm>
 #include <ostream>
+#include <span>
 #include <string>
 
 #include "support/AllStrings.h"
 
 namespace {
 
-constexpr unsigned long long allOnes = 18446744073709551615ULL;
+constexpr unsigned long long ALL_ONES = 18446744073709551615ULL;
 
 struct Conversion {
     bool found;
@@ -30,74 +31,65 @@ Conversion convert(const std::string& text) {
     return result;
 }
 
+struct Row {
+    const char* text;
+    Conversion expected;
+};
+
+void expectConversions(std::span<const Row> rows) {
+    for (const auto& [text, expected] : rows) {
+        EXPECT_EQ(expected, convert(text)) << '"' << text << '"';
+    }
+}
+
 TEST(ConvertMillisecondsTest, ReadsDecimalSeconds) {
-    const struct {
-        const char* text;
-        Conversion expected;
-    } rows[] = {
+    const Row rows[] = {
         {"0", {true, 0, 1}},         {"1.5", {true, 1500, 3}},  {"12", {true, 12000, 2}},
         {"007", {true, 7000, 3}},    {".25", {true, 250, 3}},   {"  2", {true, 2000, 3}},
         {" \t 2s", {true, 2000, 4}}, {"1.5s", {true, 1500, 3}}, {"1.2.3", {true, 1200, 3}},
         {"1 2", {true, 1000, 1}},    {"1,5", {true, 1000, 1}},
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, convert(row.text)) << '"' << row.text << '"';
-    }
+    expectConversions(rows);
 }
 
 TEST(ConvertMillisecondsTest, RoundsHalfUpButNeverToZero) {
-    const struct {
-        const char* text;
-        Conversion expected;
-    } rows[] = {
+    const Row rows[] = {
         {"0.0004", {true, 1, 6}},      {"0.0001", {true, 1, 6}},    {"0.00049", {true, 1, 7}},
         {"0.00000001", {true, 1, 10}}, {"0.0000", {true, 0, 6}},    {"0.000000000", {true, 0, 11}},
         {"0.0005", {true, 1, 6}},      {"0.0014", {true, 1, 6}},    {"0.0015", {true, 2, 6}},
         {"0.00149999", {true, 1, 10}}, {"1.0004", {true, 1000, 6}}, {"1.9995", {true, 2000, 6}},
         {"1.9994", {true, 1999, 6}},
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, convert(row.text)) << '"' << row.text << '"';
-    }
+    expectConversions(rows);
 }
 
 TEST(ConvertMillisecondsTest, APointIsReadOnlyBeforeADigitOrTheEnd) {
-    const struct {
-        const char* text;
-        Conversion expected;
-    } rows[] = {
+    const Row rows[] = {
         {"5.s", {true, 5000, 1}}, {"5.", {true, 5000, 2}}, {"5. 5", {true, 5000, 1}},
         {".", {true, 0, 1}},      {"  .", {true, 0, 3}},   {".s", {false, 0, 0}},
         {". 5", {false, 0, 0}},   {"..5", {false, 0, 0}},  {"5..5", {true, 5000, 1}},
         {"", {false, 0, 0}},      {" \t", {false, 0, 0}},  {"abc", {false, 0, 0}},
         {"-1", {false, 0, 0}},    {"+1", {false, 0, 0}},   {"\n1", {false, 0, 0}},
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, convert(row.text)) << '"' << row.text << '"';
-    }
+    expectConversions(rows);
 }
 
 TEST(ConvertMillisecondsTest, WhatDoesNotFitIsAllOnes) {
-    const struct {
-        const char* text;
-        Conversion expected;
-    } rows[] = {
+    const Row rows[] = {
         {"18446744073709551", {true, 18446744073709551000ULL, 17}},
-        {"18446744073709551.615", {true, allOnes, 21}},
-        {"18446744073709551.6144", {true, allOnes - 1, 22}},
-        {"18446744073709551.6154", {true, allOnes, 22}},
-        {"18446744073709551.616", {true, allOnes, 21}},
-        {"18446744073709551.9", {true, allOnes, 19}},
-        {"18446744073709552", {true, allOnes, 17}},
-        {"18446744073709552.5x", {true, allOnes, 19}},
-        {"19000000000000000", {true, allOnes, 17}},
-        {"99999999999999999999999999999999999999999", {true, allOnes, 41}},
-        // Digits that would bring a wrapped value back into range do not.
-        {"184467440737095520000", {true, allOnes, 21}},
+        {"18446744073709551.615", {true, ALL_ONES, 21}},
+        {"18446744073709551.6144", {true, ALL_ONES - 1, 22}},
+        {"18446744073709551.6154", {true, ALL_ONES, 22}},
+        {"18446744073709551.616", {true, ALL_ONES, 21}},
+        {"18446744073709551.9", {true, ALL_ONES, 19}},
+        {"18446744073709552", {true, ALL_ONES, 17}},
+        {"18446744073709552.5x", {true, ALL_ONES, 19}},
+        {"19000000000000000", {true, ALL_ONES, 17}},
+        {"99999999999999999999999999999999999999999", {true, ALL_ONES, 41}},
+        // Further digits must not bring a wrapped value back into range.
+        {"184467440737095520000", {true, ALL_ONES, 21}},
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, convert(row.text)) << '"' << row.text << '"';
-    }
+    expectConversions(rows);
 }
 
 TEST(ConvertMillisecondsTest, TheCountMayBeNull) {

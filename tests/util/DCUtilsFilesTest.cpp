@@ -1,30 +1,17 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstring>
 #include <memory>
-#include <new>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include "support/ScriptedCalls.h"
 #include "support/TempDir.h"
 #include "util/DCUtils.h"
 #include "util/Pathname.h"
-
-extern "C" {
-// operator new[](std::size_t, const std::nothrow_t&)
-void* __real__ZnamRKSt9nothrow_t(std::size_t size, const std::nothrow_t& tag);
-void* __wrap__ZnamRKSt9nothrow_t(std::size_t size, const std::nothrow_t& tag) {
-    return scriptedCall("new[]", [&] { return __real__ZnamRKSt9nothrow_t(size, tag); });
-}
-int __real_stat(const char* path, struct stat* result);
-int __wrap_stat(const char* path, struct stat* result) {
-    return scriptedCall("stat", [&] { return __real_stat(path, result); });
-}
-}
 
 namespace {
 
@@ -32,15 +19,20 @@ using namespace std::string_literals;
 
 using OpenFile = std::unique_ptr<FILE, int (*)(FILE*)>;
 
-OpenFile opened(const std::string& path, const char* mode = "r") {
-    return OpenFile(std::fopen(path.c_str(), mode), std::fclose);
-}
+class DCUtilsFilesTest : public testing::Test {
+protected:
+    // Opens a file with these contents.
+    OpenFile opened(const std::string& contents, const char* mode = "r") const {
+        writeFile(_path, contents);
+        return OpenFile(std::fopen(_path.c_str(), mode), std::fclose);
+    }
 
-// Reads lines into a buffer of `bufSize` bytes until there is none.
-std::vector<std::string> linesOf(const std::string& contents, int bufSize) {
-    const TempDir dir;
-    writeFile(dir.file("text"), contents);
-    const OpenFile file = opened(dir.file("text"));
+    const TempDir _dir;
+    const Pathname _path{_dir.file("text")};
+};
+
+// Reads lines into a buffer of `bufSize` bytes until there is no more.
+std::vector<std::string> linesOf(const OpenFile& file, int bufSize) {
     std::vector<std::string> lines;
     std::vector<char> buf(static_cast<std::size_t>(bufSize), 'x');
     while (readLine(file.get(), buf.data(), bufSize)) {
@@ -51,29 +43,30 @@ std::vector<std::string> linesOf(const std::string& contents, int bufSize) {
 
 using Lines = std::vector<std::string>;
 
-TEST(DCUtilsFilesTest, ReadsLinesWithTheirNewlines) {
-    EXPECT_EQ(Lines(), linesOf("", 10));
-    EXPECT_EQ((Lines{"a\n", "\n", "bc\n"}), linesOf("a\n\nbc\n", 10));
-    EXPECT_EQ((Lines{"a\n", "b"}), linesOf("a\nb", 10));
+TEST_F(DCUtilsFilesTest, ReadsLinesAndDiscardsTheRestOfLongOnes) {
+    const struct {
+        const char* contents;
+        int bufSize;
+        Lines expected;
+    } rows[] = {
+        {"", 10, {}},
+        {"a\n\nbc\n", 10, {"a\n", "\n", "bc\n"}},
+        {"a\nb", 10, {"a\n", "b"}},
+        // A buffer of 6 bytes takes 4: "abc\n" and "abcd" fit, a newline after the latter does not.
+        {"abc\nx\n", 6, {"abc\n", "x\n"}},
+        {"abcd\nx\n", 6, {"abcd", "x\n"}},
+        {"abcdefghijklmnop\nx\n", 6, {"abcd", "x\n"}},
+        {"abcdefghijklmnop", 6, {"abcd"}},
+        {"abcd", 6, {"abcd"}},
+        {"abc\n\nb", 3, {"a", "\n", "b"}},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(row.expected, linesOf(opened(row.contents), row.bufSize)) << row.contents;
+    }
 }
 
-TEST(DCUtilsFilesTest, CutsLongLinesAndDiscardsTheirRest) {
-    // A buffer of 6 bytes takes 4: "abc\n" and "abcd" fit, the newline behind the latter does not.
-    EXPECT_EQ((Lines{"abc\n", "x\n"}), linesOf("abc\nx\n", 6));
-    EXPECT_EQ((Lines{"abcd", "x\n"}), linesOf("abcd\nx\n", 6));
-    EXPECT_EQ((Lines{"abcd", "x\n"}), linesOf("abcdefghijklmnop\nx\n", 6));
-    EXPECT_EQ((Lines{"abcd"}), linesOf("abcdefghijklmnop", 6));
-    EXPECT_EQ((Lines{"abcd"}), linesOf("abcd", 6));
-}
-
-TEST(DCUtilsFilesTest, ReadsByteByByteIntoTheSmallestBuffer) {
-    EXPECT_EQ((Lines{"a", "\n", "b"}), linesOf("abc\n\nb", 3));
-}
-
-TEST(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
-    const TempDir dir;
-    writeFile(dir.file("text"), "ab\n");
-    const OpenFile file = opened(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
+    const OpenFile file = opened("ab\n");
     char buf[8];
     std::memset(buf, 'x', sizeof buf);
     EXPECT_TRUE(readLine(file.get(), buf, sizeof buf));
@@ -82,10 +75,8 @@ TEST(DCUtilsFilesTest, ClearsTheWholeBufferFirst) {
     EXPECT_EQ(std::string(sizeof buf, '\0'), std::string(buf, sizeof buf));
 }
 
-TEST(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
-    const TempDir dir;
-    writeFile(dir.file("text"), "abc\n");
-    const OpenFile file = opened(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
+    const OpenFile file = opened("abc\n");
     for (const int bufSize : {2, 1, 0, -1}) {
         char buf[] = "xyz";
         EXPECT_FALSE(readLine(file.get(), buf, bufSize)) << bufSize;
@@ -96,33 +87,30 @@ TEST(DCUtilsFilesTest, ReadsNothingIntoATinyBuffer) {
     EXPECT_EQ('a', std::getc(file.get()));
 }
 
-TEST(DCUtilsFilesTest, ReportsAReadErrorLikeTheEnd) {
-    const TempDir dir;
-    const OpenFile file = opened(dir.file("text"), "w");
+TEST_F(DCUtilsFilesTest, AReadErrorIsReportedLikeTheEnd) {
+    const OpenFile file = opened("", "w");
     char buf[8];
     EXPECT_FALSE(readLine(file.get(), buf, sizeof buf));
 }
 
-TEST(DCUtilsFilesTest, WritesTexts) {
-    const TempDir dir;
-    const Pathname path(dir.file("out"));
+TEST_F(DCUtilsFilesTest, WritesTexts) {
     const struct {
         const char *text, *expected;
     } rows[] = {{"one\ntwo", "one\ntwo"}, {"", ""}, {"x", "x"}, {nullptr, ""}};
     for (const auto& row : rows) {
-        writeFile(path, "what was there before");
-        EXPECT_TRUE(writeText(path, row.text));
-        EXPECT_EQ(row.expected, readFile(path));
+        writeFile(_path, "what was there before");
+        EXPECT_TRUE(writeText(_path, row.text));
+        EXPECT_EQ(row.expected, readFile(_path));
     }
 }
 
-TEST(DCUtilsFilesTest, DoesNotWriteWhereNoFileCanBeOpened) {
-    const TempDir dir;
-    EXPECT_FALSE(writeText(Pathname(dir.file("missing/out")), "x"));
-    EXPECT_FALSE(writeText(Pathname(dir.path()), "x"));
+TEST_F(DCUtilsFilesTest, AFileThatCannotBeOpenedIsNeitherWrittenNorRead) {
+    EXPECT_FALSE(writeText(Pathname(_dir.file("missing/out")), "x"));
+    EXPECT_FALSE(writeText(Pathname(_dir.path()), "x"));
+    EXPECT_EQ(nullptr, readText(Pathname(_dir.file("missing"))));
 }
 
-TEST(DCUtilsFilesTest, DoesNotCheckWhetherTheTextWentOut) {
+TEST_F(DCUtilsFilesTest, WritingIsNotChecked) {
     if (::access("/dev/full", W_OK) != 0) {
         GTEST_SKIP() << "no /dev/full";
     }
@@ -136,41 +124,24 @@ void expectText(const std::string& expected, const Pathname& path) {
     EXPECT_EQ(expected + '\0', std::string(text.get(), expected.size() + 1)) << path;
 }
 
-TEST(DCUtilsFilesTest, ReadsWholeFiles) {
-    const TempDir dir;
-    const Pathname path(dir.file("text"));
+TEST_F(DCUtilsFilesTest, ReadsWholeFiles) {
     for (const std::string& contents :
          {""s, "x"s, "one\ntwo\n"s, "a\0b"s, "\xff\xfe"s, std::string(100000, 'y')}) {
-        writeFile(path, contents);
-        expectText(contents, path);
+        writeFile(_path, contents);
+        expectText(contents, _path);
     }
 }
 
-TEST(DCUtilsFilesTest, GivesNullForAFileThatCannotBeOpened) {
-    const TempDir dir;
-    EXPECT_EQ(nullptr, readText(Pathname(dir.file("missing"))));
+TEST_F(DCUtilsFilesTest, ReadsADirectoryAsAnEmptyText) {
+    // It opens and has a size, but no bytes can be read.
+    expectText("", Pathname(_dir.path()));
 }
 
-TEST(DCUtilsFilesTest, ReadsAFolderAsAnEmptyText) {
-    const TempDir dir;  // it opens and has a size, but no bytes can be read
-    expectText("", Pathname(dir.path()));
-}
-
-TEST(DCUtilsFilesTest, GivesNullForAFileWithoutASize) {
-    const TempDir dir;
-    writeFile(dir.file("text"), "x");
-    ScriptedCalls stats("stat");
-    stats.fail(EIO);
-    EXPECT_EQ(nullptr, readText(Pathname(dir.file("text"))));
-    EXPECT_EQ(1u, stats.calls());
-}
-
-TEST(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
+TEST_F(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
     // A FIFO and a file in /proc have the size 0.
-    const TempDir dir;
-    const Pathname fifo(dir.file("fifo"));
+    const Pathname fifo(_dir.file("fifo"));
     ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
-    for (const std::size_t size : {0u, 1u, 2u, 3u, 70000u}) {
+    for (const std::size_t size : {0u, 1u, 2u, 3u, 4u, 7u, 8u, 70000u}) {
         const std::string contents(size, 'z');
         std::thread writer([&] { writeFile(fifo, contents); });
         expectText(contents, fifo);
@@ -179,49 +150,6 @@ TEST(DCUtilsFilesTest, ReadsAFileThatIsLongerThanItsSize) {
     const std::unique_ptr<char[]> status(readText(Pathname("/proc/self/status")));
     ASSERT_NE(nullptr, status);
     EXPECT_TRUE(startsWith(status.get(), "Name:"));
-}
-
-TEST(DCUtilsFilesTest, DoublesTheArrayWheneverTheFileFillsIt) {
-    const TempDir dir;
-    const Pathname fifo(dir.file("fifo"));
-    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
-    const struct {
-        std::size_t size;
-        unsigned arrays;  // the first has room for the NUL alone
-    } rows[] = {{0, 1}, {1, 2}, {2, 3}, {3, 3}, {4, 4}, {7, 4}, {8, 5}};
-    for (const auto& row : rows) {
-        std::thread writer([&] { writeFile(fifo, std::string(row.size, 'z')); });
-        const ScriptedCalls allocations("new[]");
-        expectText(std::string(row.size, 'z'), fifo);
-        EXPECT_EQ(row.arrays, allocations.calls()) << row.size;
-        writer.join();
-    }
-}
-
-TEST(DCUtilsFilesTest, TellsWhenAFileDoesNotFitIntoMemory) {
-    const TempDir dir;
-    const Pathname path(dir.file("text"));
-    writeFile(path, "12345");
-    ScriptedCalls allocations("new[]");
-    allocations.fail(ENOMEM);
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(nullptr, readText(path));
-    EXPECT_EQ("Unable to alloc 5 for reading file " + path + "\n",
-              testing::internal::GetCapturedStdout());
-}
-
-TEST(DCUtilsFilesTest, TellsWhenAGrowingFileDoesNotFitIntoMemory) {
-    const TempDir dir;
-    const Pathname fifo(dir.file("fifo"));
-    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
-    std::thread writer([&] { writeFile(fifo, "12345"); });
-    ScriptedCalls allocations("new[]");
-    allocations.pass(2).fail(ENOMEM);
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(nullptr, readText(fifo));
-    EXPECT_EQ("Unable to alloc 0 for reading file " + fifo + "\n",
-              testing::internal::GetCapturedStdout());
-    writer.join();
 }
 
 }  // namespace

@@ -16,7 +16,7 @@
 
 namespace {
 
-std::string pattern(std::size_t size) {
+std::string letters(std::size_t size) {
     std::string text(size, '\0');
     for (std::size_t i = 0; i < size; ++i) {
         text[i] = static_cast<char>('a' + i % 23);
@@ -34,195 +34,119 @@ mode_t permissions(const Pathname& path) {
     return info.st_mode & 07777;
 }
 
-// Two ends of a pipe; write errors come back instead of a signal.
-struct Pipe {
-    Pipe() {
-        int ends[2];
-        EXPECT_EQ(0, ::pipe(ends));
-        in = ends[0];
-        out = ends[1];
-    }
-    ScopedFileDescriptor in, out;
+// A new file that is open for reading and writing, and another path beside it.
+class FileDescriptorTest : public testing::Test {
+protected:
+    const TempDir _dir;
+    const Pathname _path{_dir.file("a")};
+    const Pathname _other{_dir.file("b")};
+    const ScopedFileDescriptor _file{_path.openReadWriteOrCreate(Pathname::CREATE_NORMAL)};
 };
 
-// The umask of a scope.
 struct Umask {
     explicit Umask(mode_t mask) : previous(::umask(mask)) {}
     ~Umask() { ::umask(previous); }
     const mode_t previous;
 };
 
-TEST(FileDescriptorTest, IsANumberAndNoMore) {
-    EXPECT_EQ(sizeof(int), sizeof(FileDescriptor));
-    EXPECT_EQ(sizeof(int), sizeof(ScopedFileDescriptor));
-    EXPECT_EQ(sizeof(int), sizeof(ScopedSaferFileDescriptor));
-    EXPECT_TRUE(std::is_trivially_destructible_v<FileDescriptor>);
-    EXPECT_FALSE(std::is_polymorphic_v<FileDescriptor>);
-}
-
-TEST(FileDescriptorTest, IsValidUnlessNegative) {
-    EXPECT_TRUE(FileDescriptor(0).valid());
-    EXPECT_TRUE(FileDescriptor(7).valid());
-    EXPECT_FALSE(FileDescriptor(-1).valid());
-    EXPECT_FALSE(FileDescriptor(-7).valid());
-}
-
-TEST(FileDescriptorTest, ANumberServesForADescriptor) {
-    EXPECT_TRUE((std::is_convertible_v<int, FileDescriptor>));
+TEST_F(FileDescriptorTest, IsANumberThatIsValidUnlessNegative) {
+    EXPECT_TRUE(FileDescriptor(0).valid() && FileDescriptor(7).valid());
+    EXPECT_FALSE(FileDescriptor(-1).valid() || FileDescriptor(-7).valid());
     FileDescriptor file = -1;
-    EXPECT_FALSE(file.valid());
     file = 7;
     EXPECT_EQ(7, file._osdep);
 }
 
-TEST(FileDescriptorTest, ResultsHaveTheirTypes) {
-    const FileDescriptor none(-1);
-    const Pathname path;
-    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.read(nullptr, 0))>));
-    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.write(nullptr, 0))>));
-    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.write(std::string()))>));
-    EXPECT_TRUE((std::is_same_v<ssize_t, decltype(none.writev(nullptr, 0u))>));
-    EXPECT_TRUE((std::is_same_v<void, decltype(none.format("x"))>));
-    EXPECT_TRUE((std::is_same_v<void, decltype(none.setCloseOnExec(true))>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(none.seek_set(0))>));
-    EXPECT_TRUE((std::is_same_v<long long, decltype(none.seekEof())>));
-    EXPECT_TRUE((std::is_same_v<long long, decltype(none.curPos())>));
-    EXPECT_TRUE((std::is_same_v<void, decltype(none.sync())>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(none.copyTo(none))>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(none.copyTo(path))>));
-    EXPECT_TRUE((std::is_same_v<FileDescriptor, decltype(path.openReadOnly())>));
-    EXPECT_TRUE((std::is_same_v<int, decltype(none._osdep)>));
-}
-
-TEST(FileDescriptorTest, CopiesTheNumberAndClosesNothing) {
-    const TempDir dir;
-    FileDescriptor file = Pathname(dir.file("a")).openCreateOnly(Pathname::CREATE_NORMAL);
+TEST_F(FileDescriptorTest, CopiesTheNumberAndClosesNothing) {
     {
-        const FileDescriptor copy(file);
+        const FileDescriptor copy(_file);
         FileDescriptor assigned(-1);
-        assigned = file;
-        EXPECT_EQ(file._osdep, copy._osdep);
-        EXPECT_EQ(file._osdep, assigned._osdep);
+        assigned = _file;
+        EXPECT_EQ(_file._osdep, copy._osdep);
+        EXPECT_EQ(_file._osdep, assigned._osdep);
     }
-    EXPECT_TRUE(isOpen(file._osdep));
-    EXPECT_TRUE(file.close());
+    EXPECT_TRUE(isOpen(_file._osdep));
 }
 
-TEST(FileDescriptorTest, ReadsToTheEndOfTheFile) {
-    const TempDir dir;
-    writeFile(dir.file("a"), "hello");
-    const ScopedFileDescriptor file{Pathname(dir.file("a"))};
+TEST_F(FileDescriptorTest, ReadsToTheEndOfTheFile) {
+    writeFile(_path, "hello");
     char buf[] = "..........";
-    EXPECT_EQ(2, file.read(buf, 2));
+    EXPECT_EQ(2, _file.read(buf, 2));
     EXPECT_STREQ("he........", buf);
-    EXPECT_EQ(0, file.read(buf, 0));
-    EXPECT_EQ(3, file.read(buf, 10));
+    EXPECT_EQ(0, _file.read(buf, 0));
+    EXPECT_EQ(3, _file.read(buf, 10));
     EXPECT_STREQ("llo.......", buf);
-    EXPECT_EQ(0, file.read(buf, 10));
+    EXPECT_EQ(0, _file.read(buf, 10));
 }
 
-TEST(FileDescriptorTest, WritesBytesAndStrings) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    const ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
-    EXPECT_EQ(3, file.write("abcdef", 3));
-    EXPECT_EQ(0, file.write("abcdef", 0));
-    EXPECT_EQ(4, file.write(std::string("d\0ef", 4)));
-    EXPECT_EQ(0, file.write(std::string()));
-    EXPECT_EQ(std::string("abcd\0ef", 7), readFile(path));
-}
-
-TEST(FileDescriptorTest, WritesSeveralBuffersAtOnce) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    const ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
-    std::string first = "ab", second = "cde";
+TEST_F(FileDescriptorTest, WritesBytesStringsAndSeveralBuffers) {
+    EXPECT_EQ(3, _file.write("abcdef", 3));
+    EXPECT_EQ(0, _file.write("abcdef", 0));
+    EXPECT_EQ(4, _file.write(std::string("d\0ef", 4)));
+    EXPECT_EQ(0, _file.write(std::string()));
+    std::string first = "gh", second = "ijk";
     const struct iovec buffers[] = {{first.data(), first.size()}, {second.data(), second.size()}};
-    EXPECT_EQ(5, file.writev(buffers, 2));
-    EXPECT_EQ(2, file.writev(buffers, 1));
-    EXPECT_EQ("abcdeab", readFile(path));
+    EXPECT_EQ(5, _file.writev(buffers, 2));
+    EXPECT_EQ(2, _file.writev(buffers, 1));
+    EXPECT_EQ(std::string("abcd\0efghijkgh", 14), readFile(_path));
 }
 
-TEST(FileDescriptorTest, OperationsOnNoFileFailWithEbadf) {
-    const FileDescriptor none(-1);
-    char buf[4];
-    struct stat info;
-    long long size = 7;
-    const struct iovec buffer = {buf, sizeof buf};
-    const auto refused = [](bool failed) {
-        const bool result = failed && errno == EBADF;
+TEST_F(FileDescriptorTest, OperationsWithoutAFileFailWithEbadf) {
+    FileDescriptor closed(_path.openReadOnly());
+    const FileDescriptor stale(closed);
+    ASSERT_TRUE(closed.close());
+    for (const FileDescriptor& none : {FileDescriptor(-1), stale}) {
+        char buf[4];
+        struct stat info;
+        long long size = 7;
+        const struct iovec buffer = {buf, sizeof buf};
+        const auto refused = [](bool failed) {
+            const bool result = failed && errno == EBADF;
+            errno = 0;
+            return result;
+        };
         errno = 0;
-        return result;
-    };
-    errno = 0;
-    EXPECT_TRUE(refused(none.read(buf, sizeof buf) == -1));
-    EXPECT_TRUE(refused(none.write(buf, 0) == -1));
-    EXPECT_TRUE(refused(none.write("text") == -1));
-    EXPECT_TRUE(refused(none.writev(&buffer, 1) == -1));
-    EXPECT_TRUE(refused(!none.stat(&info)));
-    EXPECT_TRUE(refused(!none.getSize(&size)));
-    EXPECT_TRUE(refused(!none.seek_set(0)));
-    EXPECT_TRUE(refused(none.seekEof() == -1));
-    EXPECT_TRUE(refused(none.curPos() == -1));
-    EXPECT_TRUE(refused(!none.copyTo(FileDescriptor(-1))));
-    EXPECT_EQ(7, size);
-    none.format("%d", 5);
-    none.setCloseOnExec(true);
-    none.sync();
-    EXPECT_FALSE(none.copyTo(Pathname("/dev/null")));
+        EXPECT_TRUE(refused(none.read(buf, sizeof buf) == -1));
+        EXPECT_TRUE(refused(none.write(buf, 0) == -1));
+        EXPECT_TRUE(refused(none.write("text") == -1));
+        EXPECT_TRUE(refused(none.writev(&buffer, 1) == -1));
+        EXPECT_TRUE(refused(!none.stat(&info)));
+        EXPECT_TRUE(refused(!none.getSize(&size)));
+        EXPECT_TRUE(refused(!none.seek_set(0)));
+        EXPECT_TRUE(refused(none.seekEof() == -1));
+        EXPECT_TRUE(refused(none.curPos() == -1));
+        EXPECT_TRUE(refused(!none.copyTo(FileDescriptor(-1))));
+        EXPECT_FALSE(none.copyTo(_other));
+        EXPECT_EQ(7, size);
+        none.format("%d", 5);
+        none.setCloseOnExec(true);
+        none.sync();
+    }
+    EXPECT_FALSE(_other.exists());
 }
 
-TEST(FileDescriptorTest, OperationsOnAClosedDescriptorFail) {
-    const TempDir dir;
-    FileDescriptor file = Pathname(dir.file("a")).openReadWriteOrCreate(Pathname::CREATE_NORMAL);
-    const FileDescriptor stale(file);
-    ASSERT_TRUE(file.close());
-    char byte = 0;
-    EXPECT_EQ(-1, stale.write(&byte, 1));
-    EXPECT_EQ(EBADF, errno);
-    EXPECT_EQ(-1, stale.read(&byte, 1));
-    FileDescriptor again(stale);
-    EXPECT_FALSE(again.close());
-    EXPECT_EQ(-1, again._osdep);
-}
-
-TEST(FileDescriptorTest, CreateOnlyFailsOnAnExistingFile) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    EXPECT_TRUE(ScopedFileDescriptor(path.openCreateOnly(Pathname::CREATE_NORMAL)).valid());
-    EXPECT_EQ(-1, path.openCreateOnly(Pathname::CREATE_NORMAL)._osdep);
+TEST_F(FileDescriptorTest, CreateOnlyFailsOnAnExistingFile) {
+    EXPECT_EQ(-1, _path.openCreateOnly(Pathname::CREATE_NORMAL)._osdep);
     EXPECT_EQ(EEXIST, errno);
+    EXPECT_TRUE(ScopedFileDescriptor(_other.openCreateOnly(Pathname::CREATE_NORMAL)).valid());
 }
 
-TEST(FileDescriptorTest, CreateOrReplaceEmptiesAndAppendKeeps) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    const auto openAppend = [&] { return path.openCreateOrAppend(Pathname::CREATE_NORMAL); };
-    EXPECT_EQ(3, ScopedFileDescriptor(openAppend()).write("one"));
-    EXPECT_EQ(3, ScopedFileDescriptor(openAppend()).write("two"));
-    EXPECT_EQ("onetwo", readFile(path));
-    const ScopedFileDescriptor file = path.openCreateOrReplace(Pathname::CREATE_NORMAL);
-    EXPECT_EQ("", readFile(path));
+TEST_F(FileDescriptorTest, CreateOrReplaceEmptiesAndAppendWritesAtTheEnd) {
+    writeFile(_path, "one");
+    const ScopedFileDescriptor append(_path.openCreateOrAppend(Pathname::CREATE_NORMAL));
+    EXPECT_TRUE(append.seek_set(0));
+    EXPECT_EQ(3, append.write("two"));
+    EXPECT_EQ("onetwo", readFile(_path));
+    const ScopedFileDescriptor replace(_path.openCreateOrReplace(Pathname::CREATE_NORMAL));
+    EXPECT_EQ("", readFile(_path));
     char byte;
-    EXPECT_EQ(-1, file.read(&byte, 1));
+    EXPECT_EQ(-1, replace.read(&byte, 1));
 }
 
-TEST(FileDescriptorTest, AppendGoesToTheEndWhereverTheOffsetIs) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    writeFile(path, "1234");
-    const ScopedFileDescriptor file = path.openCreateOrAppend(Pathname::CREATE_NORMAL);
-    EXPECT_TRUE(file.seek_set(0));
-    EXPECT_EQ(1, file.write("5"));
-    EXPECT_EQ("12345", readFile(path));
-}
-
-TEST(FileDescriptorTest, ReadWriteOrCreateEmptiesAnExistingFile) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    writeFile(path, "old text");
-    const ScopedFileDescriptor file = path.openReadWriteOrCreate(Pathname::CREATE_NORMAL);
-    EXPECT_EQ("", readFile(path));
+TEST_F(FileDescriptorTest, ReadWriteOrCreateEmptiesAnExistingFile) {
+    writeFile(_path, "old text");
+    const ScopedFileDescriptor file(_path.openReadWriteOrCreate(Pathname::CREATE_NORMAL));
+    EXPECT_EQ("", readFile(_path));
     EXPECT_EQ(3, file.write("new"));
     EXPECT_TRUE(file.seek_set(0));
     char buf[3];
@@ -230,8 +154,7 @@ TEST(FileDescriptorTest, ReadWriteOrCreateEmptiesAnExistingFile) {
     EXPECT_EQ("new", std::string(buf, 3));
 }
 
-TEST(FileDescriptorTest, NewFilesHaveTheirModeReducedByTheUmask) {
-    const TempDir dir;
+TEST_F(FileDescriptorTest, NewFilesHaveTheirModeReducedByTheUmask) {
     const Umask mask(0026);
     const struct {
         Pathname::CreateMode mode;
@@ -240,107 +163,51 @@ TEST(FileDescriptorTest, NewFilesHaveTheirModeReducedByTheUmask) {
                 {Pathname::CREATE_PRIVATE, 0600},
                 {Pathname::CREATE_READABLE_NONPUBLIC, 0440}};
     for (const auto& row : rows) {
-        const Pathname path = dir.file("mode" + std::to_string(row.mode));
-        EXPECT_TRUE(ScopedFileDescriptor(path.openCreateOrAppend(row.mode)).valid());
-        EXPECT_EQ(row.expected, permissions(path));
+        EXPECT_TRUE(ScopedFileDescriptor(_other.openCreateOnly(row.mode)).valid());
+        EXPECT_EQ(row.expected, permissions(_other));
+        EXPECT_TRUE(_other.unlink());
     }
 }
 
-TEST(FileDescriptorTest, OpenedDescriptorsSurviveExecUntilToldOtherwise) {
-    const TempDir dir;
-    const ScopedFileDescriptor file =
-        Pathname(dir.file("a")).openCreateOnly(Pathname::CREATE_NORMAL);
-    EXPECT_EQ(0, ::fcntl(file._osdep, F_GETFD));
-    file.setCloseOnExec(true);
-    EXPECT_EQ(FD_CLOEXEC, ::fcntl(file._osdep, F_GETFD));
-    file.setCloseOnExec(true);
-    EXPECT_EQ(FD_CLOEXEC, ::fcntl(file._osdep, F_GETFD));
-    file.setCloseOnExec(false);
-    EXPECT_EQ(0, ::fcntl(file._osdep, F_GETFD));
+TEST_F(FileDescriptorTest, SetsAndClearsCloseOnExec) {
+    EXPECT_EQ(0, ::fcntl(_file._osdep, F_GETFD));
+    for (const bool on : {true, true, false, false}) {
+        _file.setCloseOnExec(on);
+        EXPECT_EQ(on ? FD_CLOEXEC : 0, ::fcntl(_file._osdep, F_GETFD));
+    }
 }
 
-TEST(FileDescriptorTest, SaferOpenDoesNotHangOnAFifo) {
-    const TempDir dir;
-    const Pathname fifo = dir.file("fifo");
-    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
-    const ScopedSaferFileDescriptor in(fifo);
-    ASSERT_TRUE(in.valid());
-    EXPECT_NE(0, ::fcntl(in._osdep, F_GETFL) & O_NONBLOCK);
+TEST_F(FileDescriptorTest, SaferOpenDoesNotHangOnAFifo) {
+    ASSERT_EQ(0, ::mkfifo(_other.c_str(), 0600));
+    // With a writer no open waits, so that a wrong flag fails here and hangs nowhere.
+    ScopedFileDescriptor writer(_other.openReadWriteOrCreate(Pathname::CREATE_NORMAL));
+    ASSERT_TRUE(writer.valid());
+    const ScopedSaferFileDescriptor in = _other;
+    ASSERT_EQ(O_NONBLOCK, ::fcntl(in._osdep, F_GETFL) & O_NONBLOCK);
     char byte;
-    EXPECT_EQ(0, in.read(&byte, 1));
-
-    // It stays non-blocking: with a writer and no data, reading fails instead of waiting.
-    const ScopedFileDescriptor out = fifo.openCreateOrAppend(Pathname::CREATE_NORMAL);
     EXPECT_EQ(-1, in.read(&byte, 1));
     EXPECT_EQ(EAGAIN, errno);
+    EXPECT_TRUE(writer.close());
+    EXPECT_TRUE(ScopedSaferFileDescriptor(_other).valid());
+    EXPECT_EQ(0, in.read(&byte, 1));
 }
 
-TEST(FileDescriptorTest, SeeksAndMeasures) {
-    const TempDir dir;
-    const ScopedFileDescriptor file =
-        Pathname(dir.file("a")).openReadWriteOrCreate(Pathname::CREATE_NORMAL);
-    EXPECT_EQ(0, file.curPos());
-    EXPECT_EQ(5, file.write("12345"));
-    EXPECT_EQ(5, file.curPos());
-    EXPECT_TRUE(file.seek_set(2));
-    EXPECT_EQ(2, file.curPos());
-    EXPECT_FALSE(file.seek_set(-1));
+TEST_F(FileDescriptorTest, SeeksAndMeasuresPastFourGigabytes) {
+    constexpr long long offset = 5LL << 30;
+    EXPECT_EQ(0, _file.curPos());
+    EXPECT_TRUE(_file.seek_set(offset));
+    EXPECT_EQ(offset, _file.curPos());
+    EXPECT_FALSE(_file.seek_set(-1));
     EXPECT_EQ(EINVAL, errno);
-    EXPECT_EQ(2, file.curPos());
-    EXPECT_EQ(5, file.seekEof());
+    EXPECT_EQ(1, _file.write("x"));
+    EXPECT_TRUE(_file.seek_set(2));
+    EXPECT_EQ(offset + 1, _file.seekEof());
+    EXPECT_EQ(offset + 1, _file.curPos());
     long long size = 0;
     struct stat info;
-    EXPECT_TRUE(file.getSize(&size));
-    EXPECT_TRUE(file.stat(&info));
-    EXPECT_EQ(5, size);
-    EXPECT_EQ(5, info.st_size);
-    file.sync();
-}
-
-TEST(FileDescriptorTest, SeeksPastFourGigabytes) {
-    constexpr long long offset = 5LL << 30;
-    const TempDir dir;
-    const Pathname path = dir.file("sparse");
-    const ScopedFileDescriptor file = path.openReadWriteOrCreate(Pathname::CREATE_NORMAL);
-    EXPECT_TRUE(file.seek_set(offset));
-    EXPECT_EQ(offset, file.curPos());
-    EXPECT_EQ(1, file.write("x"));
-    EXPECT_EQ(offset + 1, file.seekEof());
-    long long size = 0;
-    EXPECT_TRUE(file.getSize(&size));
+    EXPECT_TRUE(_file.getSize(&size) && _file.stat(&info));
     EXPECT_EQ(offset + 1, size);
-    EXPECT_TRUE(file.seek_set(offset));
-    char byte = 0;
-    EXPECT_EQ(1, file.read(&byte, 1));
-    EXPECT_EQ('x', byte);
-}
-
-TEST(FileDescriptorTest, APipeCannotSeek) {
-    const Pipe pipe;
-    EXPECT_FALSE(pipe.in.seek_set(0));
-    EXPECT_EQ(ESPIPE, errno);
-    EXPECT_EQ(-1, pipe.in.seekEof());
-    EXPECT_EQ(-1, pipe.in.curPos());
-}
-
-TEST(FileDescriptorTest, FormatsTextsAroundItsStackBuffer) {
-    const TempDir dir;
-    for (const int length : {0, 1, 254, 255, 256, 257, 511, 512, 5000}) {
-        const Pathname path = dir.file(std::to_string(length));
-        const std::string text = pattern(static_cast<std::size_t>(length));
-        ScopedFileDescriptor(path.openCreateOnly(Pathname::CREATE_NORMAL))
-            .format("%s", text.c_str());
-        EXPECT_EQ(text, readFile(path)) << length;
-    }
-}
-
-TEST(FileDescriptorTest, FormatsAllItsArgumentsOnEveryPass) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    const std::string text = pattern(300);
-    ScopedFileDescriptor(path.openCreateOnly(Pathname::CREATE_NORMAL))
-        .format("%d|%s|%c%c|%5.2f", 42, text.c_str(), 'x', '\0', 2.5);
-    EXPECT_EQ("42|" + text + "|x" + std::string(1, '\0') + "| 2.50", readFile(path));
+    EXPECT_EQ(offset + 1, info.st_size);
 }
 
 // As a wrapper of the caller's own would use it; writes the text twice.
@@ -353,132 +220,90 @@ __attribute__((format(printf, 2, 3))) void formatTwice(const FileDescriptor& fil
     va_end(args);
 }
 
-TEST(FileDescriptorTest, VformatLeavesTheArgumentsToItsCaller) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    const std::string text = pattern(300);
-    const ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
-    formatTwice(file, "%d %s;", 5, "short");
-    formatTwice(file, "%s", text.c_str());
-    EXPECT_EQ("5 short;5 short;" + text + text, readFile(path));
+TEST_F(FileDescriptorTest, FormatsTextsOfAnyLength) {
+    std::string expected;
+    for (const std::size_t length : {0u, 1u, 254u, 255u, 256u, 257u, 511u, 512u, 5000u}) {
+        const std::string text = letters(length);
+        _file.format("%d|%s|%c%c|%5.2f;", 42, text.c_str(), 'x', '\0', 2.5);
+        formatTwice(_file, "%s", text.c_str());
+        expected += "42|" + text + "|x" + '\0' + "| 2.50;" + text + text;
+    }
+    EXPECT_EQ(expected, readFile(_path));
 }
 
-TEST(FileDescriptorTest, CopiesFromTheOffsetToTheEnd) {
-    const TempDir dir;
-    const Pathname from = dir.file("from"), to = dir.file("to");
+TEST_F(FileDescriptorTest, CopiesFromTheOffsetToTheEnd) {
     for (const std::size_t size : {0u, 1u, 8191u, 8192u, 8193u, 16384u, 100000u}) {
-        const std::string text = pattern(size);
-        writeFile(from, text);
-        const ScopedFileDescriptor in(from);
-        EXPECT_TRUE(in.copyTo(to)) << size;
-        EXPECT_EQ(text, readFile(to));
-        EXPECT_TRUE(in.copyTo(to)) << "nothing is left";
-        EXPECT_EQ("", readFile(to));
+        const std::string text = letters(size);
+        writeFile(_path, text);
+        const ScopedFileDescriptor in = _path;
+        EXPECT_TRUE(in.copyTo(_other)) << size;
+        EXPECT_EQ(text, readFile(_other));
+        EXPECT_TRUE(in.copyTo(_other)) << "nothing is left";
+        EXPECT_EQ("", readFile(_other));
         EXPECT_TRUE(in.seek_set(static_cast<long long>(size / 2)));
-        EXPECT_TRUE(in.copyTo(to)) << size;
-        EXPECT_EQ(text.substr(size / 2), readFile(to));
+        EXPECT_TRUE(in.copyTo(_other)) << size;
+        EXPECT_EQ(text.substr(size / 2), readFile(_other));
     }
+    EXPECT_TRUE(ScopedFileDescriptor("/dev/null").copyTo(FileDescriptor(-1)));
 }
 
-TEST(FileDescriptorTest, CopiesToADestinationOfAnyKind) {
-    const TempDir dir;
-    const Pathname from = dir.file("from"), to = dir.file("to");
-    writeFile(from, "text");
-    const ScopedFileDescriptor out = to.openCreateOnly(Pathname::CREATE_NORMAL);
-    const FileDescriptor plain(out);
-    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(out));
-    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(plain));
-    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(out._osdep));
-    EXPECT_EQ("texttexttext", readFile(to));
-    for (const char* name : {"literal", "string", "path"}) {
-        const std::string copy = dir.file(name);
-        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(copy.c_str()));
-        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(copy));
-        EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(Pathname(copy)));
-        EXPECT_EQ("text", readFile(copy));
-    }
-}
-
-TEST(FileDescriptorTest, CopyingNothingNeedsNoDestination) {
-    EXPECT_TRUE(ScopedFileDescriptor(Pathname("/dev/null")).copyTo(FileDescriptor(-1)));
-}
-
-TEST(FileDescriptorTest, CopiesThroughPipes) {
-    const TempDir dir;
-    const Pathname to = dir.file("to");
-    const std::string text = pattern(300000);
-    Pipe first, second;
+TEST_F(FileDescriptorTest, CopiesThroughAPipe) {
+    const std::string text = letters(300000);
+    int ends[2];
+    ASSERT_EQ(0, ::pipe(ends));
+    const ScopedFileDescriptor in((FileDescriptor(ends[0])));
+    ScopedFileDescriptor out((FileDescriptor(ends[1])));
+    EXPECT_FALSE(in.seek_set(0));
+    EXPECT_EQ(ESPIPE, errno);
+    EXPECT_EQ(-1, in.seekEof());
+    EXPECT_EQ(-1, in.curPos());
+    writeFile(_path, text);
     std::thread feed([&] {
-        EXPECT_EQ(300000, first.out.write(text));
-        EXPECT_TRUE(first.out.close());
+        EXPECT_TRUE(_file.copyTo(out));
+        EXPECT_TRUE(out.close());
     });
-    std::thread relay([&] {
-        EXPECT_TRUE(first.in.copyTo(second.out));
-        EXPECT_TRUE(second.out.close());
-    });
-    EXPECT_TRUE(second.in.copyTo(to));
+    EXPECT_TRUE(in.copyTo(_other.c_str()));
     feed.join();
-    relay.join();
-    EXPECT_EQ(text, readFile(to));
+    EXPECT_EQ(text, readFile(_other));
 }
 
-TEST(FileDescriptorTest, ACopyHasItsSourcesPermissionsAndReplacesTheDestination) {
-    const TempDir dir;
+TEST_F(FileDescriptorTest, ACopyHasItsSourcesPermissionsAndReplacesTheDestination) {
     const Umask mask(0);
-    const Pathname from = dir.file("from"), fresh = dir.file("fresh"), old = dir.file("old");
-    writeFile(from, "text");
+    const Pathname old = _dir.file("old");
+    writeFile(_path, "text");
     writeFile(old, "a much longer text");
-    ASSERT_EQ(0, ::chmod(from.c_str(), 0651));
+    ASSERT_EQ(0, ::chmod(_path.c_str(), 0651));
     ASSERT_EQ(0, ::chmod(old.c_str(), 0600));
-    EXPECT_TRUE(ScopedFileDescriptor(from).copyTo(fresh));
-    EXPECT_TRUE(from.copyTo(old));
-    EXPECT_EQ("text", readFile(fresh));
+    EXPECT_TRUE(ScopedFileDescriptor(_path).copyTo(_other));
+    EXPECT_TRUE(_path.copyTo(old));
+    EXPECT_EQ("text", readFile(_other));
     EXPECT_EQ("text", readFile(old));
-    EXPECT_EQ(mode_t{0651}, permissions(fresh));
+    EXPECT_EQ(mode_t{0651}, permissions(_other));
     EXPECT_EQ(mode_t{0600}, permissions(old)) << "an existing file keeps its own";
 
     const Umask tighter(0077);
-    EXPECT_TRUE(fresh.unlink() && from.copyTo(fresh));
-    EXPECT_EQ(mode_t{0600}, permissions(fresh));
+    EXPECT_TRUE(_other.unlink() && _path.copyTo(_other));
+    EXPECT_EQ(mode_t{0600}, permissions(_other));
 }
 
-TEST(FileDescriptorTest, CopyFailsWithoutASourceOrADestination) {
-    const TempDir dir;
-    const Pathname from = dir.file("from"), to = dir.file("to"), nowhere = dir.file("no/where");
-    EXPECT_FALSE(from.copyTo(to));
-    EXPECT_EQ(ENOENT, errno);
-    EXPECT_FALSE(to.exists());
-    writeFile(from, "text");
-    errno = 0;
-    EXPECT_FALSE(from.copyTo(nowhere));
-    EXPECT_EQ(ENOENT, errno);
-    errno = 0;
-    EXPECT_FALSE(Pathname(dir.path()).copyTo(to)) << "a folder opens, but does not read";
-    EXPECT_EQ(EISDIR, errno);
+TEST_F(FileDescriptorTest, CopyFailsWithoutASourceOrADestination) {
+    writeFile(_path, "text");
+    const struct {
+        Pathname from, to;
+        int error;
+    } rows[] = {{_dir.file("absent"), _other, ENOENT},
+                {_path, _dir.file("no/where"), ENOENT},
+                {_dir.path(), _other, EISDIR},
+                {_path, "/dev/full", ENOSPC}};
+    for (const auto& row : rows) {
+        errno = 0;
+        EXPECT_FALSE(row.from.copyTo(row.to)) << row.from << ' ' << row.to;
+        EXPECT_EQ(row.error, errno) << row.from << ' ' << row.to;
+    }
 }
 
-TEST(FileDescriptorTest, AFullDeviceStopsWritingAndCopying) {
-    const TempDir dir;
-    const Pathname from = dir.file("from");
-    writeFile(from, pattern(10000));
-    const ScopedFileDescriptor full =
-        Pathname("/dev/full").openCreateOrAppend(Pathname::CREATE_NORMAL);
-    ASSERT_TRUE(full.valid());
-    errno = 0;
-    EXPECT_EQ(-1, full.write("x"));
-    EXPECT_EQ(ENOSPC, errno);
-    full.format("%s", "swallowed");
-    errno = 0;
-    EXPECT_FALSE(ScopedFileDescriptor(from).copyTo(full));
-    EXPECT_EQ(ENOSPC, errno);
-    errno = 0;
-    EXPECT_FALSE(from.copyTo("/dev/full"));
-    EXPECT_EQ(ENOSPC, errno);
-}
-
-TEST(FileDescriptorTest, ClosingTwiceIsHarmless) {
-    const TempDir dir;
-    FileDescriptor file = Pathname(dir.file("a")).openCreateOnly(Pathname::CREATE_NORMAL);
+TEST_F(FileDescriptorTest, ClosingTwiceIsHarmless) {
+    FileDescriptor file(_path.openReadOnly());
     const int number = file._osdep;
     EXPECT_TRUE(file.close());
     EXPECT_EQ(-1, file._osdep);
@@ -486,36 +311,32 @@ TEST(FileDescriptorTest, ClosingTwiceIsHarmless) {
     EXPECT_TRUE(file.close());
 }
 
-TEST(ScopedFileDescriptorTest, OpensForReading) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    writeFile(path, "x");
-    const ScopedFileDescriptor plain(path);
-    const ScopedSaferFileDescriptor safer(path);
-    EXPECT_EQ(O_RDONLY, ::fcntl(plain._osdep, F_GETFL) & (O_ACCMODE | O_NONBLOCK));
-    EXPECT_EQ(O_RDONLY | O_NONBLOCK, ::fcntl(safer._osdep, F_GETFL) & (O_ACCMODE | O_NONBLOCK));
-    EXPECT_TRUE(ScopedFileDescriptor(path.c_str()).valid());
-    EXPECT_TRUE(ScopedSaferFileDescriptor(dir.file("a")).valid());
+template <typename Scoped>
+class ScopedFileDescriptorTest : public FileDescriptorTest {};
+using ScopedTypes = testing::Types<ScopedFileDescriptor, ScopedSaferFileDescriptor>;
+TYPED_TEST_SUITE(ScopedFileDescriptorTest, ScopedTypes);
+
+TYPED_TEST(ScopedFileDescriptorTest, IsMadeFromAPathButOnlyOnRequestFromADescriptor) {
+    EXPECT_TRUE((std::is_convertible_v<const Pathname&, TypeParam>));
+    EXPECT_FALSE((std::is_convertible_v<FileDescriptor, TypeParam>));
+    EXPECT_FALSE((std::is_assignable_v<TypeParam&, Pathname>));
+    EXPECT_FALSE(TypeParam().valid());
 }
 
-TEST(ScopedFileDescriptorTest, HoldsNoFileWhenItCannotBeOpened) {
-    const TempDir dir;
-    const Pathname absent = dir.file("absent");
+TYPED_TEST(ScopedFileDescriptorTest, OpensForReading) {
+    const TypeParam file = this->_path;
+    const int safer = std::is_same_v<TypeParam, ScopedSaferFileDescriptor> ? O_NONBLOCK : 0;
+    EXPECT_EQ(O_RDONLY | safer, ::fcntl(file._osdep, F_GETFL) & (O_ACCMODE | O_NONBLOCK));
     errno = 0;
-    EXPECT_EQ(-1, ScopedFileDescriptor(absent)._osdep);
-    EXPECT_EQ(ENOENT, errno);
-    errno = 0;
-    EXPECT_EQ(-1, ScopedSaferFileDescriptor(absent)._osdep);
+    EXPECT_EQ(-1, TypeParam(this->_other)._osdep);
     EXPECT_EQ(ENOENT, errno);
 }
 
-TEST(ScopedFileDescriptorTest, TakesWhatAnOpenReturns) {
-    const TempDir dir;
-    const Pathname path = dir.file("a");
-    ScopedFileDescriptor file = path.openCreateOnly(Pathname::CREATE_NORMAL);
+TYPED_TEST(ScopedFileDescriptorTest, TakesWhatAnOpenReturns) {
+    TypeParam file(this->_path.openReadOnly());
     const int first = file._osdep;
     EXPECT_TRUE(isOpen(first));
-    file = path.openReadOnly();
+    file = this->_path.openReadOnly();
     EXPECT_FALSE(isOpen(first)) << "the new file is open before the old one is closed";
     EXPECT_TRUE(isOpen(file._osdep));
 }

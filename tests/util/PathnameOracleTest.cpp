@@ -10,9 +10,9 @@
 
 namespace {
 
-const std::string alphabet = "/.a";
-constexpr std::size_t maxLength = 7;
-constexpr std::size_t pathCount = 3280;  // (3^8 - 1) / 2
+const std::string ALPHABET = "/.a";
+constexpr std::size_t MAX_LENGTH = 7;
+constexpr std::size_t PATH_COUNT = 3280;  // (3^8 - 1) / 2
 
 // What a changing operation leaves of a path.
 std::string after(void (Pathname::*operation)(), const std::string& text) {
@@ -22,7 +22,7 @@ std::string after(void (Pathname::*operation)(), const std::string& text) {
 }
 
 TEST(PathnameOracleTest, EditsEveryShortPathAsTheSlowVersions) {
-    const std::size_t compared = forEachString(alphabet, maxLength, [](const std::string& text) {
+    const std::size_t compared = forEachString(ALPHABET, MAX_LENGTH, [](const std::string& text) {
         const Pathname path(text);
         ASSERT_EQ(path_oracle::removeDotDotSlash(text), after(&Pathname::removeDotDotSlash, text))
             << text;
@@ -38,13 +38,13 @@ TEST(PathnameOracleTest, EditsEveryShortPathAsTheSlowVersions) {
         ASSERT_EQ(path_oracle::ext(text), path.ext()) << text;
         ASSERT_EQ(path_oracle::basenameWithoutExt(text), path.basenameWithoutExt()) << text;
     });
-    EXPECT_EQ(pathCount, compared);
+    EXPECT_EQ(PATH_COUNT, compared);
 }
 
 TEST(PathnameOracleTest, JoinsEveryPairOfShortPathsAsTheSlowVersion) {
     std::vector<std::string> texts;
-    forEachString(alphabet, maxLength, [&](const std::string& text) { texts.push_back(text); });
-    ASSERT_EQ(pathCount, texts.size());
+    forEachString(ALPHABET, MAX_LENGTH, [&](const std::string& text) { texts.push_back(text); });
+    ASSERT_EQ(PATH_COUNT, texts.size());
     for (const std::string& text : texts) {
         const Pathname path(text);
         for (const std::string& elem : texts) {
@@ -61,7 +61,7 @@ TEST(PathnameOracleTest, JoinsEveryPairOfShortPathsAsTheSlowVersion) {
 
 // What the operations are for, on each path.
 TEST(PathnameOracleTest, EditedPathsKeepTheirPromises) {
-    forEachString(alphabet, maxLength, [](const std::string& text) {
+    forEachString(ALPHABET, MAX_LENGTH, [](const std::string& text) {
         const std::string confined = '/' + after(&Pathname::removeDotDotSlash, text) + '/';
         ASSERT_EQ(std::string::npos, confined.find("/../")) << text;
         ASSERT_EQ(std::string::npos, after(&Pathname::removeDoubleSeps, text).find("//")) << text;

@@ -5,32 +5,17 @@
 
 #include <climits>
 #include <cstdint>
-#include <cstdlib>
+#include <cstdio>
 #include <random>
+#include <sstream>
 #include <string>
-#include <type_traits>
-#include <vector>
 
-#include "support/ScriptedCalls.h"
-
-extern "C" {
-int __real_gettimeofday(struct timeval* now, void* zone);
-int __wrap_gettimeofday(struct timeval* now, void* zone) {
-    return scriptedCall("gettimeofday", [&] { return __real_gettimeofday(now, zone); });
-}
-struct tm* __real_localtime_r(const time_t* seconds, struct tm* result);
-struct tm* anotherLocalTime = nullptr;  // what localtime_r returns instead, when set
-struct tm* __wrap_localtime_r(const time_t* seconds, struct tm* result) {
-    if (anotherLocalTime != nullptr) {
-        return anotherLocalTime;
-    }
-    return scriptedCall("localtime_r", [&] { return __real_localtime_r(seconds, result); });
-}
-}
+#include "support/Examples.h"
+#include "support/TimeZone.h"
 
 namespace {
 
-constexpr long long maxSec = 2147483647;
+constexpr long long MAX_SEC = 2147483647;
 
 Timeval at(long long seconds, long long microseconds) {
     Timeval result;
@@ -43,20 +28,17 @@ std::string str(const Timeval& t) {
     return std::to_string(t._tv.tv_sec) + ':' + std::to_string(t._tv.tv_usec);
 }
 
-TEST(TimevalTest, StartsAtTheEpoch) {
-    EXPECT_EQ("0:0", str(Timeval()));
-}
-
-TEST(TimevalTest, CopiesBothFields) {
+TEST(TimevalTest, StartsAtTheEpochAndCopiesBothFields) {
+    Timeval assigned;
+    EXPECT_EQ("0:0", str(assigned));
     const Timeval original = at(5, 7);
     const Timeval copy(original);
-    Timeval assigned;
     assigned = original;
     EXPECT_EQ("5:7", str(copy));
     EXPECT_EQ("5:7", str(assigned));
 }
 
-TEST(TimevalTest, TellsWholeSecondsAndMilliseconds) {
+TEST(TimevalTest, GivesWholeSecondsAndMilliseconds) {
     EXPECT_EQ(12, at(12, 345678).sec());
     EXPECT_EQ(12345, at(12, 345678).msec());
     EXPECT_EQ(12999, at(12, 999000).msec());
@@ -68,16 +50,14 @@ TEST(TimevalTest, SetCarriesMicrosecondsOutsideTheirRange) {
     const struct {
         long long seconds, microseconds;
         const char* expected;
-    } rows[] = {
-        {3, 0, "3:0"},
-        {3, 999999, "3:999999"},
-        {3, 1000000, "4:0"},
-        {3, 2500000, "5:500000"},
-        {3, -1, "2:999999"},
-        {3, -1000000, "2:0"},
-        {3, -1000001, "1:999999"},
-        {-4, 10, "-4:10"},
-    };
+    } rows[] = {{3, 0, "3:0"},
+                {3, 999999, "3:999999"},
+                {3, 1000000, "4:0"},
+                {3, 2500000, "5:500000"},
+                {3, -1, "2:999999"},
+                {3, -1000000, "2:0"},
+                {3, -1000001, "1:999999"},
+                {-4, 10, "-4:10"}};
     for (const auto& row : rows) {
         Timeval t;
         t.set(row.seconds, row.microseconds);
@@ -87,21 +67,13 @@ TEST(TimevalTest, SetCarriesMicrosecondsOutsideTheirRange) {
 
 TEST(TimevalTest, SetToNowLiesBetweenTwoReadingsOfTheClock) {
     struct timeval before, after;
-    ASSERT_EQ(0, __real_gettimeofday(&before, nullptr));
+    ASSERT_EQ(0, ::gettimeofday(&before, nullptr));
     const Timeval now = Timeval::now();
-    ASSERT_EQ(0, __real_gettimeofday(&after, nullptr));
+    const CurrentTimeval current;
+    ASSERT_EQ(0, ::gettimeofday(&after, nullptr));
     EXPECT_LE(at(before.tv_sec, before.tv_usec), now);
-    EXPECT_LE(now, at(after.tv_sec, after.tv_usec));
-}
-
-TEST(TimevalTest, SetToNowAbortsWhenTheClockFails) {
-    EXPECT_EXIT(
-        {
-            ScriptedCalls clock("gettimeofday");
-            clock.fail(EFAULT);
-            Timeval().setToNow();
-        },
-        testing::KilledBySignal(SIGABRT), "^$");
+    EXPECT_LE(now, current);
+    EXPECT_LE(current, at(after.tv_sec, after.tv_usec));
 }
 
 TEST(TimevalTest, SetToMaxIsTheLargestInstant) {
@@ -110,63 +82,38 @@ TEST(TimevalTest, SetToMaxIsTheLargestInstant) {
     EXPECT_EQ("2147483647:999999", str(t));
 }
 
-TEST(TimevalTest, AddSecSaturates) {
-    const struct {
-        Timeval start;
-        unsigned secs;
-        const char* expected;
-    } rows[] = {
-        {at(0, 0), 0, "0:0"},
-        {at(1, 2), 3, "4:2"},
-        {at(0, 5), 2147483647u, "2147483647:5"},
-        {at(0, 5), 2147483648u, "2147483647:999999"},
-        {at(maxSec, 5), 0, "2147483647:5"},
-        {at(maxSec, 5), 1, "2147483647:999999"},
-        {at(1, 0), UINT_MAX, "2147483647:999999"},
-        {at(-5, 0), 3000000000u, "2147483647:999999"},
-        {at(-2000000000, 9), 3000000000u, "1000000000:9"},
-        {at(-2147483648LL, 9), UINT_MAX, "2147483647:9"},
-        // Instants that only a 64-bit time_t holds saturate, too.
-        {at(maxSec + 1, 0), 0, "2147483647:999999"},
-        {at(LLONG_MAX, 0), UINT_MAX, "2147483647:999999"},
-        {at(LLONG_MIN, 1), 0, "-9223372036854775808:1"},
+// A function of one text, an instant and a number, that gives the sum.
+template <typename Number>
+auto sumOf(void (Timeval::*add)(Number)) {
+    return [add](const std::string& text) {
+        long long seconds = 0, microseconds = 0;
+        unsigned long long number = 0;
+        EXPECT_EQ(3,
+                  std::sscanf(text.c_str(), "%lld:%lld + %llu", &seconds, &microseconds, &number));
+        Timeval sum = at(seconds, microseconds);
+        (sum.*add)(static_cast<Number>(number));
+        return str(sum);
     };
-    for (const auto& row : rows) {
-        Timeval t = row.start;
-        t.addSec(row.secs);
-        EXPECT_EQ(row.expected, str(t)) << str(row.start) << " + " << row.secs;
-    }
+}
+
+TEST(TimevalTest, AddSecSaturates) {
+    expectEach(
+        sumOf(&Timeval::addSec),
+        {"1:2 + 3 > 4:2", "0:5 + 2147483647 > 2147483647:5", "0:5 + 2147483648 > 2147483647:999999",
+         "2147483647:5 + 0 > 2147483647:5", "2147483647:5 + 1 > 2147483647:999999",
+         "-2000000000:9 + 3000000000 > 1000000000:9", "-2147483648:9 + 4294967295 > 2147483647:9"});
+    // An instant that only a 64-bit time_t holds.
+    expectEach(sumOf(&Timeval::addSec), {"2147483648:0 + 0 > 2147483647:999999"});
 }
 
 TEST(TimevalTest, AddMsecCarriesAndSaturates) {
-    const struct {
-        Timeval start;
-        unsigned long long msecs;
-        const char* expected;
-    } rows[] = {
-        {at(0, 0), 0, "0:0"},
-        {at(0, 0), 1, "0:1000"},
-        {at(7, 250000), 1500, "8:750000"},
-        {at(7, 999999), 999, "8:998999"},
-        {at(7, 999000), 1, "8:0"},
-        {at(7, 998999), 1, "7:999999"},
-        {at(0, 0), 2147483646999ULL, "2147483646:999000"},
-        {at(0, 0), 2147483647000ULL, "2147483647:999999"},
-        {at(-100, 0), 2147483647000ULL, "2147483647:999999"},
-        {at(0, 0), ULLONG_MAX, "2147483647:999999"},
-        {at(1, 1000), 2147483646999ULL, "2147483647:999999"},
-        {at(0, 1000), 2147483646999ULL, "2147483647:0"},
-        {at(maxSec, 999999), 0, "2147483647:999999"},
-        {at(maxSec, 0), 999, "2147483647:999000"},
-        {at(maxSec, 1000), 999, "2147483647:999999"},
-        {at(maxSec, 999999), 1, "2147483647:999999"},
-        {at(-1, 999999), 1, "0:999"},
-    };
-    for (const auto& row : rows) {
-        Timeval t = row.start;
-        t.addMsec(row.msecs);
-        EXPECT_EQ(row.expected, str(t)) << str(row.start) << " + " << row.msecs;
-    }
+    expectEach(
+        sumOf(&Timeval::addMsec),
+        {"0:0 + 1 > 0:1000", "7:999999 + 999 > 8:998999", "7:999000 + 1 > 8:0",
+         "0:0 + 2147483646999 > 2147483646:999000", "0:0 + 2147483647000 > 2147483647:999999",
+         "-100:0 + 2147483647000 > 2147483647:999999", "1:1000 + 2147483646999 > 2147483647:999999",
+         "0:1000 + 2147483646999 > 2147483647:0", "2147483647:999999 + 1 > 2147483647:999999",
+         "-1:999999 + 1 > 0:999", "0:0 + 18446744073709551615 > 2147483647:999999"});
 }
 
 TEST(TimevalTest, AddMsecAssertsThatTheMicrosecondsWereInRange) {
@@ -199,10 +146,10 @@ std::string addIn32Bits(const Timeval& start, unsigned long long msecs, bool who
 }
 
 TEST(TimevalTest, AdditionsAgreeWith32BitArithmetic) {
-    constexpr unsigned seed = 20240607;
-    SCOPED_TRACE(seed);
-    std::mt19937_64 random(seed);
-    const long long edges[] = {-2147483648LL, -2147483647LL, -1, 0, 1, maxSec - 1, maxSec};
+    constexpr unsigned SEED = 20240607;
+    SCOPED_TRACE(SEED);
+    std::mt19937_64 random(SEED);
+    const long long edges[] = {-2147483648LL, -2147483647LL, -1, 0, 1, MAX_SEC - 1, MAX_SEC};
     for (int i = 0; i < 200000; ++i) {
         const auto any = static_cast<std::int32_t>(static_cast<std::uint32_t>(random()));
         const long long sec = i % 3 == 0 ? edges[random() % 7] : any;
@@ -223,8 +170,8 @@ TEST(TimevalTest, AdditionsAgreeWith32BitArithmetic) {
 }
 
 TEST(TimevalTest, OrdersBySecondsThenMicroseconds) {
-    const Timeval ascending[] = {at(-2, 999999), at(-1, 0), at(-1, 1),     at(0, 0),
-                                 at(0, 1),       at(3, 5),  at(maxSec, 0), at(maxSec, 999999)};
+    const Timeval ascending[] = {at(-2, 999999), at(-1, 0), at(-1, 1),      at(0, 0),
+                                 at(0, 1),       at(3, 5),  at(MAX_SEC, 0), at(MAX_SEC, 999999)};
     for (const Timeval& a : ascending) {
         for (const Timeval& b : ascending) {
             EXPECT_EQ(&a < &b, a < b) << str(a) << ' ' << str(b);
@@ -235,115 +182,62 @@ TEST(TimevalTest, OrdersBySecondsThenMicroseconds) {
     }
 }
 
-TEST(TimevalTest, MsecDifferenceRoundsTheSubSecondPartUp) {
-    const struct {
-        Timeval a, b;
-        long long expected;
-    } rows[] = {
-        {at(5, 5), at(5, 5), 0},
-        {at(5, 6), at(5, 5), 1},
-        {at(5, 1005), at(5, 5), 1},
-        {at(5, 1006), at(5, 5), 2},
-        {at(10, 0), at(9, 999999), 1},
-        {at(10, 0), at(8, 0), 2000},
-        {at(10, 0), at(8, 999000), 1001},
-        // A second is borrowed and its rest rounded up: less than a millisecond earlier is 0.
-        {at(5, 5), at(5, 6), 0},
-        {at(5, 0), at(5, 999), 0},
-        {at(5, 0), at(5, 1000), -1},
-        {at(5, 0), at(5, 1001), -1},
-        {at(8, 0), at(10, 0), -2000},
-        {at(maxSec, 999999), at(-2147483648LL, 0), 4294967296000LL},
-        {at(-2147483648LL, 0), at(maxSec, 999999), -4294967295999LL},
+// A function of one text, two instants, that gives their difference.
+template <typename Result>
+auto differenceOf(Result (*difference)(const Timeval&, const Timeval&)) {
+    return [difference](const std::string& text) {
+        long long values[4] = {};
+        EXPECT_EQ(4, std::sscanf(text.c_str(), "%lld:%lld - %lld:%lld", &values[0], &values[1],
+                                 &values[2], &values[3]));
+        std::ostringstream out;
+        out << difference(at(values[0], values[1]), at(values[2], values[3]));
+        return out.str();
     };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::msecDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
+}
+
+TEST(TimevalTest, MsecDifferenceRoundsTheSubSecondPartUp) {
+    const auto msecs = differenceOf(&Timeval::msecDifference);
+    expectEach(msecs, {"5:5 - 5:5 > 0", "5:6 - 5:5 > 1", "5:1005 - 5:5 > 1", "5:1006 - 5:5 > 2",
+                       "10:0 - 9:999999 > 1", "10:0 - 8:0 > 2000", "10:0 - 8:999000 > 1001",
+                       "2147483647:999999 - -2147483648:0 > 4294967296000"});
+    // A second is borrowed and its rest rounded up: less than a millisecond earlier is 0.
+    expectEach(msecs, {"5:5 - 5:6 > 0", "5:0 - 5:999 > 0", "5:0 - 5:1000 > -1", "5:0 - 5:1001 > -1",
+                       "8:0 - 10:0 > -2000", "-2147483648:0 - 2147483647:999999 > -4294967295999"});
 }
 
 TEST(TimevalTest, UsecDifferenceCountsTheSubSecondPartInMilliseconds) {
-    const struct {
-        Timeval a, b;
-        long long expected;
-    } rows[] = {
-        {at(1, 500000), at(0, 0), 1000500},
-        {at(0, 2500), at(0, 0), 2},
-        {at(0, 999), at(0, 0), 0},
-        {at(0, 1000), at(0, 0), 1},
-        {at(1, 0), at(0, 1), 999},
-        {at(5, 5), at(5, 5), 0},
-        {at(0, 0), at(0, 1), -999001},
-        {at(0, 0), at(1, 500000), -1999500},
-        {at(maxSec, 999999), at(-2147483648LL, 0), 4294967295000999LL},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::usecDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
-}
-
-TEST(TimevalTest, DifferencesOfInstantsBeyond32BitsWrapAround) {
-    EXPECT_EQ(1000, Timeval::msecDifference(at(LLONG_MIN, 0), at(LLONG_MAX, 0)));
-    EXPECT_EQ(-1000000, Timeval::usecDifference(at(LLONG_MAX, 0), at(LLONG_MIN, 0)));
+    expectEach(
+        differenceOf(&Timeval::usecDifference),
+        {"1:500000 - 0:0 > 1000500", "0:2500 - 0:0 > 2", "0:999 - 0:0 > 0", "0:1000 - 0:0 > 1",
+         "1:0 - 0:1 > 999", "5:5 - 5:5 > 0", "0:0 - 0:1 > -999001", "0:0 - 1:500000 > -1999500",
+         "2147483647:999999 - -2147483648:0 > 4294967295000999"});
 }
 
 TEST(TimevalTest, DescribesADifferenceInItsUnit) {
-    const struct {
-        Timeval a, b;
-        const char* expected;
-    } rows[] = {
-        {at(5, 5), at(5, 5), "0 microseconds"},
-        {at(0, 999), at(0, 0), "0 microseconds"},
-        {at(0, 1000), at(0, 0), "1 microsecond"},
-        {at(0, 2500), at(0, 0), "2 microseconds"},
-        {at(0, 999999), at(0, 0), "999 microseconds"},
-        // From a second on the count is above 3000.
-        {at(1, 0), at(0, 0), "1000 milliseconds"},
-        {at(1, 500000), at(0, 0), "1000 milliseconds"},
-        {at(2, 999000), at(0, 0), "2000 milliseconds"},
-        {at(2, 2000), at(1, 1000), "1000 milliseconds"},
-        {at(3, 0), at(0, 0), "3000 milliseconds"},
-        {at(3, 1), at(0, 1), "3000.0 milliseconds"},
-        {at(1, 1), at(0, 0), "1000.0 milliseconds"},
-        {at(1, 500), at(0, 500), "1000.0 milliseconds"},
-        {at(1, 999000), at(0, 1), "1001.0 milliseconds"},
-        {at(3, 1000), at(0, 0), "3.000 seconds"},
-        {at(5, 0), at(0, 0), "5.000 seconds"},
-        {at(9, 0), at(0, 0), "9.000 seconds"},
-        {at(10, 0), at(0, 0), "10.00 seconds"},
-        {at(99, 0), at(0, 0), "99.00 seconds"},
-        {at(100, 0), at(0, 0), "100.0 seconds"},
-        {at(8000, 0), at(0, 0), "8000.0 seconds"},
-        {at(8000, 1000), at(0, 0), "2.222 hours"},
-        {at(35819, 0), at(0, 0), "9.950 hours"},
-        {at(35820, 0), at(0, 0), " 9.95 hours"},
-        {at(36000, 0), at(0, 0), "10.00 hours"},
-        {at(358199, 0), at(0, 0), "99.50 hours"},
-        {at(358200, 0), at(0, 0), " 99.5 hours"},
-        {at(36000000, 0), at(0, 0), "10000.0 hours"},
-        {at(maxSec, 999999), at(-2147483648LL, 0), "1193046.5 hours"},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::describeDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
-}
-
-TEST(TimevalTest, DescribesAnEarlierInstantWithASign) {
-    const struct {
-        Timeval a, b;
-        const char* expected;
-    } rows[] = {
-        {at(5, 0), at(5, 1), "-0 microseconds"},    {at(5, 0), at(5, 1000), "-1 microsecond"},
-        {at(0, 0), at(2, 0), "-2000 milliseconds"}, {at(0, 0), at(5, 0), "-5.000 seconds"},
-        {at(0, 0), at(36000, 0), "-10.00 hours"},   {at(0, 0), at(35820, 0), "- 9.95 hours"},
-        {at(0, 0), at(358200, 0), "- 99.5 hours"},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(row.expected, Timeval::describeDifference(row.a, row.b))
-            << str(row.a) << " - " << str(row.b);
-    }
+    const auto text = differenceOf(&Timeval::describeDifference);
+    expectEach(text, {"5:5 - 5:5 > 0 microseconds", "0:999 - 0:0 > 0 microseconds",
+                      "0:1000 - 0:0 > 1 microsecond", "0:2500 - 0:0 > 2 microseconds",
+                      "0:999999 - 0:0 > 999 microseconds"});
+    // From a second on the count is above 3000.
+    expectEach(text, {"1:0 - 0:0 > 1000 milliseconds", "1:500000 - 0:0 > 1000 milliseconds",
+                      "2:999000 - 0:0 > 2000 milliseconds", "2:2000 - 1:1000 > 1000 milliseconds",
+                      "3:0 - 0:0 > 3000 milliseconds", "3:1 - 0:1 > 3000.0 milliseconds",
+                      "1:1 - 0:0 > 1000.0 milliseconds", "1:500 - 0:500 > 1000.0 milliseconds",
+                      "1:999000 - 0:1 > 1001.0 milliseconds"});
+    expectEach(text, {"3:1000 - 0:0 > 3.000 seconds", "5:0 - 0:0 > 5.000 seconds",
+                      "9:0 - 0:0 > 9.000 seconds", "10:0 - 0:0 > 10.00 seconds",
+                      "99:0 - 0:0 > 99.00 seconds", "100:0 - 0:0 > 100.0 seconds",
+                      "8000:0 - 0:0 > 8000.0 seconds"});
+    expectEach(text, {"8000:1000 - 0:0 > 2.222 hours", "35819:0 - 0:0 > 9.950 hours",
+                      "35820:0 - 0:0 >  9.95 hours", "36000:0 - 0:0 > 10.00 hours",
+                      "358199:0 - 0:0 > 99.50 hours", "358200:0 - 0:0 >  99.5 hours",
+                      "36000000:0 - 0:0 > 10000.0 hours",
+                      "2147483647:999999 - -2147483648:0 > 1193046.5 hours"});
+    // An earlier instant has a sign, even before the blanks that fill the field.
+    expectEach(text, {"5:0 - 5:1 > -0 microseconds", "5:0 - 5:1000 > -1 microsecond",
+                      "0:0 - 2:0 > -2000 milliseconds", "0:0 - 5:0 > -5.000 seconds",
+                      "0:0 - 36000:0 > -10.00 hours", "0:0 - 35820:0 > - 9.95 hours",
+                      "0:0 - 358200:0 > - 99.5 hours"});
 }
 
 TEST(TimevalTest, SinceIsTheDifferenceFromNow) {
@@ -359,91 +253,32 @@ TEST(TimevalTest, SinceIsTheDifferenceFromNow) {
 
 TEST(TimevalTest, LocaltimeBreaksTheSecondsDownInTheZone) {
     const struct {
-        const char* zone;
-        int day, hour, minute;
-    } rows[] = {{"UTC0", 14, 22, 13}, {"XST-05:30", 15, 3, 43}, {"XST+8", 14, 14, 13}};
+        const char *zone, *expected;
+    } rows[] = {{"UTC0", "2023-11-14 22:13:20"},
+                {"XST-05:30", "2023-11-15 03:43:20"},
+                {"XST+8", "2023-11-14 14:13:20"}};
     for (const auto& row : rows) {
-        ASSERT_EQ(0, ::setenv("TZ", row.zone, 1));
-        ::tzset();
+        const TimeZone zone(row.zone);
         struct tm broken = {};
         at(1700000000, 999999).localtime(broken);
-        EXPECT_EQ(123, broken.tm_year) << row.zone;
-        EXPECT_EQ(10, broken.tm_mon) << row.zone;
-        EXPECT_EQ(row.day, broken.tm_mday) << row.zone;
-        EXPECT_EQ(row.hour, broken.tm_hour) << row.zone;
-        EXPECT_EQ(row.minute, broken.tm_min) << row.zone;
-        EXPECT_EQ(20, broken.tm_sec) << row.zone;
+        char text[30];
+        std::strftime(text, sizeof text, "%F %T", &broken);
+        EXPECT_STREQ(row.expected, text);
     }
 }
 
-TEST(TimevalTest, LocaltimeAbortsWhenThereIsNoLocalTime) {
+TEST(TimevalTest, LocaltimeAbortsIfTheYearDoesNotFit) {
     struct tm broken;
     EXPECT_EXIT(at(LLONG_MAX, 0).localtime(broken), testing::KilledBySignal(SIGABRT), "^$");
-    EXPECT_EXIT(
-        {
-            ScriptedCalls zone("localtime_r");
-            zone.fail(EOVERFLOW);
-            at(0, 0).localtime(broken);
-        },
-        testing::KilledBySignal(SIGABRT), "^$");
-}
-
-TEST(TimevalTest, LocaltimeAbortsWhenItIsGivenAnotherStructure) {
-    struct tm broken, other = {};
-    EXPECT_EXIT(
-        {
-            anotherLocalTime = &other;
-            at(0, 0).localtime(broken);
-        },
-        testing::KilledBySignal(SIGABRT), "^$");
-}
-
-TEST(TimevalTest, OperationsHaveTheirTypes) {
-    using Difference = long long (*)(const Timeval&, const Timeval&);
-    using Description = std::string (*)(const Timeval&, const Timeval&);
-    const Difference msecs = &Timeval::msecDifference, usecs = &Timeval::usecDifference;
-    const Description words = &Timeval::describeDifference;
-    void (Timeval::*const addSec)(unsigned int) = &Timeval::addSec;
-    void (Timeval::*const addMsec)(unsigned long long) = &Timeval::addMsec;
-    Timeval a = at(4, 500001);
-    const Timeval b = at(5, 0);
-    (a.*addSec)(1);
-    (a.*addMsec)(1500);
-    EXPECT_EQ("7:1", str(a));
-    EXPECT_EQ(2001, msecs(a, b));
-    EXPECT_EQ(2000000, usecs(a, b));
-    EXPECT_EQ("2000.0 milliseconds", words(a, b));
-    EXPECT_TRUE((std::is_same_v<Timeval, decltype(Timeval::now())>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(a < b)>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(a <= b)>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(a > b)>));
-    EXPECT_TRUE((std::is_same_v<bool, decltype(a >= b)>));
-    EXPECT_TRUE((std::is_same_v<struct timeval, decltype(a._tv)>));
-    EXPECT_TRUE(std::is_trivially_copyable_v<Timeval>);
-}
-
-TEST(CurrentTimevalTest, StartsAtTheCurrentTime) {
-    const Timeval before = Timeval::now();
-    const CurrentTimeval current;
-    EXPECT_LE(before, current);
-    EXPECT_LE(current, Timeval::now());
-    EXPECT_LT(at(1600000000, 0), current);
 }
 
 TEST(CurrentTimevalTest, TakesBothFieldsOfATimeval) {
     CurrentTimeval current;
     EXPECT_EQ(&current, &(current = at(5, 7)));
     EXPECT_EQ("5:7", str(current));
-    const CurrentTimeval copy(current);
-    EXPECT_EQ("5:7", str(copy));
     const Timeval& itself = current;
     current = itself;
     EXPECT_EQ("5:7", str(current));
-}
-
-TEST(CurrentTimevalTest, AddsNoData) {
-    EXPECT_EQ(sizeof(struct timeval), sizeof(CurrentTimeval));
-    EXPECT_TRUE((std::is_convertible_v<CurrentTimeval*, Timeval*>));
 }
 
 }  // namespace
