@@ -3,20 +3,18 @@
 
 // Checked wrappers of the POSIX locks, conditions and thread-specific keys.
 //
-// One error policy covers every call but the NOLOG_ pair: a pthread function that fails is logged
-// as a warning on the logger "Thread" and then thrown as a PthreadException with the same text.
-// The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a checked
-// failure would log through the very logger that it is locking.
-// Deliberate: the destructors are checked too, and so may throw. A class that holds one of these by
-// value and whose destructor must not throw says noexcept, and ends the program instead.
-// A Mutex of static storage duration is constant-initialized: it can be used before main, whatever
-// the order in which units are initialized.
-// Safe from any thread, once the object is constructed and until its destruction begins.
+// One error policy covers every call except the NOLOG_ pair: a pthread function that fails is
+// logged as a warning on the logger "Thread" and then thrown as a PthreadException with the same
+// text. The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a
+// checked failure would log through the logger that is being locked. Deliberate: the destructors
+// are checked too. They are noexcept, so a failure is logged and then ends the process through
+// std::terminate. A Mutex is initialized at run time, also one of static storage duration: a static
+// object of another unit must not use it before its constructor has run. Safe from any thread, once
+// the object is constructed and until its destruction begins.
 
 #include <pthread.h>
 
 #include <stdexcept>
-#include <type_traits>
 
 // Base of the wrappers; holds their error check.
 class PthreadObject {
@@ -56,12 +54,8 @@ public:
 // A lock that its holder can neither take twice nor have checked who unlocks it.
 class Mutex : private PthreadObject {
 public:
-    constexpr Mutex() {
-        if (!std::is_constant_evaluated()) {
-            initialize();
-        }
-    }
-    ~Mutex() noexcept(false);
+    Mutex();
+    ~Mutex();
     Mutex(const Mutex&) = delete;
     Mutex& operator=(const Mutex&) = delete;
 
@@ -86,9 +80,7 @@ public:
 private:
     friend class ConditionBaseClass;
 
-    void initialize();
-
-    pthread_mutex_t _pthread_mutex = PTHREAD_MUTEX_INITIALIZER;
+    pthread_mutex_t _pthread_mutex;
 };
 
 // A lock that its holder may take again; it is free after as many unlock() as lock().
@@ -112,7 +104,6 @@ public:
 
 private:
     void claim();
-    void claimOrUnlock();
 
     Mutex _mutex;         // what is actually held
     Mutex _owner_mutex;   // guards the fields below
@@ -125,7 +116,7 @@ private:
 class ConditionBaseClass : private PthreadObject {
 public:
     ConditionBaseClass();
-    ~ConditionBaseClass() noexcept(false);
+    ~ConditionBaseClass();
     ConditionBaseClass(const ConditionBaseClass&) = delete;
     ConditionBaseClass& operator=(const ConditionBaseClass&) = delete;
 
@@ -146,7 +137,7 @@ public:
     void verify_mem() const {}
 
 private:
-    pthread_cond_t _pthread_cond = PTHREAD_COND_INITIALIZER;
+    pthread_cond_t _pthread_cond;
 };
 
 // A condition that wakes every waiter.
@@ -161,7 +152,7 @@ class TSP_Implementor : private PthreadObject {
 public:
     // `cleanup_fn`: null for none.
     explicit TSP_Implementor(void (*cleanup_fn)(void*));
-    ~TSP_Implementor() noexcept(false);
+    ~TSP_Implementor();
     TSP_Implementor(const TSP_Implementor&) = delete;
     TSP_Implementor& operator=(const TSP_Implementor&) = delete;
 
@@ -204,7 +195,7 @@ public:
     // Requires: the caller holds `mutex`, which outlives this object.
     explicit ScopedMutexUnlocker(Mutex* mutex) : _mutex(mutex) { _mutex->unlock(); }
     explicit ScopedMutexUnlocker(Mutex& mutex) : ScopedMutexUnlocker(&mutex) {}
-    ~ScopedMutexUnlocker() noexcept(false) { _mutex->lock(); }
+    ~ScopedMutexUnlocker() { _mutex->lock(); }
     ScopedMutexUnlocker(const ScopedMutexUnlocker&) = delete;
     ScopedMutexUnlocker& operator=(const ScopedMutexUnlocker&) = delete;
 

@@ -20,12 +20,14 @@ public:
 
     // Registers the calling thread as `thrptr`.
     // Requires: the calling thread is not registered (asserted).
-    // Errors: logged; the thread then runs unregistered, as "Main Thread".
+    // Errors: a key that cannot be created is logged, and the thread runs unregistered, as "Main
+    // Thread". PthreadException for any other failure; thrown by a worker that is starting, it
+    // terminates the program.
     static void add(Thread* thrptr);
 
     // Unregisters the calling thread. The argument, which the thread library passes, is not used.
     // Requires: some thread is registered (asserted).
-    // Errors: PthreadException; out of a thread that ends, it terminates the program.
+    // Errors: PthreadException; thrown while a thread ends, it terminates the program.
     static void remove(void*);
 
     // Returns: the calling thread's object, null when it is not registered.
@@ -33,13 +35,7 @@ public:
     static Thread* current();
 
 private:
-    static void enter();
-    static void store(Thread* thrptr);
-    static void leave();
-    static ThreadSpecificPointer<Thread>* takeBack();
-
-    // Refers to a lock that is ready before any constructor runs, and that outlives every worker.
-    static Mutex& _mutex;
+    static Mutex _mutex;
     static unsigned int _nthreads;  // registered threads
     static ThreadSpecificPointer<Thread>* _ptrs;
 };

@@ -47,7 +47,7 @@ public:
     explicit Thread(const char* thrname);
 
     // Requires: joined (asserted), unless mainThreadDying() was called.
-    virtual ~Thread() noexcept(false);
+    virtual ~Thread();
     Thread(const Thread&) = delete;
     Thread& operator=(const Thread&) = delete;
 
