@@ -19,9 +19,8 @@
 //
 // Options are parsed by popt: init() copies the master table into the record and points each entry
 // at the field that takes its value, so a record that was initialized must stay where it is until
-// it has been parsed. popt's contexts and value strings are never freed; they stay reachable from a
-// list of their own. A copy has no part in the options: its context and its value pointers are
-// null, and parsing or printing help on it before init() is an assertion.
+// it has been parsed. popt's context and value strings are never freed. Options are not copied: a
+// copy's context and value pointers are null.
 //
 // Configured before other threads start; safe to read from any thread afterwards.
 class LoaderInfo {
@@ -55,6 +54,7 @@ public:
 
     // Sets the defaults and makes a popt context over the arguments, which are kept, not copied.
     // The directories, the host and the start-up mode stay as they are.
+    // Requires: `argc` is at least 1; popt skips argv[0] without a check.
     void init(int argc, const char* const* argv);
 
     // Takes QUELTA_HOME and QUELTA_DB; a variable that is not set changes nothing. Values are
@@ -65,11 +65,10 @@ public:
     // Parses the command line. A bad option is named on standard error, and parsing goes on.
     // Deliberate: the flags are taken from the options alone; the debug flag, true after init(), is
     // false afterwards unless the hidden option "noseg" was given. "-p 0" keeps the port.
-    // Requires: init().
+    // Before init() there is nothing to parse, and no option counts as given.
     void populateFromCommandLine();
 
-    // Prints popt's help for the option table on standard error.
-    // Requires: init().
+    // Prints popt's help for the option table on standard error; nothing before init().
     void printHelp();
 
     // Returns: 0, or the code of the first check that failed (see getErrorMessage).
