@@ -12,8 +12,8 @@
 
 namespace {
 
-// The numbers of validate(). The checks of directories come in threes: for the installation this
-// number, for the database one less, for the configuration two less.
+// The results of validate(). Each check of directories has three: the value here for the
+// installation, one less for the database, two less for the configuration.
 enum Problem : int {
     EMPTY = -1,
     RELATIVE = -4,
@@ -23,7 +23,7 @@ enum Problem : int {
     INSTALL_EMPTY = -16
 };
 
-// The text of a problem stands at the place of its number.
+// Indexed by the negated code.
 const char* const messages[] = {
     "",
     "The environment variable QUELTA_HOME must not be empty.",
@@ -47,7 +47,7 @@ const char* const messages[] = {
 constexpr int messageCount = static_cast<int>(std::size(messages));
 
 void set_path_from_envvar(Pathname& path, const char* name) {
-    // No other thread exists while a process starts up.
+    // There is no other thread during start-up.
     const char* const value = std::getenv(name);  // NOLINT(concurrency-mt-unsafe)
     if (value == nullptr) {
         return;

@@ -97,7 +97,7 @@ bool ConditionBaseClass::wait(Mutex& mutex, unsigned int timeoutSecs) {
     if (rval == ETIMEDOUT) {
         return false;
     }
-    // Deliberate: reported under the name of a relative wait, which is what this is to a caller.
+    // Deliberate: reported under the name of a relative wait, because the timeout is relative.
     checkPtRes("pthread_cond_timedwait_relative_np", rval);
     return rval == 0;
 }
@@ -110,8 +110,8 @@ void ConditionBaseClass::internal_wake_all() {
     checkPtRes("pthread_cond_broadcast", ::pthread_cond_broadcast(&_pthread_cond));
 }
 
-// The key starts as one that no thread has, so that a failed creation (ignored after
-// mainThreadDying()) leaves an object that reads null and touches nobody else's key.
+// The key starts out invalid. If its creation fails after mainThreadDying(), which is ignored, the
+// object then reads null and uses no other object's key.
 TSP_Implementor::TSP_Implementor(void (*cleanup_fn)(void*))
     : _key(static_cast<pthread_key_t>(-1)), _cleanup_fn(cleanup_fn) {
     checkPtRes("pthread_key_create", ::pthread_key_create(&_key, _cleanup_fn));

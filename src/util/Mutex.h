@@ -19,14 +19,14 @@
 // Base of the wrappers; holds their error check.
 class PthreadObject {
 public:
-    // Does nothing when `rval`, the result of the pthread function `funcname`, is 0, or after
-    // Thread::mainThreadDying().
+    // Checks `rval`, the result of the pthread function `funcname`. Does nothing if it is 0, or
+    // after Thread::mainThreadDying(). Defined in Thread.cpp, which has the logger.
     // Errors: logs and throws PthreadException with the text
     // "THREADNAME: about to throw a PthreadException: FUNCNAME: ERROR-TEXT-OF-RVAL".
     static void checkPtRes(const char* funcname, int rval);
 };
 
-// The identity of a thread; the default one is no thread's.
+// The identity of a thread; a default-constructed token matches no thread.
 class PthreadToken {
 public:
     PthreadToken() = default;
@@ -41,7 +41,7 @@ public:
     bool operator!=(const PthreadToken& other) const { return !(*this == other); }
 
 private:
-    friend class Thread;  // joins by it
+    friend class Thread;  // reads the token to join the thread
 
     pthread_t _token{};
 };
@@ -51,7 +51,7 @@ public:
     explicit PthreadException(const char* msg) : std::runtime_error(msg) {}
 };
 
-// A lock that its holder can neither take twice nor have checked who unlocks it.
+// A non-recursive lock; unlock() does not check the caller.
 class Mutex : private PthreadObject {
 public:
     Mutex();
@@ -62,16 +62,16 @@ public:
     void lock();
     void unlock();
 
-    // Returns: true when acquired, false when some thread holds it. After mainThreadDying() every
-    // other failure gives false too.
+    // Returns: true if acquired, false if a thread holds it. After mainThreadDying() every other
+    // failure also returns false.
     [[nodiscard]] bool tryLock();
 
-    // The pair for the logging code: no check, no message, no exception.
-    // Returns: NOLOG_lock: true when locked; NOLOG_unlock: the raw result, 0 when unlocked.
+    // For the logging code: no check, no message, no exception.
+    // Returns: NOLOG_lock: true if locked; NOLOG_unlock: the raw result, 0 if unlocked.
     bool NOLOG_lock() noexcept { return ::pthread_mutex_lock(&_pthread_mutex) == 0; }
     int NOLOG_unlock() noexcept { return ::pthread_mutex_unlock(&_pthread_mutex); }
 
-    // Debugging aids, without effect.
+    // Debugging aids; they do nothing.
     void assertIsLocked() const {}
     void verify_mem() const {}
     void debrec_set() const {}
@@ -83,7 +83,7 @@ private:
     pthread_mutex_t _pthread_mutex;
 };
 
-// A lock that its holder may take again; it is free after as many unlock() as lock().
+// A lock that its owner can take again. It is released by as many calls of unlock() as of lock().
 // Invariant: `_owner_valid` exactly while `_owner_count` is above 0. `_owner_mutex` is never held
 // while waiting for `_mutex`.
 class RecursiveMutex {
@@ -92,27 +92,28 @@ public:
 
     void lock();
 
-    // Returns: true when acquired or already the calling thread's, false when another holds it.
+    // Returns: true if the calling thread holds it now, false if another thread does.
     [[nodiscard]] bool tryLock();
 
-    // Requires: the calling thread holds the mutex. Only that it is held is asserted.
-    // Deliberate: the caller is not compared with the owner; that is left to whoever locks.
+    // Requires: the calling thread holds the mutex. Only that some thread holds it is asserted.
+    // Deliberate: the caller is not compared with the owner; callers must pair their calls.
     void unlock();
 
-    // Debugging aid, without effect.
+    // Debugging aid; it does nothing.
     void assertIsLocked() const {}
 
 private:
+    // Makes the calling thread the owner, holding the mutex once.
     void claim();
 
-    Mutex _mutex;         // what is actually held
+    Mutex _mutex;         // the lock that is actually held
     Mutex _owner_mutex;   // guards the fields below
     PthreadToken _owner;  // meaningful only when _owner_valid
     bool _owner_valid = false;
     unsigned int _owner_count = 0;  // how many times the owner holds it
 };
 
-// A condition variable; derived classes say who is woken.
+// A condition variable. Derived classes choose which waiters a wake reaches.
 class ConditionBaseClass : private PthreadObject {
 public:
     ConditionBaseClass();
@@ -120,20 +121,20 @@ public:
     ConditionBaseClass(const ConditionBaseClass&) = delete;
     ConditionBaseClass& operator=(const ConditionBaseClass&) = delete;
 
-    // Unlocks `mutex`, waits to be woken and locks it again. May return without a wake, so callers
-    // test what they wait for in a loop.
+    // Unlocks `mutex`, waits to be woken and locks it again. May return without a wake, so call it
+    // in a loop that tests what is waited for.
     // Requires: the caller holds `mutex`.
     void wait(Mutex& mutex);
 
-    // The same for at most `timeoutSecs` seconds from the call, whatever is done to the clock.
-    // Returns: true when woken, false when the time was up. After mainThreadDying() a failure
-    // gives false too.
+    // The same for at most `timeoutSecs` seconds from the call, unaffected by changes of the clock.
+    // Returns: true when woken, false on timeout. After mainThreadDying() a failure also returns
+    // false.
     bool wait(Mutex& mutex, unsigned int timeoutSecs);
 
     void internal_wake_one();
     void internal_wake_all();
 
-    // Debugging aid, without effect.
+    // Debugging aid; it does nothing.
     void verify_mem() const {}
 
 private:
@@ -146,25 +147,25 @@ public:
     void wake_all() { internal_wake_all(); }
 };
 
-// A pointer with a value of its own in every thread, null at first. A thread that ends with a
-// value other than null has it passed to the cleanup function.
+// A thread-specific pointer, initially null. When a thread ends, its value, if not null, is passed
+// to the cleanup function.
 class TSP_Implementor : private PthreadObject {
 public:
-    // `cleanup_fn`: null for none.
+    // `cleanup_fn`: may be null for no cleanup.
     explicit TSP_Implementor(void (*cleanup_fn)(void*));
     ~TSP_Implementor();
     TSP_Implementor(const TSP_Implementor&) = delete;
     TSP_Implementor& operator=(const TSP_Implementor&) = delete;
 
-    // Returns: the calling thread's value, null allowed.
+    // Returns: the calling thread's value, which may be null.
     void* get() const { return ::pthread_getspecific(_key); }
 
-    // Replaces the calling thread's value; a former one that differs goes to the cleanup function
-    // first, unless it is null.
+    // Replaces the calling thread's value. The previous value, if different and not null, is
+    // cleaned up first.
     void set(void* value);
 
-    // Returns: the calling thread's value, which becomes null without cleanup.
-    // Owns: the caller has the value from now on.
+    // Stores null without cleanup.
+    // Returns: the previous value, which the caller owns.
     void* release();
 
     // Stores without cleanup.
@@ -175,7 +176,7 @@ private:
     void (*_cleanup_fn)(void*);
 };
 
-// TSP_Implementor with the type of its values.
+// The typed form of TSP_Implementor.
 template <typename T>
 class ThreadSpecificPointer {
 public:
@@ -189,7 +190,7 @@ private:
     TSP_Implementor _impl;
 };
 
-// Unlocks a mutex for as long as the object lives.
+// Unlocks a mutex in the constructor and locks it again in the destructor.
 class ScopedMutexUnlocker {
 public:
     // Requires: the caller holds `mutex`, which outlives this object.

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const char* MAIN_THREAD_NAME = "Main Thread";
 
-// Written once each, atomic because a worker may fail while the main thread ends.
+// Written once each. Atomic, because a call may fail on a worker while the main thread ends.
 constinit std::atomic<bool> main_thread_created{false};
 constinit std::atomic<bool> checkThreadErrors{true};
 
@@ -95,8 +95,9 @@ Thread::~Thread() {
     }
 }
 
-// Sees to it that the thread, which nobody will join, does not use this object any more on our
-// behalf: when it is still in its start handshake, it leaves that and ends.
+// Makes sure that the thread, which will never be joined, stops using this object. A thread that
+// still waits for go() is told to end, and this waits until it has left its wait: destroying a
+// condition that has a waiter would block for ever.
 void Thread::abandon() {
     ready_to_run_lock.lock();
     if (_start == STARTING) {
@@ -122,13 +123,13 @@ void Thread::join() {
     QUELTA_ASSERT(!_did_join);
     _did_join = true;
     if (_token == PthreadToken()) {
-        return;  // there is no thread: its creation failed, and that was to be ignored
+        return;  // pthread_create failed and errors are ignored: nothing to join
     }
     checkPtRes("pthread_join", ::pthread_join(_token._token, nullptr));
 }
 
 Thread* Thread::current() {
-    return ActiveThreads::current();
+    return registeredName != nullptr ? ActiveThreads::_ptrs->get() : nullptr;
 }
 
 const char* Thread::currentName() {
@@ -182,8 +183,8 @@ void ActiveThreads::add(Thread* thrptr) {
     registeredName = thrptr->name();
 }
 
-// Deliberate: the pointer is deleted after the lock is released. It is set to null before that, so
-// that a worker that starts meanwhile creates a new one.
+// Deliberate: the pointer is deleted after the lock is released. It is set to null under the lock,
+// because a worker that starts in between creates a new one.
 void ActiveThreads::remove(void*) {
     QUELTA_ASSERT(_ptrs != NULL);  // NOLINT(modernize-use-nullptr)
     registeredName = nullptr;
@@ -195,8 +196,4 @@ void ActiveThreads::remove(void*) {
     }
     _mutex.unlock();
     delete unused;
-}
-
-Thread* ActiveThreads::current() {
-    return registeredName != nullptr ? _ptrs->get() : nullptr;
 }
