@@ -95,9 +95,10 @@ Thread::~Thread() {
     }
 }
 
-// Makes sure that the thread, which will never be joined, stops using this object. A thread that
-// still waits for go() is told to end, and this waits until it has left its wait: destroying a
-// condition that has a waiter would block for ever.
+// Makes sure that the thread, which will never be joined, stops using this object. If the thread is
+// still waiting for go(), it is woken to end, and this function returns once it has stopped
+// waiting. Without that, the destructor of the condition would block for ever, because it has a
+// waiter.
 void Thread::abandon() {
     ready_to_run_lock.lock();
     if (_start == STARTING) {

@@ -43,7 +43,7 @@ TEST(LoaderInfoTest, FailedStartUpCanBeRepeated) {
         LoaderInfo::common_main_setup(arguments.argc(), arguments.argv(), nullptr);
     };
 
-    const std::string reached = dir.file("reached");  // exists if the n-th allocation was made
+    const std::string reached = dir.file("reached");  // created if the n-th allocation failed
     std::size_t n = 1;
     for (bool failed = true; failed; ++n) {
         fs::remove(reached);

@@ -1,4 +1,4 @@
-// libxml2's allocations fail, one after the other.
+// The allocations of libxml2 fail, one at a time.
 
 #include <gtest/gtest.h>
 #include <libxml/xmlerror.h>

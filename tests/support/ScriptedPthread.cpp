@@ -16,8 +16,8 @@ int scripted(const char* function, Real real) {
     return scriptedCall(function, real);
 }
 
-// A sanitizer's runtime that is linked in statically has its calls wrapped too. It makes some of
-// them before instrumented code can run.
+// Calls from a statically linked sanitizer runtime are wrapped too. It makes some of them before
+// instrumented code can run.
 #if defined(__clang__)
 #define NOT_INSTRUMENTED __attribute__((disable_sanitizer_instrumentation))
 #else

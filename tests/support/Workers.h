@@ -10,7 +10,7 @@
 
 #include "util/Thread.h"
 
-// The process's one object for its main thread, made on first use.
+// The one object of the main thread, constructed on first use.
 inline Thread& mainThread() {
     static Thread thread;
     return thread;

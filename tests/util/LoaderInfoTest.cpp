@@ -26,7 +26,7 @@ const Arguments none;
 
 // --- Defaults --------------------------------------------------------------------------------
 
-TEST(LoaderInfoTest, StartsEmptyWithNothingLeftUndefined) {
+TEST(LoaderInfoTest, StartsEmpty) {
     const LoaderInfo info;
     EXPECT_EQ("", info.getQueltaHome());
     EXPECT_EQ("", info.getQueltaDb());
@@ -94,7 +94,7 @@ TEST(LoaderInfoTest, InitSetsTheDefaultsEachTimeAndLeavesTheRest) {
     EXPECT_EQ("m", info.getStartupMode());
 }
 
-TEST(LoaderInfoTest, InstanceIsMadeOnceEmpty) {
+TEST(LoaderInfoTest, InstanceIsCreatedOnceAndEmpty) {
     EXPECT_EXIT(
         {
             const bool fresh = LoaderInfo::_instance == nullptr;
@@ -107,7 +107,7 @@ TEST(LoaderInfoTest, InstanceIsMadeOnceEmpty) {
 
 // --- Environment -----------------------------------------------------------------------------
 
-TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifference) {
+TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesBackTheOnesThatChanged) {
     const struct {
         const char* value;
         const char* cleaned;
@@ -119,7 +119,7 @@ TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifferen
     for (const auto& row : rows) {
         for (const bool home : {true, false}) {
             const char* const name = home ? "QUELTA_HOME" : "QUELTA_DB";
-            // The very text that the environment points at, to tell it from an equal one.
+            // putenv keeps the address, so an unchanged variable can be recognised.
             std::string setting = std::string(name) + '=' + row.value;
             ASSERT_EQ(0, ::putenv(setting.data()));
             const char* const before = std::getenv(name);
@@ -130,7 +130,7 @@ TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifferen
             EXPECT_EQ(row.cleaned, home ? info.getQueltaHome() : info.getQueltaDb()) << row.value;
             EXPECT_STREQ(row.cleaned, std::getenv(name)) << row.value;
             if (std::string(row.value) == row.cleaned) {
-                EXPECT_EQ(before, std::getenv(name)) << "left alone: " << row.value;
+                EXPECT_EQ(before, std::getenv(name)) << "not changed: " << row.value;
             }
             ::unsetenv(name);
         }
@@ -310,7 +310,7 @@ TEST(LoaderInfoTest, HasAMessageForEveryCode) {
 
 // --- Copies and comparison -------------------------------------------------------------------
 
-// Sets every field that is not about options to something unlike a default.
+// Sets every field except those of the options to a value that is not its default.
 void fill(LoaderInfo& info) {
     info._queltaHome = "/home";
     info._queltaDb = "/db";
@@ -329,7 +329,7 @@ void fill(LoaderInfo& info) {
     info._startupMode = "mode";
 }
 
-// What a copy of a filled record has in common with it.
+// Expects what a copy takes from a filled record.
 void expectCopied(const LoaderInfo& copy) {
     EXPECT_EQ("/home", copy.getQueltaHome());
     EXPECT_EQ("component", copy.getComponentName());
@@ -449,7 +449,7 @@ TEST(LoaderInfoTest, KeepsADeepCopyOfTheComponentNode) {
 
 // --- The common start-up ---------------------------------------------------------------------
 
-// Runs in a child process: standard output goes where the test can see it.
+// Runs in a child process. Standard output goes to standard error, which a death test captures.
 [[noreturn]] void startUp(const Arguments& arguments, bool (*check)() = nullptr) {
     ::dup2(STDERR_FILENO, STDOUT_FILENO);
     LoaderInfo::common_main_setup(arguments.argc(), arguments.argv(), nullptr);

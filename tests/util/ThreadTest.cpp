@@ -136,7 +136,7 @@ TEST(ThreadTest, StartRoutineReturnsNull) {
     Worker worker("Sorter", [&] { names += Thread::currentName(); });
     worker.go();
     worker.join();
-    // The worker is past its start, so the routine runs main() at once on any thread.
+    // The worker has passed its wait for go(), so the routine runs main() on any thread.
     EXPECT_TRUE(onForeignThread([&] { return Thread::callMain(&worker) == nullptr; }));
     EXPECT_EQ("SorterSorter", names);
 }

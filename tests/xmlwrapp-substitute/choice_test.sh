@@ -4,7 +4,7 @@
 # which header LoaderInfo is compiled with. The installed one is a copy of the substitute's header.
 set -eu
 cxx=$1
-# A compiler cache that makes paths relative would hide which header was taken.
+# A compiler cache that makes paths relative would hide which header is used.
 unset CMAKE_CXX_COMPILER_LAUNCHER CCACHE_BASEDIR
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(mktemp -d)
@@ -23,7 +23,7 @@ Version: 0.5.0
 Cflags: -I$prefix/include
 END
 
-# expect TITLE STATUS WORDS [cmake arguments]: configures, and looks for the words in what it says.
+# expect TITLE STATUS WORDS [cmake arguments]: configures, and checks the status and the output.
 expect() {
     title=$1
     wanted=$2
