@@ -58,7 +58,6 @@ const CheckedCall THROWING[] = {
      [] {
          Mutex mutex;
          mutex.lock();
-         mutex.NOLOG_unlock();
      }},
     {"pthread_mutex_unlock", EPERM,
      [] {
