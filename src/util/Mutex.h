@@ -6,11 +6,15 @@
 // One error policy covers every call except the NOLOG_ pair: a pthread function that fails is
 // logged as a warning on the logger "Thread" and then thrown as a PthreadException with the same
 // text. The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a
-// checked failure would log through the logger that is being locked. Deliberate: the destructors
-// are checked too. They are noexcept, so a failure is logged and then ends the process through
-// std::terminate. A Mutex is initialized at run time, also one of static storage duration: a static
-// object of another unit must not use it before its constructor has run. Safe from any thread, once
-// the object is constructed and until its destruction begins.
+// checked failure would log through the logger that is being locked.
+//
+// Deliberate: the destructors are checked too. They are noexcept, so a failure is logged and then
+// ends the process through std::terminate.
+//
+// A Mutex is initialized at run time, even one of static storage duration. So a static object of
+// another unit must not use it before its constructor has run.
+//
+// Safe from any thread, once the object is constructed and until its destruction begins.
 
 #include <pthread.h>
 

@@ -102,6 +102,7 @@ const CheckedCall THROWING[] = {
          pointer->set(pointer);
      }},
     {"pthread_attr_init", ENOMEM, [] { const Thread main; }},
+    {"pthread_create", EAGAIN, [] { const Worker worker("Sorter", [] {}); }},
     {"pthread_create", EAGAIN,
      [] {
          Worker worker("Sorter", [] { ADD_FAILURE() << "created"; });
@@ -316,19 +317,28 @@ TEST(ActiveThreadsTest, PassesOnAValueThatCannotBeStored) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST(ActiveThreadsTest, TerminatesWhenALockOrTheKeyFailsOnAWorker) {
-    for (const char* const function : {"pthread_mutex_lock", "pthread_key_delete"}) {
+TEST(ActiveThreadsTest, TerminatesWhenAWorkerCannotRegisterOrUnregister) {
+    const struct {
+        const char* function;
+        void (*act)(Worker& worker);
+    } rows[] = {
+        {"pthread_mutex_lock", [](Worker&) { waitUntil([] { return false; }); }},
+        {"pthread_key_delete",
+         [](Worker& worker) {
+             worker.go();
+             worker.join();
+         }},
+    };
+    for (const auto& row : rows) {
         EXPECT_EXIT(
             {
-                ScriptedCalls calls(function);
+                ScriptedCalls calls(row.function);
                 calls.give(EINVAL);
                 Worker worker("Sorter", [] {});
-                waitUntil([&] { return calls.calls() > 0 || function[8] == 'k'; });
-                worker.go();
-                worker.join();
+                row.act(worker);
             },
             testing::KilledBySignal(SIGABRT),
-            testing::StartsWith(pthreadFailure(function, EINVAL) + "\n"));
+            testing::StartsWith(pthreadFailure(row.function, EINVAL) + "\n"));
     }
 }
 
