@@ -5,7 +5,7 @@
 find_package(Xmlwrapp CONFIG QUIET)
 if(Xmlwrapp_FOUND)
   set(Xmlwrapp_SOURCE "${Xmlwrapp_CONFIG}")
-  # Package files name their target as they please.
+  # Package files differ in the name of their target.
   foreach(_xmlwrapp_target Xmlwrapp::xmlwrapp xmlwrapp::xmlwrapp Xmlwrapp xmlwrapp)
     if(TARGET ${_xmlwrapp_target} AND NOT TARGET Xmlwrapp::Xmlwrapp)
       add_library(Xmlwrapp::Xmlwrapp INTERFACE IMPORTED)

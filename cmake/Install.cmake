@@ -10,8 +10,8 @@ install(DIRECTORY src/util src/services DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}
   FILES_MATCHING PATTERN "*.h"
   # What the logging sources share among themselves.
   PATTERN "LogAtoms.h" EXCLUDE PATTERN "LogConfig.h" EXCLUDE PATTERN "LogInternal.h" EXCLUDE)
-if(QUELTA_XMLWRAPP_CHOICE STREQUAL "bundled")
-  install(DIRECTORY src/xmlwrapp-bundled/xmlwrapp
+if(QUELTA_XMLWRAPP_CHOICE STREQUAL "substitute")
+  install(DIRECTORY src/xmlwrapp-substitute/xmlwrapp
     DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta" FILES_MATCHING PATTERN "*.h")
 endif()
 
@@ -30,7 +30,7 @@ install(FILES
 # pkg-config quelta; the paths are relative to the file, so that the tree can be moved.
 file(RELATIVE_PATH quelta_pc_to_prefix
   "${CMAKE_INSTALL_PREFIX}/${quelta_pc_dir}" "${CMAKE_INSTALL_PREFIX}")
-if(QUELTA_XMLWRAPP_CHOICE STREQUAL "bundled")
+if(QUELTA_XMLWRAPP_CHOICE STREQUAL "substitute")
   set(quelta_pc_requires "popt, libxml-2.0")
   set(quelta_pc_xmlwrapp "-lquelta_xmlwrapp")
 else()

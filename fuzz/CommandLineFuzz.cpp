@@ -1,5 +1,5 @@
-// Command lines, one word per line, against a model of how popt reads the option table. The words
-// that ask for help are left out, since popt prints it and ends the process.
+// Command lines, one word per line, against a model of how popt reads the option table. Words that
+// request help are left out, because popt then prints it and ends the process.
 
 #include <climits>
 #include <cstdio>
@@ -13,7 +13,7 @@
 #include "FuzzTarget.h"
 #include "util/LoaderInfo.h"
 
-// popt drops the first of two values for one option; the block is its own and out of reach.
+// popt leaks the first value if an option is given twice.
 extern "C" const char* __lsan_default_suppressions();
 extern "C" const char* __lsan_default_suppressions() {
     return "leak:poptGetNextOpt\n";
@@ -24,11 +24,11 @@ namespace {
 using fuzz::checkEqual;
 using Words = std::vector<std::string>;
 
-bool asksForHelp(const std::string& word) {
+bool requestsHelp(const std::string& word) {
     return word.starts_with("-?") || word.starts_with("--help") || word.starts_with("--usage");
 }
 
-// What the words make of the record.
+// The record that results from the words.
 class Model {
 public:
     explicit Model(const Words& words) {
@@ -69,11 +69,11 @@ private:
         const std::size_t equals = word.find('=');
         const std::string name = word.substr(2, equals == std::string::npos ? equals : equals - 2);
         if (name == "mode") {
-            std::optional<std::string> behind;
+            std::optional<std::string> joined;
             if (equals != std::string::npos) {
-                behind = word.substr(equals + 1);
+                joined = word.substr(equals + 1);
             }
-            take(words, behind, _mode);
+            take(words, joined, _mode);
             return;
         }
         bool* const flag = name == "noseg"      ? &_noseg
@@ -83,44 +83,44 @@ private:
         if (flag == nullptr) {
             _messages += "Bad Option " + word + '\n';
         } else if (equals == std::string::npos) {
-            *flag = true;  // with a value it would be an error that nobody is told
+            *flag = true;  // with a value it is an error, which is ignored
         }
     }
 
     void readShort(const Words& words, const std::string& word) {
-        std::optional<std::string> behind;
+        std::optional<std::string> joined;
         if (word.size() > 2) {
-            behind = word.substr(word[2] == '=' ? 3 : 2);
+            joined = word.substr(word[2] == '=' ? 3 : 2);
         }
         switch (word[1]) {
             case 'c':
-                return take(words, behind, _c);
+                return take(words, joined, _c);
             case 'h':
-                return take(words, behind, _h);
+                return take(words, joined, _h);
             case 'i':
-                return take(words, behind, _i);
+                return take(words, joined, _i);
             case 'n':
-                return take(words, behind, _n);
+                return take(words, joined, _n);
             case 'p':
-                return takePort(words, behind);
+                return takePort(words, joined);
             default:
                 _messages += "Bad Option " + word + '\n';
         }
     }
 
-    // A value stands behind its option in the same word, or is the next word, whatever that is.
-    void take(const Words& words, const std::optional<std::string>& behind,
+    // A value follows its option in the same word, or is the next word, whatever that is.
+    void take(const Words& words, const std::optional<std::string>& joined,
               std::optional<std::string>& value) {
-        if (behind) {
-            value = behind;
+        if (joined) {
+            value = joined;
         } else if (_next < words.size()) {
             value = words[_next++];
         }
     }
 
-    void takePort(const Words& words, const std::optional<std::string>& behind) {
+    void takePort(const Words& words, const std::optional<std::string>& joined) {
         std::optional<std::string> text;
-        take(words, behind, text);
+        take(words, joined, text);
         if (!text) {
             return;
         }
@@ -160,7 +160,7 @@ std::string parsed(LoaderInfo& info, const Words& words) {
     return messages;
 }
 
-// Releases what the record leaves to the end of the process.
+// Frees what a record never frees.
 void release(LoaderInfo& info) {
     ::poptFreeContext(info._poptContext);
     for (char* const value : {info._poptCommonConfigPath, info._poptHost, info._poptInstallName,
@@ -176,8 +176,8 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     Words words;
     while (!input.atEnd()) {
         const std::string word = input.lineOfText();
-        // popt takes this value for "the next argument that is no option".
-        if (!asksForHelp(word) && word.find("!#:+") == std::string::npos) {
+        // popt reads this value as "the next argument that is not an option".
+        if (!requestsHelp(word) && word.find("!#:+") == std::string::npos) {
             words.push_back(word);
         }
     }

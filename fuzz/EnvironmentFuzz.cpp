@@ -1,5 +1,5 @@
 // Values of the environment. Lines: QUELTA_HOME, QUELTA_DB (a leading '!' leaves the variable
-// unset), the value of "1b"; the rest is a text with variables to substitute.
+// unset), the value of "1b". The rest is a text with variables to substitute.
 
 #include <unistd.h>
 
@@ -20,7 +20,7 @@ namespace {
 
 using fuzz::checkEqual;
 
-// What stands in the environment from here; setenv would keep every value that ever was.
+// The variables set here. setenv would leak every former value.
 std::map<std::string, std::string>& entries() {
     static std::map<std::string, std::string> map;
     return map;
@@ -33,7 +33,7 @@ void setVariable(const std::string& name, const std::string& value) {
     ::putenv(entry.data());
 }
 
-// The value of a variable, looked for one entry at a time; null when it is not set.
+// The value of a variable, searched one entry at a time; null if it is not set.
 const char* lookedUp(const std::string& name) {
     for (char** entry = environ; *entry != nullptr; ++entry) {
         if (std::strncmp(*entry, (name + '=').c_str(), name.size() + 1) == 0) {
@@ -65,7 +65,7 @@ std::string substituteSlowly(const std::string& text) {
 
 unsigned writtenBack = 0;
 
-// Sets or unsets a variable. Returns: the path that it means.
+// Sets or unsets a variable. Returns: the path that results.
 std::string given(const char* name, const std::string& value) {
     if (value.substr(0, 1) == "!") {
         ::unsetenv(name);

@@ -2,8 +2,8 @@
 #define QUELTA_UTIL_EVENTLOOP_H_
 
 // InThreadActor: a unit of work that another thread's event loop runs on this thread's behalf.
-// The fields are the loop's: its list of pending actors, and the wake of a thread that waits for
-// one to have run.
+// The event loop is not part of this library. The fields belong to it: the list of pending actors,
+// and what wakes a thread that waits until an actor has run.
 // Not thread-safe; one thread at a time per object.
 
 #include "util/Mutex.h"
@@ -15,7 +15,7 @@ public:
     InThreadActor(const InThreadActor&) = delete;
     InThreadActor& operator=(const InThreadActor&) = delete;
 
-    // Does the work, on the thread of the loop.
+    // Does the work, on the event loop's thread.
     virtual void callback() = 0;
 
 private:

@@ -2,18 +2,18 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
-#include <vector>
+#include <iterator>
 
-#include "util/Assert.h"
 #include "util/Logger.h"
 
 namespace {
 
-// The numbers of validate(). The checks of directories come in threes: for the installation this
-// number, for the database one less, for the configuration two less.
+// The results of validate(). Each check of directories has three: the value here for the
+// installation, one less for the database, two less for the configuration.
 enum Problem : int {
     EMPTY = -1,
     RELATIVE = -4,
@@ -23,7 +23,7 @@ enum Problem : int {
     INSTALL_EMPTY = -16
 };
 
-// The text of a problem stands at the place of its number.
+// Indexed by the negated code.
 const char* const messages[] = {
     "",
     "The environment variable QUELTA_HOME must not be empty.",
@@ -44,28 +44,10 @@ const char* const messages[] = {
     "The install name must not be empty.",
     "The component name was too large for spread.",
 };
-constexpr int messageCount = sizeof(messages) / sizeof(messages[0]);
-
-// popt's contexts, and the strings that it hands out and leaves to its caller, live as long as the
-// process. The list of them is never destroyed, so that a leak checker finds them at exit.
-std::vector<const void*>& keptMemory() {
-    static auto& kept = *new std::vector<const void*>;
-    return kept;
-}
-
-// Makes room to keep so much more. Called before popt allocates: a list that cannot grow afterwards
-// would lose what it was to keep.
-void makeRoomToKeep(std::size_t count) {
-    keptMemory().reserve(keptMemory().size() + count);
-}
-
-// Requires: there is room. Null needs no keeping and does no harm.
-void keepReachable(const void* memory) {
-    keptMemory().push_back(memory);
-}
+constexpr int messageCount = static_cast<int>(std::size(messages));
 
 void set_path_from_envvar(Pathname& path, const char* name) {
-    // No other thread exists while a process starts up.
+    // There is no other thread during start-up.
     const char* const value = std::getenv(name);  // NOLINT(concurrency-mt-unsafe)
     if (value == nullptr) {
         return;
@@ -183,14 +165,8 @@ void LoaderInfo::init(int argc, const char* const* argv) {
     _useDebugLog = false;
 
     attachOptionValues();
-    // popt starts behind the program's name, and would read past a list that lacks even that.
-    static const char* nameOnly[] = {"", nullptr};
-    const bool named = argc > 0;
-    makeRoomToKeep(1);
     _poptContext =
-        ::poptGetContext("queltad", named ? argc : 1,
-                         named ? const_cast<const char**>(argv) : nameOnly, _poptOptionsTable, 0);
-    keepReachable(_poptContext);
+        ::poptGetContext("queltad", argc, const_cast<const char**>(argv), _poptOptionsTable, 0);
 }
 
 void LoaderInfo::attachOptionValues() {
@@ -207,13 +183,9 @@ void LoaderInfo::attachOptionValues() {
     void* const values[] = {&_poptIsDebug, &_poptIsNodaemon,  &_poptCommonConfigPath,
                             &_poptHost,    &_poptInstallName, &_poptComponentName,
                             &_poptRpcPort, &_poptUseDebugLog, &_poptStartupMode};
-    struct poptOption* entry = _poptOptionsTable;
-    for (const struct poptOption& master : _poptOptionsMaster) {
-        *entry++ = master;
-    }
-    entry = _poptOptionsTable;
-    for (void* value : values) {
-        entry++->arg = value;
+    std::copy(std::begin(_poptOptionsMaster), std::end(_poptOptionsMaster), _poptOptionsTable);
+    for (std::size_t i = 0; i < std::size(values); ++i) {
+        _poptOptionsTable[i].arg = values[i];
     }
 }
 
@@ -223,9 +195,6 @@ void LoaderInfo::populateFromEnvironment() {
 }
 
 void LoaderInfo::populateFromCommandLine() {
-    QUELTA_ASSERT(_poptContext != nullptr);
-
-    makeRoomToKeep(_poptOptionsCount);
     int result = 0;
     while ((result = ::poptGetNextOpt(_poptContext)) != -1) {
         if (result == POPT_ERROR_BADOPT) {
@@ -233,12 +202,6 @@ void LoaderInfo::populateFromCommandLine() {
             std::fprintf(stderr, "Bad Option %s\n",
                          ::poptBadOption(_poptContext, POPT_BADOPTION_NOALIAS));
         }
-    }
-
-    // All of them before any is copied, which may fail.
-    for (const char* const given : {_poptCommonConfigPath, _poptHost, _poptInstallName,
-                                    _poptComponentName, _poptStartupMode}) {
-        keepReachable(given);
     }
 
     _isDebug = _poptIsDebug != 0;
@@ -256,8 +219,10 @@ void LoaderInfo::populateFromCommandLine() {
 }
 
 void LoaderInfo::printHelp() {
-    QUELTA_ASSERT(_poptContext != nullptr);
-    ::poptPrintHelp(_poptContext, stderr, 0);
+    // popt's own help would read the null context.
+    if (_poptContext != nullptr) {
+        ::poptPrintHelp(_poptContext, stderr, 0);
+    }
 }
 
 int LoaderInfo::validate() const {

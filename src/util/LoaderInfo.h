@@ -10,73 +10,72 @@
 
 #include "util/Pathname.h"
 
-// How this process was started: the directories of the installation and the database, names, port,
-// flags, and the values given on the command line. Every program begins with common_main_setup();
-// one that takes options then calls, on getInstance(),
-//     populateFromCommandLine()   once; isError() tells whether an option was unknown
-//     validate()                  getErrorMessage() has the text of a negative result
-// (init and populateFromEnvironment, which come before, are part of the common start-up.)
+// How this process was started: the installation and database directories, names, port, flags, and
+// the values given on the command line. Every program begins with common_main_setup(), which
+// includes init() and populateFromEnvironment(). A program that takes options then calls, on
+// getInstance(),
+//     populateFromCommandLine()   once; isError() returns whether an option was unknown
+//     validate()                  getErrorMessage() returns the text of a negative result
 //
-// Options are parsed by popt: init() copies the master table into the record and points each entry
-// at the field that takes its value, so a record that was initialized must stay where it is until
-// it has been parsed. popt's contexts and value strings are never freed; they stay reachable from a
-// list of their own. A copy has no part in the options: its context and its value pointers are
-// null, and parsing or printing help on it before init() is an assertion.
+// Options are parsed by popt. init() copies the master table into the record and points each entry
+// at the field that takes its value, so the record must keep its address between init() and
+// populateFromCommandLine(). popt's context and value strings are never freed. Options are not
+// copied: a copy's context and value pointers are null.
 //
 // Configured before other threads start; safe to read from any thread afterwards.
 class LoaderInfo {
 public:
-    // An empty record: every text empty, every number 0, every flag false, no options.
+    // An empty record: empty texts, numbers 0, flags false, no options.
     LoaderInfo() = default;
 
     // An empty record that is then assigned to.
     // Deliberate: the copy of a record with a database directory compares unequal to it.
     LoaderInfo(const LoaderInfo& other);
 
-    // Deliberate: the database directory, the start-up mode and everything about the options stay
-    // as they were in the target.
+    // Deliberate: the database directory, the start-up mode and the option-parsing state of the
+    // target stay as they were.
     LoaderInfo& operator=(const LoaderInfo& other);
 
-    // Compares all that tells how the process was started, the XML node and the options' own state
-    // apart.
+    // Compares everything except the XML node and the option-parsing state.
     bool operator==(const LoaderInfo& other) const;
 
-    // The record of this process, made on the first call and never deleted.
+    // The record of this process, constructed on the first call and never deleted.
     static LoaderInfo* getInstance();
 
-    // What every program does first: fills the record from defaults and the environment, announces
-    // the logging configuration and starts logging from it. Parses no options; `envp` is not used.
-    // Errors: ends the process with exit(-1) and a line on standard output when no installation
-    // directory is known.
+    // The start-up of every program: fills the record from defaults and the environment, prints the
+    // path of the logging configuration and initializes logging from it. Parses no options; `envp`
+    // is not used.
+    // Errors: prints a line on standard output and calls exit(-1) if there is no installation
+    // directory.
     static void common_main_setup(int argc, const char* const* argv, const char* const* envp);
 
     // Returns: the text of a negative result of validate(), "" for any other number; never null.
     static const char* getErrorMessage(int code);
 
-    // Sets the defaults and makes a popt context over the arguments, which are kept, not copied.
-    // The directories, the host and the start-up mode stay as they are.
+    // Sets the defaults and creates a popt context for the arguments, which must outlive it. The
+    // directories, the host and the start-up mode stay as they are.
+    // Requires: `argc` is at least 1; popt skips argv[0] without a check.
     void init(int argc, const char* const* argv);
 
-    // Takes QUELTA_HOME and QUELTA_DB; a variable that is not set changes nothing. Values are
-    // cleaned of doubled and trailing separators, and written back to the environment where that
-    // made a difference, so that child processes see the cleaned form.
+    // Takes the directories from QUELTA_HOME and QUELTA_DB. A variable that is not set changes
+    // nothing. Doubled and trailing separators are removed; if that changes the value, it is
+    // written back to the environment, so that child processes see the cleaned form.
     void populateFromEnvironment();
 
-    // Parses the command line. A bad option is named on standard error, and parsing goes on.
-    // Deliberate: the flags are taken from the options alone; the debug flag, true after init(), is
-    // false afterwards unless the hidden option "noseg" was given. "-p 0" keeps the port.
-    // Requires: init().
+    // Parses the command line. A bad option is reported on standard error and parsing continues.
+    // Before init() there is nothing to parse, and no option counts as given.
+    // Deliberate: the flags depend on the options alone. The debug flag is true after init(), and
+    // false after parsing unless the hidden option "noseg" was given. "-p 0" keeps the port.
     void populateFromCommandLine();
 
-    // Prints popt's help for the option table on standard error.
-    // Requires: init().
+    // Prints popt's help for the option table on standard error; nothing before init().
     void printHelp();
 
     // Returns: 0, or the code of the first check that failed (see getErrorMessage).
     // Deliberate: no check of writability (-13, -14) or of the length of a name (-17).
     int validate() const;
 
-    // Whether an unknown option was met while parsing.
+    // Returns: whether parsing met an unknown option.
     bool isError() const { return _optionsError; }
 
     Pathname getQueltaHome() const { return _queltaHome; }
@@ -86,7 +85,7 @@ public:
     std::string getHost() const { return _host; }
     std::string getStartupMode() const { return _startupMode; }
 
-    // The configuration directory below the installation, and this install's directory in it.
+    // The configuration directory of the installation, and its subdirectory for this install name.
     Pathname getCommonConfigPath() const { return _queltaHome / _commonConfigPath; }
     Pathname getInstallConfigPath() const { return getCommonConfigPath() / _installName; }
 
@@ -99,7 +98,7 @@ public:
     bool getDaemon() const { return _isDaemon; }
 
     const xml::node& getCommonComponentNode() const { return _commonComponentNode; }
-    // Keeps a deep copy of the node.
+    // Stores a deep copy of the node.
     void setCommonComponentNode(xml::node& n) { _commonComponentNode = n; }
 
 private:

@@ -110,7 +110,7 @@ LogAppenderMap& appenders() {
 
 LogAppender::LogAppender() : _fd(-1) {}
 
-LogAppender::~LogAppender() noexcept {
+LogAppender::~LogAppender() {
     if (!_filename.empty()) {
         closeFd();
     }

@@ -52,7 +52,7 @@ public:
     // Makes a closed appender without file name, size limit, backups and layout.
     LogAppender();
     // Closes the file; standard error stays open.
-    ~LogAppender() noexcept;
+    ~LogAppender();
     LogAppender(const LogAppender&) = delete;
     LogAppender& operator=(const LogAppender&) = delete;
 

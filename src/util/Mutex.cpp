@@ -6,12 +6,12 @@
 
 #include "util/Assert.h"
 
-Mutex::~Mutex() noexcept(false) {
-    checkPtRes("pthread_mutex_destroy", ::pthread_mutex_destroy(&_pthread_mutex));
+Mutex::Mutex() {
+    checkPtRes("pthread_mutex_init", ::pthread_mutex_init(&_pthread_mutex, nullptr));
 }
 
-void Mutex::initialize() {
-    checkPtRes("pthread_mutex_init", ::pthread_mutex_init(&_pthread_mutex, nullptr));
+Mutex::~Mutex() {
+    checkPtRes("pthread_mutex_destroy", ::pthread_mutex_destroy(&_pthread_mutex));
 }
 
 void Mutex::lock() {
@@ -39,19 +39,9 @@ void RecursiveMutex::claim() {
     _owner_mutex.unlock();
 }
 
-// A failed lock() must not leave `_mutex` held with nobody to release it.
-void RecursiveMutex::claimOrUnlock() {
-    try {
-        claim();
-    } catch (...) {
-        _mutex.NOLOG_unlock();
-        throw;
-    }
-}
-
 bool RecursiveMutex::tryLock() {
     if (_mutex.tryLock()) {
-        claimOrUnlock();
+        claim();
         return true;
     }
     _owner_mutex.lock();
@@ -67,7 +57,7 @@ bool RecursiveMutex::tryLock() {
 void RecursiveMutex::lock() {
     if (!tryLock()) {
         _mutex.lock();
-        claimOrUnlock();
+        claim();
     }
 }
 
@@ -81,23 +71,14 @@ void RecursiveMutex::unlock() {
     }
     _owner_valid = false;
     _owner_mutex.unlock();
-    try {
-        _mutex.unlock();
-    } catch (...) {
-        // Still held: let the holder try again.
-        _owner_mutex.lock();
-        _owner_valid = true;
-        _owner_count = 1;
-        _owner_mutex.unlock();
-        throw;
-    }
+    _mutex.unlock();
 }
 
 ConditionBaseClass::ConditionBaseClass() {
     checkPtRes("pthread_cond_init", ::pthread_cond_init(&_pthread_cond, nullptr));
 }
 
-ConditionBaseClass::~ConditionBaseClass() noexcept(false) {
+ConditionBaseClass::~ConditionBaseClass() {
     checkPtRes("pthread_cond_destroy", ::pthread_cond_destroy(&_pthread_cond));
 }
 
@@ -116,7 +97,7 @@ bool ConditionBaseClass::wait(Mutex& mutex, unsigned int timeoutSecs) {
     if (rval == ETIMEDOUT) {
         return false;
     }
-    // Deliberate: reported under the name of a relative wait, which is what this is to a caller.
+    // Deliberate: reported under the name of a relative wait, because the timeout is relative.
     checkPtRes("pthread_cond_timedwait_relative_np", rval);
     return rval == 0;
 }
@@ -129,14 +110,14 @@ void ConditionBaseClass::internal_wake_all() {
     checkPtRes("pthread_cond_broadcast", ::pthread_cond_broadcast(&_pthread_cond));
 }
 
-// The key starts as one that no thread has, so that a failed creation (ignored after
-// mainThreadDying()) leaves an object that reads null and touches nobody else's key.
+// The key starts out invalid. If its creation fails after mainThreadDying(), which is ignored, the
+// object then reads null and uses no other object's key.
 TSP_Implementor::TSP_Implementor(void (*cleanup_fn)(void*))
     : _key(static_cast<pthread_key_t>(-1)), _cleanup_fn(cleanup_fn) {
     checkPtRes("pthread_key_create", ::pthread_key_create(&_key, _cleanup_fn));
 }
 
-TSP_Implementor::~TSP_Implementor() noexcept(false) {
+TSP_Implementor::~TSP_Implementor() {
     checkPtRes("pthread_key_delete", ::pthread_key_delete(_key));
 }
 

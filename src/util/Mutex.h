@@ -3,32 +3,34 @@
 
 // Checked wrappers of the POSIX locks, conditions and thread-specific keys.
 //
-// One error policy covers every call but the NOLOG_ pair: a pthread function that fails is logged
-// as a warning on the logger "Thread" and then thrown as a PthreadException with the same text.
-// The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a checked
-// failure would log through the very logger that it is locking.
-// Deliberate: the destructors are checked too, and so may throw. A class that holds one of these by
-// value and whose destructor must not throw says noexcept, and ends the program instead.
-// A Mutex of static storage duration is constant-initialized: it can be used before main, whatever
-// the order in which units are initialized.
+// One error policy covers every call except the NOLOG_ pair: a pthread function that fails is
+// logged as a warning on the logger "Thread" and then thrown as a PthreadException with the same
+// text. The logging code itself locks with NOLOG_lock, which neither logs nor throws, because a
+// checked failure would log through the logger that is being locked.
+//
+// Deliberate: the destructors are checked too. They are noexcept, so a failure is logged and then
+// ends the process through std::terminate.
+//
+// A Mutex is initialized at run time, even one of static storage duration. So a static object of
+// another unit must not use it before its constructor has run.
+//
 // Safe from any thread, once the object is constructed and until its destruction begins.
 
 #include <pthread.h>
 
 #include <stdexcept>
-#include <type_traits>
 
 // Base of the wrappers; holds their error check.
 class PthreadObject {
 public:
-    // Does nothing when `rval`, the result of the pthread function `funcname`, is 0, or after
-    // Thread::mainThreadDying().
+    // Checks `rval`, the result of the pthread function `funcname`. Does nothing if it is 0, or
+    // after Thread::mainThreadDying(). Defined in Thread.cpp, which has the logger.
     // Errors: logs and throws PthreadException with the text
     // "THREADNAME: about to throw a PthreadException: FUNCNAME: ERROR-TEXT-OF-RVAL".
     static void checkPtRes(const char* funcname, int rval);
 };
 
-// The identity of a thread; the default one is no thread's.
+// The identity of a thread; a default-constructed token matches no thread.
 class PthreadToken {
 public:
     PthreadToken() = default;
@@ -43,7 +45,7 @@ public:
     bool operator!=(const PthreadToken& other) const { return !(*this == other); }
 
 private:
-    friend class Thread;  // joins by it
+    friend class Thread;  // reads the token to join the thread
 
     pthread_t _token{};
 };
@@ -53,31 +55,27 @@ public:
     explicit PthreadException(const char* msg) : std::runtime_error(msg) {}
 };
 
-// A lock that its holder can neither take twice nor have checked who unlocks it.
+// A non-recursive lock; unlock() does not check the caller.
 class Mutex : private PthreadObject {
 public:
-    constexpr Mutex() {
-        if (!std::is_constant_evaluated()) {
-            initialize();
-        }
-    }
-    ~Mutex() noexcept(false);
+    Mutex();
+    ~Mutex();
     Mutex(const Mutex&) = delete;
     Mutex& operator=(const Mutex&) = delete;
 
     void lock();
     void unlock();
 
-    // Returns: true when acquired, false when some thread holds it. After mainThreadDying() every
-    // other failure gives false too.
+    // Returns: true if acquired, false if a thread holds it. After mainThreadDying() every other
+    // failure also returns false.
     [[nodiscard]] bool tryLock();
 
-    // The pair for the logging code: no check, no message, no exception.
-    // Returns: NOLOG_lock: true when locked; NOLOG_unlock: the raw result, 0 when unlocked.
+    // For the logging code: no check, no message, no exception.
+    // Returns: NOLOG_lock: true if locked; NOLOG_unlock: the raw result, 0 if unlocked.
     bool NOLOG_lock() noexcept { return ::pthread_mutex_lock(&_pthread_mutex) == 0; }
     int NOLOG_unlock() noexcept { return ::pthread_mutex_unlock(&_pthread_mutex); }
 
-    // Debugging aids, without effect.
+    // Debugging aids; they do nothing.
     void assertIsLocked() const {}
     void verify_mem() const {}
     void debrec_set() const {}
@@ -86,12 +84,10 @@ public:
 private:
     friend class ConditionBaseClass;
 
-    void initialize();
-
-    pthread_mutex_t _pthread_mutex = PTHREAD_MUTEX_INITIALIZER;
+    pthread_mutex_t _pthread_mutex;
 };
 
-// A lock that its holder may take again; it is free after as many unlock() as lock().
+// A lock that its owner can take again. It is released by as many calls of unlock() as of lock().
 // Invariant: `_owner_valid` exactly while `_owner_count` is above 0. `_owner_mutex` is never held
 // while waiting for `_mutex`.
 class RecursiveMutex {
@@ -100,53 +96,53 @@ public:
 
     void lock();
 
-    // Returns: true when acquired or already the calling thread's, false when another holds it.
+    // Returns: true if the calling thread holds it now, false if another thread does.
     [[nodiscard]] bool tryLock();
 
-    // Requires: the calling thread holds the mutex. Only that it is held is asserted.
-    // Deliberate: the caller is not compared with the owner; that is left to whoever locks.
+    // Requires: the calling thread holds the mutex. Only that some thread holds it is asserted.
+    // Deliberate: the caller is not compared with the owner; callers must pair their calls.
     void unlock();
 
-    // Debugging aid, without effect.
+    // Debugging aid; it does nothing.
     void assertIsLocked() const {}
 
 private:
+    // Makes the calling thread the owner, holding the mutex once.
     void claim();
-    void claimOrUnlock();
 
-    Mutex _mutex;         // what is actually held
+    Mutex _mutex;         // the lock that is actually held
     Mutex _owner_mutex;   // guards the fields below
     PthreadToken _owner;  // meaningful only when _owner_valid
     bool _owner_valid = false;
     unsigned int _owner_count = 0;  // how many times the owner holds it
 };
 
-// A condition variable; derived classes say who is woken.
+// A condition variable. Derived classes choose which waiters a wake reaches.
 class ConditionBaseClass : private PthreadObject {
 public:
     ConditionBaseClass();
-    ~ConditionBaseClass() noexcept(false);
+    ~ConditionBaseClass();
     ConditionBaseClass(const ConditionBaseClass&) = delete;
     ConditionBaseClass& operator=(const ConditionBaseClass&) = delete;
 
-    // Unlocks `mutex`, waits to be woken and locks it again. May return without a wake, so callers
-    // test what they wait for in a loop.
+    // Unlocks `mutex`, waits to be woken and locks it again. May return without a wake, so call it
+    // in a loop that tests what is waited for.
     // Requires: the caller holds `mutex`.
     void wait(Mutex& mutex);
 
-    // The same for at most `timeoutSecs` seconds from the call, whatever is done to the clock.
-    // Returns: true when woken, false when the time was up. After mainThreadDying() a failure
-    // gives false too.
+    // The same for at most `timeoutSecs` seconds from the call, unaffected by changes of the clock.
+    // Returns: true when woken, false on timeout. After mainThreadDying() a failure also returns
+    // false.
     bool wait(Mutex& mutex, unsigned int timeoutSecs);
 
     void internal_wake_one();
     void internal_wake_all();
 
-    // Debugging aid, without effect.
+    // Debugging aid; it does nothing.
     void verify_mem() const {}
 
 private:
-    pthread_cond_t _pthread_cond = PTHREAD_COND_INITIALIZER;
+    pthread_cond_t _pthread_cond;
 };
 
 // A condition that wakes every waiter.
@@ -155,25 +151,25 @@ public:
     void wake_all() { internal_wake_all(); }
 };
 
-// A pointer with a value of its own in every thread, null at first. A thread that ends with a
-// value other than null has it passed to the cleanup function.
+// A thread-specific pointer, initially null. When a thread ends, its value, if not null, is passed
+// to the cleanup function.
 class TSP_Implementor : private PthreadObject {
 public:
-    // `cleanup_fn`: null for none.
+    // `cleanup_fn`: may be null for no cleanup.
     explicit TSP_Implementor(void (*cleanup_fn)(void*));
-    ~TSP_Implementor() noexcept(false);
+    ~TSP_Implementor();
     TSP_Implementor(const TSP_Implementor&) = delete;
     TSP_Implementor& operator=(const TSP_Implementor&) = delete;
 
-    // Returns: the calling thread's value, null allowed.
+    // Returns: the calling thread's value, which may be null.
     void* get() const { return ::pthread_getspecific(_key); }
 
-    // Replaces the calling thread's value; a former one that differs goes to the cleanup function
-    // first, unless it is null.
+    // Replaces the calling thread's value. The previous value, if different and not null, is
+    // cleaned up first.
     void set(void* value);
 
-    // Returns: the calling thread's value, which becomes null without cleanup.
-    // Owns: the caller has the value from now on.
+    // Stores null without cleanup.
+    // Returns: the previous value, which the caller owns.
     void* release();
 
     // Stores without cleanup.
@@ -184,7 +180,7 @@ private:
     void (*_cleanup_fn)(void*);
 };
 
-// TSP_Implementor with the type of its values.
+// The typed form of TSP_Implementor.
 template <typename T>
 class ThreadSpecificPointer {
 public:
@@ -198,13 +194,13 @@ private:
     TSP_Implementor _impl;
 };
 
-// Unlocks a mutex for as long as the object lives.
+// Unlocks a mutex in the constructor and locks it again in the destructor.
 class ScopedMutexUnlocker {
 public:
     // Requires: the caller holds `mutex`, which outlives this object.
     explicit ScopedMutexUnlocker(Mutex* mutex) : _mutex(mutex) { _mutex->unlock(); }
     explicit ScopedMutexUnlocker(Mutex& mutex) : ScopedMutexUnlocker(&mutex) {}
-    ~ScopedMutexUnlocker() noexcept(false) { _mutex->lock(); }
+    ~ScopedMutexUnlocker() { _mutex->lock(); }
     ScopedMutexUnlocker(const ScopedMutexUnlocker&) = delete;
     ScopedMutexUnlocker& operator=(const ScopedMutexUnlocker&) = delete;
 

@@ -7,83 +7,38 @@
 #include <utility>
 
 #include "util/Assert.h"
-#include "util/LogInternal.h"
-#include "util/LogLevel.h"
 #include "util/Logger.h"
 
 namespace {
 
 constexpr const char* MAIN_THREAD_NAME = "Main Thread";
 
-// Written once each, atomic because a worker may fail while the main thread ends.
+// Written once each. Atomic, because a call may fail on a worker while the main thread ends.
 constinit std::atomic<bool> main_thread_created{false};
 constinit std::atomic<bool> checkThreadErrors{true};
 
-// What every thread is created with; set up by the main thread's object.
+// The attributes of every worker; set up by the main thread's object.
 pthread_attr_t s_threadAttr;
-constinit bool threadAttrUsable = false;  // otherwise threads get the default attributes
 
-// Workers whose threads may still run and take the locks below.
-constinit std::atomic<unsigned int> unjoinedWorkers{0};
+// The calling thread's name while it is registered, otherwise null. Threads that are not registered
+// must not read the registry, which another thread may be deleting. The name is stored apart from
+// the Thread object, because a thread left running at shutdown can outlive that object.
+constinit thread_local const char* registeredName = nullptr;
 
-// A lock that is ready before any constructor runs; ProcessState says when it ends.
-union StaticMutex {
-    constexpr StaticMutex() : mutex() {}
-    ~StaticMutex() {}
-    StaticMutex(const StaticMutex&) = delete;
-    StaticMutex& operator=(const StaticMutex&) = delete;
-
-    Mutex mutex;
-};
-
-constinit StaticMutex registryMutex;
-constinit StaticMutex startMutex;
-
-// Guards `_ready_to_run` of every thread.
-constinit Mutex& ready_to_run_lock = startMutex.mutex;
-
-constinit std::atomic<bool> threadLoggerGone{false};
-
-// The unit's logger, and the end of its locks at exit. Every worker makes it before itself, so that
-// the locks outlive static workers of any unit. Workers that were never joined keep them.
-struct ProcessState {
-    ProcessState() : logger("Thread") {}
-    ~ProcessState() {
-        if (unjoinedWorkers == 0) {
-            startMutex.mutex.~Mutex();
-            registryMutex.mutex.~Mutex();
-        }
-        threadLoggerGone = true;
-    }
-    ProcessState(const ProcessState&) = delete;
-    ProcessState& operator=(const ProcessState&) = delete;
-
-    Logger logger;
-};
-
-ProcessState& processState() {
-    static ProcessState state;
-    return state;
-}
-
-[[maybe_unused]] const ProcessState& madeAtStartUp = processState();
-
-void report(LogLevel level, const std::string& text) {
-    if (threadLoggerGone) {
-        fallback_to_stderr(level, text);
-    } else if (level == WARN) {
-        processState().logger.warn(text);
-    } else {
-        processState().logger.error(text);
-    }
-}
-
-// Whether the calling thread is registered: keeps every other thread away from the registry. The
-// name is kept beside it, because a thread left running at the end may outlive its object.
-constinit thread_local bool registeredHere = false;
-constinit thread_local const char* nameHere = nullptr;
+// The logger and the two locks are constructed in this order and destroyed in the reverse order.
+// The logger comes first, so that the destructors of the locks can still report a failure.
+Logger logger("Thread");
 
 }  // namespace
+
+Mutex ActiveThreads::_mutex;
+
+namespace {
+Mutex ready_to_run_lock;  // guards `_ready_to_run` and `_start` of every thread
+}  // namespace
+
+unsigned int ActiveThreads::_nthreads = 0;
+ThreadSpecificPointer<Thread>* ActiveThreads::_ptrs = nullptr;
 
 void PthreadObject::checkPtRes(const char* funcname, int rval) {
     if (rval == 0 || !checkThreadErrors) {
@@ -92,7 +47,7 @@ void PthreadObject::checkPtRes(const char* funcname, int rval) {
     std::string text;
     Logger::format(text, rval, "%s: about to throw a PthreadException: %s: %m",
                    Thread::currentName(), funcname);
-    report(WARN, text);
+    logger.warn(text);
     throw PthreadException(text.c_str());
 }
 
@@ -110,48 +65,40 @@ Thread::Thread()
     if (main_thread_created.exchange(true)) {
         throw PthreadException("Main Thread created twice!");
     }
-    int rval = ::pthread_attr_init(&s_threadAttr);
-    checkPtRes("pthread_attr_init", rval);
-    if (rval != 0) {
-        return;
-    }
-    threadAttrUsable = true;
-    rval = ::pthread_attr_setstacksize(&s_threadAttr, s_stackSize);
+    checkPtRes("pthread_attr_init", ::pthread_attr_init(&s_threadAttr));
+    const int rval = ::pthread_attr_setstacksize(&s_threadAttr, s_stackSize);
     if (rval != 0) {
         std::string text;
         Logger::format(text, rval,
                        "cannot override thread stack size: pthread_attr_setstacksize(): %m");
-        report(WARN, text);
+        logger.warn(text);
     }
 }
 
 Thread::Thread(const char* thrname)
     : _name(thrname), _did_join(false), _ready_to_run(false), _jhelp(this) {
-    processState();
     if (!main_thread_created) {
         throw PthreadException("Thread created before main thread!");
     }
     pthread_t token{};
-    const pthread_attr_t* const attributes = threadAttrUsable ? &s_threadAttr : nullptr;
-    ++unjoinedWorkers;
-    const int rval = ::pthread_create(&token, attributes, &Thread::callMain, this);
+    const int rval = ::pthread_create(&token, &s_threadAttr, &Thread::callMain, this);
+    checkPtRes("pthread_create", rval);
     if (rval == 0) {
         _token = PthreadToken(token);
-    } else {
-        --unjoinedWorkers;
-        checkPtRes("pthread_create", rval);
     }
 }
 
-Thread::~Thread() noexcept(false) {
+Thread::~Thread() {
     QUELTA_ASSERT(_did_join || !checkThreadErrors);
     if (!_did_join && _token != PthreadToken()) {
         abandon();
     }
 }
 
-// Sees to it that the thread, which nobody will join, does not use this object any more on our
-// behalf: when it is still in its start handshake, it leaves that and ends.
+// Makes sure that the thread, which will never be joined, stops using this object. If the thread is
+// still waiting for go(), it is woken to end, and this function returns once it has stopped
+// waiting. Without that, the destructor of the condition would block for ever, because it has a
+// waiter.
 void Thread::abandon() {
     ready_to_run_lock.lock();
     if (_start == STARTING) {
@@ -169,13 +116,7 @@ void Thread::go() {
     ready_to_run_lock.lock();
     QUELTA_ASSERT(!_ready_to_run);
     _ready_to_run = true;
-    try {
-        _ready_to_run_cond.wake_all();
-    } catch (...) {
-        _ready_to_run = false;
-        ready_to_run_lock.NOLOG_unlock();
-        throw;
-    }
+    _ready_to_run_cond.wake_all();
     ready_to_run_lock.unlock();
 }
 
@@ -183,21 +124,17 @@ void Thread::join() {
     QUELTA_ASSERT(!_did_join);
     _did_join = true;
     if (_token == PthreadToken()) {
-        return;  // there is no thread: its creation failed, and that was to be ignored
+        return;  // pthread_create failed and errors are ignored: nothing to join
     }
-    const int rval = ::pthread_join(_token._token, nullptr);
-    checkPtRes("pthread_join", rval);
-    if (rval == 0) {
-        --unjoinedWorkers;
-    }
+    checkPtRes("pthread_join", ::pthread_join(_token._token, nullptr));
 }
 
 Thread* Thread::current() {
-    return ActiveThreads::current();
+    return registeredName != nullptr ? ActiveThreads::_ptrs->get() : nullptr;
 }
 
 const char* Thread::currentName() {
-    return registeredHere ? nameHere : MAIN_THREAD_NAME;
+    return registeredName != nullptr ? registeredName : MAIN_THREAD_NAME;
 }
 
 void Thread::mainThreadDying() {
@@ -225,73 +162,39 @@ void* Thread::callMain(void* arg) {
     return nullptr;
 }
 
-constinit Mutex& ActiveThreads::_mutex = registryMutex.mutex;
-constinit unsigned int ActiveThreads::_nthreads = 0;
-constinit ThreadSpecificPointer<Thread>* ActiveThreads::_ptrs = nullptr;
-
-// Requires: `_mutex` is held.
-// Returns: what the caller deletes once it has released `_mutex`; null while others are registered.
-ThreadSpecificPointer<Thread>* ActiveThreads::takeBack() {
-    --_nthreads;
-    return _nthreads == 0 ? std::exchange(_ptrs, nullptr) : nullptr;
-}
-
-// Counts the calling thread in, and makes the registry for the first one; all or nothing.
-void ActiveThreads::enter() {
+void ActiveThreads::add(Thread* thrptr) {
     _mutex.lock();
     ++_nthreads;
-    try {
-        if (_nthreads == 1) {
-            QUELTA_ASSERT(_ptrs == NULL);  // NOLINT(modernize-use-nullptr)
+    if (_nthreads == 1) {
+        QUELTA_ASSERT(_ptrs == NULL);  // NOLINT(modernize-use-nullptr)
+        try {
             _ptrs = new ThreadSpecificPointer<Thread>(&ActiveThreads::remove);
+        } catch (const std::exception&) {
+            --_nthreads;
+            logger.error("Could not construct ThreadSpecificPointer<Thread> in ActiveThreads::add");
         }
-        _mutex.unlock();
-    } catch (...) {
-        const ThreadSpecificPointer<Thread>* const unused = takeBack();
-        _mutex.NOLOG_unlock();
-        delete unused;
-        throw;
     }
-}
-
-void ActiveThreads::leave() {
-    registeredHere = false;
-    _mutex.lock();
-    const ThreadSpecificPointer<Thread>* const unused = takeBack();
+    const bool registered = _ptrs != nullptr;
     _mutex.unlock();
-    delete unused;
+    if (!registered) {
+        return;
+    }
+    QUELTA_ASSERT(_ptrs->get() == NULL);  // NOLINT(modernize-use-nullptr)
+    _ptrs->set(thrptr);
+    registeredName = thrptr->name();
 }
 
-// Fills the calling thread's slot, or takes back what enter() did.
-void ActiveThreads::store(Thread* thrptr) {
-    try {
-        _ptrs->set(thrptr);
-    } catch (...) {
-        leave();
-        throw;
-    }
-    nameHere = thrptr->name();
-    registeredHere = _ptrs->get() == thrptr;
-    if (!registeredHere) {
-        leave();  // set() failed, and that was to be ignored
-    }
-}
-
-void ActiveThreads::add(Thread* thrptr) {
-    try {
-        enter();
-        QUELTA_ASSERT(_ptrs->get() == NULL);  // NOLINT(modernize-use-nullptr)
-        store(thrptr);
-    } catch (const std::exception&) {
-        report(ERROR, "Could not construct ThreadSpecificPointer<Thread> in ActiveThreads::add");
-    }
-}
-
+// Deliberate: the pointer is deleted after the lock is released. It is set to null under the lock,
+// because a worker that starts in between creates a new one.
 void ActiveThreads::remove(void*) {
     QUELTA_ASSERT(_ptrs != NULL);  // NOLINT(modernize-use-nullptr)
-    leave();
-}
-
-Thread* ActiveThreads::current() {
-    return registeredHere && _ptrs != nullptr ? _ptrs->get() : nullptr;
+    registeredName = nullptr;
+    _mutex.lock();
+    --_nthreads;
+    const ThreadSpecificPointer<Thread>* unused = nullptr;
+    if (_nthreads == 0) {
+        unused = std::exchange(_ptrs, nullptr);
+    }
+    _mutex.unlock();
+    delete unused;
 }

@@ -1,13 +1,13 @@
 #ifndef QUELTA_UTIL_THREAD_H_
 #define QUELTA_UTIL_THREAD_H_
 
-// Everything about threads, and their registry.
+// All of the thread library, and ActiveThreads, the registry of workers.
 //
-// ActiveThreads maps each running worker to its Thread object, through a thread-specific pointer
-// that exists while any worker is registered. A worker adds itself before anything else; when it
-// ends, the thread library calls remove(), and the last one to leave deletes the pointer.
-// Invariant: `_ptrs` is not null exactly while `_nthreads` is above 0. It is written under `_mutex`
-// only, and read without it only by threads that are registered, for which it cannot change.
+// The registry maps each running worker to its Thread object, through a thread-specific pointer
+// that exists while any worker is registered. A worker adds itself when its thread starts. When the
+// thread ends, the C library calls remove(), and the last worker deletes the pointer.
+// Invariant: `_ptrs` is not null exactly while `_nthreads` is above 0. It is written only under
+// `_mutex`, and read without it only by registered threads, for which it cannot change.
 // Safe from any thread; serialised by `_mutex`.
 
 #include "util/EventLoop.h"
@@ -20,28 +20,22 @@ public:
 
     // Registers the calling thread as `thrptr`.
     // Requires: the calling thread is not registered (asserted).
-    // Errors: logged; the thread then runs unregistered, as "Main Thread".
+    // Errors: a key that cannot be created is logged, and the thread runs unregistered, as "Main
+    // Thread". PthreadException for any other failure; thrown by a worker that is starting, it
+    // terminates the program.
     static void add(Thread* thrptr);
 
-    // Unregisters the calling thread. The argument, which the thread library passes, is not used.
+    // Unregisters the calling thread. The argument, which the C library passes, is not used.
     // Requires: some thread is registered (asserted).
-    // Errors: PthreadException; out of a thread that ends, it terminates the program.
+    // Errors: PthreadException; thrown while a thread ends, it terminates the program.
     static void remove(void*);
 
-    // Returns: the calling thread's object, null when it is not registered.
-    // Threads: takes no lock; an unregistered thread touches nothing shared.
-    static Thread* current();
-
 private:
-    static void enter();
-    static void store(Thread* thrptr);
-    static void leave();
-    static ThreadSpecificPointer<Thread>* takeBack();
+    friend class Thread;  // current() reads the calling thread's entry
 
-    // Refers to a lock that is ready before any constructor runs, and that outlives every worker.
-    static Mutex& _mutex;
-    static unsigned int _nthreads;  // registered threads
-    static ThreadSpecificPointer<Thread>* _ptrs;
+    static Mutex _mutex;
+    static unsigned int _nthreads;                // registered threads
+    static ThreadSpecificPointer<Thread>* _ptrs;  // owned
 };
 
 #endif  // QUELTA_UTIL_THREAD_H_

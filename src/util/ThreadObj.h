@@ -1,17 +1,21 @@
 #ifndef QUELTA_UTIL_THREADOBJ_H_
 #define QUELTA_UTIL_THREADOBJ_H_
 
-// Thread: one operating-system thread. A program that starts workers first makes one Thread() for
-// its main thread. A worker is a subclass with a main() of its own; its thread exists from the
-// construction on, waits for go(), runs main() and must be joined before the object is destroyed:
+// Thread: one operating-system thread. A program that uses workers first constructs one Thread()
+// for its main thread. A worker is a subclass with its own main(). The constructor creates the
+// thread, which waits for go() and then runs main(). It must be joined before the object is
+// destroyed:
 //     Thread mainThread;
 //     Worker worker("Worker");
 //     worker.go();
 //     worker.join();
 // go() and join() are allowed once each; the main thread counts as running and joined.
 //
-// Invariant: `_ready_to_run` and `_start` are guarded by the one lock of all start handshakes. A
-// worker reads nothing that its creator writes after starting it until that handshake is over.
+// The two locks of the library are static objects, destroyed at exit. So create threads only after
+// main has begun, and join all of them, or call mainThreadDying(), before exit.
+//
+// Invariant: `_ready_to_run` and `_start` are guarded by one lock, which all threads share. Until a
+// worker has passed its wait for go(), it reads no field that its creator still writes.
 // Not thread-safe; one thread at a time per object. The static members are safe from any thread.
 
 #include <cstddef>
@@ -21,37 +25,40 @@
 
 class Thread : private PthreadObject {
 public:
-    // Joins and deletes its thread, on the thread of the event loop that it is handed to.
+    // Joins and deletes its thread. Runs on the thread of an event loop.
     class JoinHelper : public InThreadActor {
     public:
         explicit JoinHelper(Thread* thr) : _thr(thr) {}
 
-        // Requires: the thread was made with new. Deletes it, and this helper, which is part of it.
+        // Requires: the Thread was allocated by new. This deletes the helper too, as it is part of
+        // the Thread.
         void callback() override;
 
     private:
         Thread* _thr;
     };
 
-    // Stands for the calling thread, under the name "Main Thread".
-    // Errors: PthreadException "Main Thread created twice!".
-    // Deliberate: there is one in the life of a process, also when it was destroyed or its
-    // construction failed half way.
-    // A stack size that cannot be set is only a warning.
+    // Represents the calling thread, under the name "Main Thread". A stack size that cannot be set
+    // is only a warning.
+    // Errors: PthreadException "Main Thread created twice!", or that of pthread_attr_init.
+    // Deliberate: there can be only one per process, even after it was destroyed or its
+    // construction failed.
     Thread();
 
     // Creates a thread that waits for go().
-    // `thrname`: the pointer is kept; its text must outlive the object.
-    // Errors: PthreadException "Thread created before main thread!", or that of pthread_create; in
-    // either case no thread is started.
+    // `thrname`: not null; the pointer is kept, so the text must outlive the object.
+    // Errors: PthreadException "Thread created before main thread!", or that of pthread_create. No
+    // thread is created then.
     explicit Thread(const char* thrname);
 
     // Requires: joined (asserted), unless mainThreadDying() was called.
-    virtual ~Thread() noexcept(false);
+    // Deliberate: a worker that has not started then never runs. The destructor waits until its
+    // thread has left the start.
+    virtual ~Thread();
     Thread(const Thread&) = delete;
     Thread& operator=(const Thread&) = delete;
 
-    // The body of a worker. The main thread's object has none: its thread runs already.
+    // The body of a worker. Not called for the main thread.
     virtual void main() {}
 
     bool isCurrent() const { return _token == PthreadToken::self(); }
@@ -59,49 +66,50 @@ public:
     bool operator!=(const Thread& other) const { return _token != other._token; }
     const char* name() const { return _name; }
 
-    // Lets main() start; not lost when the thread has not reached its wait yet.
+    // Lets main() start, even if the thread is not waiting yet.
     // Requires: not called before (asserted).
     void go();
 
     // Waits until the thread has ended.
     // Requires: not called before (asserted).
-    // Deliberate: a join that fails counts too; it is not tried again, and the object may go.
+    // Deliberate: a failed join counts as a join. It cannot be retried, and the object may be
+    // destroyed.
     void join();
 
     // Owns: the helper is a part of this object.
     JoinHelper* joinHelper() { return &_jhelp; }
 
-    // Returns: the calling thread's object; null on the main thread and on every thread that no
-    // Thread stands for.
+    // Returns: the calling thread's object; null on the main thread and on threads not created by
+    // Thread.
+    // Threads: as currentName().
     static Thread* current();
 
     // Returns: the calling thread's name.
-    // Deliberate: "Main Thread" where current() is null, on whichever thread that is.
-    // Threads: takes no lock; touches nothing shared on a thread that no Thread stands for.
+    // Deliberate: "Main Thread" on every thread whose current() is null.
+    // Threads: takes no lock. Reads nothing shared on a thread not created by Thread.
     static const char* currentName();
 
-    // From now on failed pthread calls are ignored and unjoined objects may be destroyed: for the
-    // end of the process, when other threads may be left running. A worker that is destroyed
-    // before its thread has begun never runs main().
+    // From now on failed pthread calls are ignored and unjoined objects may be destroyed. Meant for
+    // the end of the process, when other threads may be left running.
     static void mainThreadDying();
 
     // The start routine of pthread_create; `arg` is the Thread.
     static void* callMain(void* arg);
 
-    static constexpr std::size_t s_stackSize = 1048576;  // bytes, of every new thread
+    static constexpr std::size_t s_stackSize = 1048576;  // bytes, of every worker
 
 private:
     enum Start { STARTING, ABANDONED, STARTED };
 
     void abandon();
 
-    PthreadToken _token;  // nobody's when the thread could not be created
+    PthreadToken _token;  // matches no thread if the thread could not be created
     const char* _name;
     bool _did_join;
     bool _ready_to_run;
     ConditionWakeAll _ready_to_run_cond;  // signalled by go()
     JoinHelper _jhelp;
-    Start _start = STARTING;  // of a worker; STARTED: past its handshake
+    Start _start = STARTING;  // of a worker; STARTED: it has passed its wait for go()
 };
 
 #endif  // QUELTA_UTIL_THREADOBJ_H_

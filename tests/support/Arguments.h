@@ -1,15 +1,14 @@
 #ifndef QUELTA_TESTS_SUPPORT_ARGUMENTS_H_
 #define QUELTA_TESTS_SUPPORT_ARGUMENTS_H_
 
-#include <initializer_list>
 #include <string>
+#include <utility>
 #include <vector>
 
-// The command line of a program called "program", which stays where it is, as the arguments of a
-// process do.
+// The command line of a program called "program". Not copyable: popt keeps a pointer to it.
 class Arguments {
 public:
-    Arguments(std::initializer_list<std::string> words) : _words(words) {
+    explicit Arguments(std::vector<std::string> words = {}) : _words(std::move(words)) {
         _argv.push_back("program");
         for (const std::string& word : _words) {
             _argv.push_back(word.c_str());

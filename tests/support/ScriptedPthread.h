@@ -1,53 +1,41 @@
 #ifndef QUELTA_TESTS_SUPPORT_SCRIPTEDPTHREAD_H_
 #define QUELTA_TESTS_SUPPORT_SCRIPTEDPTHREAD_H_
 
-// The pthread functions that a test can let fail, through ScriptedCalls, and what the latest calls
-// of some of them were given. A program that uses this lists support/ScriptedPthread.cpp among its
-// sources and ${scripted_pthread} in its WRAP.
+// The pthread functions that a test can make fail or count through ScriptedCalls. A program that
+// uses this lists support/ScriptedPthread.cpp among its sources and ${scripted_pthread} in its
+// WRAP.
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <pthread.h>
 
 #include <atomic>
+#include <cstddef>
+#include <cstring>
 #include <ctime>
-#include <functional>
-#include <memory>
 #include <string>
 
 #include "support/ScriptedCalls.h"
-#include "support/StderrCapture.h"
 #include "util/Mutex.h"
 
-// Seen on the calling thread; reset by whoever looks.
+// What the latest calls on this thread were given.
 struct SeenByPthread {
-    const pthread_mutex_t* locked = nullptr;  // by the latest pthread_mutex_lock
-    bool mutexAttributes = false;             // whether the latest mutex was given any
-    bool condAttributes = false;              // whether the latest condition was given any
-    clockid_t clock = -1;                     // of the latest timed wait
-    timespec deadline = {};                   // of the latest timed wait
-    const void* attributes = nullptr;         // of the latest thread created
-    std::size_t stackSize = 0;                // within these attributes
-    unsigned detached = 0;                    // calls of pthread_detach
+    clockid_t clock = -1;       // of the latest timed wait
+    timespec deadline = {};     // of the latest timed wait
+    std::size_t stackSize = 0;  // of the latest thread created
 };
 extern thread_local SeenByPthread seenByPthread;
 
-// Called at the beginning of pthread_key_delete, unless null.
-extern std::atomic<void (*)()> onKeyDelete;
+// Called with the name of the function at the beginning of every wrapped call, unless null.
+extern std::atomic<void (*)(const char* function)> onPthreadCall;
 
-// Called at the beginning of pthread_detach, unless null.
-extern std::atomic<void (*)()> onDetach;
-
-// Called with the mutex at the beginning of pthread_mutex_destroy, unless null.
-extern std::atomic<void (*)(const pthread_mutex_t*)> onMutexDestroy;
-
-// The text of a failed call on a thread of that name.
-inline std::string pthreadFailure(const std::string& function, const std::string& errorText,
+// The text of a call that failed with `error` on a thread of that name.
+inline std::string pthreadFailure(const std::string& function, int error,
                                   const std::string& threadName = "Main Thread") {
-    return threadName + ": about to throw a PthreadException: " + function + ": " + errorText;
+    return threadName + ": about to throw a PthreadException: " + function + ": " +
+           std::strerror(error);
 }
 
-// The text of the PthreadException that `act` throws; empty when it throws none.
+// The text of the PthreadException that `act` throws; empty if it throws none.
 template <typename Act>
 std::string thrownBy(Act act) {
     try {
@@ -56,17 +44,6 @@ std::string thrownBy(Act act) {
         return e.what();
     }
     return "";
-}
-
-// Lets the next call of `function` give `error` while `act` runs, and expects that to be reported
-// once, as a line on standard error, and thrown, with the same text.
-template <typename Act>
-void expectFailure(const char* function, int error, const std::string& text, Act act) {
-    const StderrCapture err;
-    ScriptedCalls calls(function);
-    calls.give(error);
-    EXPECT_EQ(text, thrownBy(act));
-    EXPECT_EQ(text + "\n", err.text());
 }
 
 // Matches all that a failed assertion prints.

@@ -1,8 +1,7 @@
 #ifndef QUELTA_TESTS_SUPPORT_SMALLSTACK_H_
 #define QUELTA_TESTS_SUPPORT_SMALLSTACK_H_
 
-// Runs a test body on a thread with a stack too small for deep recursion, so that a walk which
-// grows the stack with its input crashes.
+// Runs a test body on a thread with a stack of 512 KiB, so that deep recursion crashes.
 
 #include <pthread.h>
 

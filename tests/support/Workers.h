@@ -3,13 +3,14 @@
 
 // Threads that run a function, for tests.
 
+#include <atomic>
 #include <functional>
 #include <thread>
 #include <utility>
 
 #include "util/Thread.h"
 
-// The process's one object for its main thread, made on first use.
+// The one object of the main thread, constructed on first use.
 inline Thread& mainThread() {
     static Thread thread;
     return thread;
@@ -32,12 +33,54 @@ inline void runWorker(const char* name, std::function<void()> body) {
     worker.join();
 }
 
-// Runs `body` on a thread that no Thread stands for, waits for its end and gives its result.
+// Waits, busily, until the condition holds.
+template <typename Condition>
+void waitUntil(Condition condition) {
+    while (!condition()) {
+        std::this_thread::yield();
+    }
+}
+
+// A worker that stays in main() until leave().
+class Resident {
+public:
+    explicit Resident(const char* name)
+        : _worker(name, [this] {
+              _running = true;
+              waitUntil([this] { return _leave.load(); });
+          }) {
+        _worker.go();
+        waitUntil([this] { return _running.load(); });
+    }
+    void leave() {
+        _leave = true;
+        _worker.join();
+    }
+
+private:
+    std::atomic<bool> _running{false};
+    std::atomic<bool> _leave{false};
+    Worker _worker;
+};
+
+// Runs `body` on a thread not created by Thread, waits for its end and returns its result.
 template <typename Body>
 auto onForeignThread(Body body) {
     decltype(body()) result{};
     std::thread([&] { result = body(); }).join();
     return result;
+}
+
+// Returns: whether a thread other than the caller could take the lock.
+template <typename Lock>
+bool isFree(Lock& lock) {
+    return onForeignThread([&] {
+        const bool taken = lock.tryLock();
+        if (taken) {
+            lock.unlock();
+        }
+        return taken;
+    });
 }
 
 #endif  // QUELTA_TESTS_SUPPORT_WORKERS_H_

@@ -9,47 +9,24 @@
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
+#include <functional>
 #include <string>
 #include <type_traits>
 
 #include "support/Arguments.h"
-#include "support/FieldOrder.h"
-#include "support/ParsedLoaderInfo.h"
+#include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/Logger.h"
 
 namespace {
 
-// How callers see the record: results are copies, and queries work on a record that is const.
-template <typename Result>
-using Getter = Result (LoaderInfo::*)() const;
-using Words = const char* const*;
-static_assert(std::is_same_v<decltype(&LoaderInfo::getQueltaHome), Getter<Pathname>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getQueltaDb), Getter<Pathname>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getCommonConfigPath), Getter<Pathname>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getInstallConfigPath), Getter<Pathname>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getComponentName), Getter<std::string>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getInstallName), Getter<std::string>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getHost), Getter<std::string>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getStartupMode), Getter<std::string>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getPort), Getter<int>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getPid), Getter<pid_t>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getStartupTime), Getter<time_t>>);
-static_assert(
-    std::is_same_v<decltype(&LoaderInfo::getCommonComponentNode), Getter<const xml::node&>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::validate), Getter<int>>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getErrorMessage), const char* (*)(int)>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::getInstance), LoaderInfo* (*)()>);
-static_assert(std::is_same_v<decltype(&LoaderInfo::init), void (LoaderInfo::*)(int, Words)>);
-static_assert(
-    std::is_same_v<decltype(&LoaderInfo::common_main_setup), void (*)(int, Words, Words)>);
 static_assert(!std::is_polymorphic_v<LoaderInfo>);
 
-const Arguments none{};
+const Arguments none;
 
 // --- Defaults --------------------------------------------------------------------------------
 
-TEST(LoaderInfoTest, StartsEmptyWithNothingLeftUndefined) {
+TEST(LoaderInfoTest, StartsEmpty) {
     const LoaderInfo info;
     EXPECT_EQ("", info.getQueltaHome());
     EXPECT_EQ("", info.getQueltaDb());
@@ -69,40 +46,7 @@ TEST(LoaderInfoTest, StartsEmptyWithNothingLeftUndefined) {
     EXPECT_STREQ("", info.getCommonComponentNode().get_content());
 }
 
-TEST(LoaderInfoTest, KeepsItsFieldsInOrder) {
-    const LoaderInfo info;
-    EXPECT_TRUE(standInOrder({&info._queltaHome,
-                              &info._queltaDb,
-                              &info._componentName,
-                              &info._commonConfigPath,
-                              &info._installName,
-                              &info._rpcPort,
-                              &info._pid,
-                              &info._startupTime,
-                              &info._host,
-                              &info._commonComponentNode,
-                              &info._isDebug,
-                              &info._useDebugLog,
-                              &info._isDaemon,
-                              &info._startupMode,
-                              &info._poptOptionsTable,
-                              &info._poptContext,
-                              &info._poptIsDebug,
-                              &info._poptUseDebugLog,
-                              &info._poptIsNodaemon,
-                              &info._poptCommonConfigPath,
-                              &info._poptHost,
-                              &info._poptInstallName,
-                              &info._poptComponentName,
-                              &info._poptRpcPort,
-                              &info._optionsError,
-                              &info._poptStartupMode}));
-}
-
-TEST(LoaderInfoTest, InitSetsTheDefaults) {
-    LoaderInfo info;
-    const time_t before = std::time(nullptr);
-    info.init(none.argc(), none.argv());
+void expectDefaults(const LoaderInfo& info, time_t before) {
     EXPECT_EQ("queltad", info.getComponentName());
     EXPECT_EQ("etc", info._commonConfigPath);
     EXPECT_EQ("myinstall", info.getInstallName());
@@ -114,41 +58,7 @@ TEST(LoaderInfoTest, InitSetsTheDefaults) {
     EXPECT_TRUE(info.getDaemon());
     EXPECT_FALSE(info.getUseDebugLog());
     EXPECT_FALSE(info.isError());
-}
-
-TEST(LoaderInfoTest, InitLeavesDirectoriesHostAndModeAlone) {
-    LoaderInfo info;
-    info._queltaHome = "/home";
-    info._queltaDb = "/db";
-    info._host = "host";
-    info._startupMode = "mode";
-    info.init(none.argc(), none.argv());
-    EXPECT_EQ("/home", info.getQueltaHome());
-    EXPECT_EQ("/db", info.getQueltaDb());
-    EXPECT_EQ("host", info.getHost());
-    EXPECT_EQ("mode", info.getStartupMode());
-}
-
-TEST(LoaderInfoTest, InitAgainMakesANewContextAndOverwritesEveryDefault) {
-    Parsed first({"-c", "c", "-h", "h", "-i", "i", "-n", "n", "-p", "1", "--mode", "m", "--debug",
-                  "--nodaemon", "--unknown"});
-    LoaderInfo& info = first.info;
-    poptContext const used = info._poptContext;
-    info._pid = 0;
-    info._startupTime = 0;
-
-    info.init(none.argc(), none.argv());
-    EXPECT_NE(used, info._poptContext);
-    EXPECT_EQ("queltad", info.getComponentName());
-    EXPECT_EQ("etc", info._commonConfigPath);
-    EXPECT_EQ("myinstall", info.getInstallName());
-    EXPECT_EQ(8089, info.getPort());
-    EXPECT_EQ(::getpid(), info.getPid());
-    EXPECT_NE(0, info.getStartupTime());
-    EXPECT_TRUE(info.getDebug());
-    EXPECT_TRUE(info.getDaemon());
-    EXPECT_FALSE(info.getUseDebugLog());
-    EXPECT_FALSE(info.isError());
+    EXPECT_NE(nullptr, info._poptContext);
     EXPECT_EQ(0, info._poptIsDebug);
     EXPECT_EQ(0, info._poptUseDebugLog);
     EXPECT_EQ(0, info._poptIsNodaemon);
@@ -157,11 +67,34 @@ TEST(LoaderInfoTest, InitAgainMakesANewContextAndOverwritesEveryDefault) {
                               info._poptComponentName, info._poptStartupMode}) {
         EXPECT_EQ(nullptr, value);
     }
+}
+
+TEST(LoaderInfoTest, InitSetsTheDefaultsEachTimeAndLeavesTheRest) {
+    const StderrCapture err;
+    const Arguments options({"-c", "c", "-h", "h", "-i", "i", "-n", "n", "-p", "1", "--mode", "m",
+                             "--debug", "--nodaemon", "--noseg", "--unknown"});
+    LoaderInfo info;
+    info._queltaHome = "/home";
+    info._queltaDb = "/db";
+    const time_t before = std::time(nullptr);
+    info.init(options.argc(), options.argv());
+    expectDefaults(info, before);
+    info.populateFromCommandLine();
+    EXPECT_TRUE(info.isError());
+
+    poptContext const used = info._poptContext;
+    info._pid = 1;
+    info._startupTime = 1;
+    info.init(none.argc(), none.argv());
+    expectDefaults(info, before);
+    EXPECT_NE(used, info._poptContext);
+    EXPECT_EQ("/home", info.getQueltaHome());
+    EXPECT_EQ("/db", info.getQueltaDb());
     EXPECT_EQ("h", info.getHost());
     EXPECT_EQ("m", info.getStartupMode());
 }
 
-TEST(LoaderInfoTest, InstanceIsMadeOnceEmpty) {
+TEST(LoaderInfoTest, InstanceIsCreatedOnceAndEmpty) {
     EXPECT_EXIT(
         {
             const bool fresh = LoaderInfo::_instance == nullptr;
@@ -174,7 +107,7 @@ TEST(LoaderInfoTest, InstanceIsMadeOnceEmpty) {
 
 // --- Environment -----------------------------------------------------------------------------
 
-TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifference) {
+TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesBackTheOnesThatChanged) {
     const struct {
         const char* value;
         const char* cleaned;
@@ -186,7 +119,7 @@ TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifferen
     for (const auto& row : rows) {
         for (const bool home : {true, false}) {
             const char* const name = home ? "QUELTA_HOME" : "QUELTA_DB";
-            // The very text that the environment points at, to tell it from an equal one.
+            // putenv keeps the address, so an unchanged variable can be recognised.
             std::string setting = std::string(name) + '=' + row.value;
             ASSERT_EQ(0, ::putenv(setting.data()));
             const char* const before = std::getenv(name);
@@ -197,7 +130,7 @@ TEST(LoaderInfoTest, CleansTheDirectoriesAndWritesThemBackWhereThatMadeADifferen
             EXPECT_EQ(row.cleaned, home ? info.getQueltaHome() : info.getQueltaDb()) << row.value;
             EXPECT_STREQ(row.cleaned, std::getenv(name)) << row.value;
             if (std::string(row.value) == row.cleaned) {
-                EXPECT_EQ(before, std::getenv(name)) << "left alone: " << row.value;
+                EXPECT_EQ(before, std::getenv(name)) << "not changed: " << row.value;
             }
             ::unsetenv(name);
         }
@@ -228,46 +161,41 @@ TEST(LoaderInfoTest, TakesEachDirectoryFromItsOwnVariable) {
 
 // --- Paths and checks ------------------------------------------------------------------------
 
-TEST(LoaderInfoTest, ConfigurationPathsStandBelowTheInstallation) {
-    Parsed parsed({});
-    parsed.info._queltaHome = "/q";
-    EXPECT_EQ("/q/etc", parsed.info.getCommonConfigPath());
-    EXPECT_EQ("/q/etc/myinstall", parsed.info.getInstallConfigPath());
-
-    Parsed other({"-c", "/conf", "-i", "inst"});
-    other.info._queltaHome = "/q";
-    EXPECT_EQ("/q/conf", other.info.getCommonConfigPath());
-    EXPECT_EQ("/q/conf/inst", other.info.getInstallConfigPath());
+TEST(LoaderInfoTest, ConfigurationPathsAreBelowTheInstallation) {
+    LoaderInfo info;
+    info._queltaHome = "/q";
+    info._commonConfigPath = "conf";
+    info._installName = "inst";
+    EXPECT_EQ("/q/conf", info.getCommonConfigPath());
+    EXPECT_EQ("/q/conf/inst", info.getInstallConfigPath());
 }
 
-// A whole installation in a folder of its own, and the record that was started from it.
-class LoaderInfoValidateTest : public testing::Test {
-protected:
-    LoaderInfoValidateTest() {
-        ::mkdir(_dir.file("home").c_str(), 0755);
-        ::mkdir(_dir.file("home/etc").c_str(), 0755);
-        ::mkdir(_dir.file("home/etc/myinstall").c_str(), 0755);
-        ::mkdir(_dir.file("db").c_str(), 0755);
-        writeFile(_dir.file("file"), "");
-        writeFile(_dir.file("home/file"), "");
-        writeFile(_dir.file("home/etc/file"), "");
-        _info.init(none.argc(), none.argv());
-        _info._queltaHome = _dir.file("home");
-        _info._queltaDb = _dir.file("db");
+// A complete installation in a temporary directory, and its record.
+struct Installation {
+    Installation() {
+        for (const char* const name : {"home", "home/etc", "home/etc/myinstall", "db"}) {
+            ::mkdir(dir.file(name).c_str(), 0755);
+        }
+        for (const char* const name : {"file", "home/file", "home/etc/file"}) {
+            writeFile(dir.file(name), "");
+        }
+        info._queltaHome = dir.file("home");
+        info._queltaDb = dir.file("db");
+        info._commonConfigPath = "etc";
+        info._installName = "myinstall";
+        info._componentName = "queltad";
     }
 
-    TempDir _dir;
-    LoaderInfo _info;
+    TempDir dir;
+    LoaderInfo info;
 };
 
-TEST_F(LoaderInfoValidateTest, AcceptsAWholeInstallation) {
-    EXPECT_EQ(0, _info.validate());
-}
-
-TEST_F(LoaderInfoValidateTest, ReturnsTheCodeOfEachCheckThatCanFail) {
-    const Pathname home = _info._queltaHome;
-    const Pathname db = _info._queltaDb;
-    const Pathname file = _dir.file("file");
+TEST(LoaderInfoTest, ValidateReturnsTheCodeOfEachCheckThatCanFail) {
+    Installation installation;
+    LoaderInfo& info = installation.info;
+    const Pathname home = info._queltaHome;
+    const Pathname db = info._queltaDb;
+    const Pathname file = installation.dir.file("file");
     const struct {
         int code;
         Pathname home, db, config;
@@ -277,8 +205,8 @@ TEST_F(LoaderInfoValidateTest, ReturnsTheCodeOfEachCheckThatCanFail) {
         {-2, home, "", "etc", "myinstall", "c"},
         {-4, "relative", db, "etc", "myinstall", "c"},
         {-5, home, "relative", "etc", "myinstall", "c"},
-        {-7, _dir.file("gone"), db, "etc", "myinstall", "c"},
-        {-8, home, _dir.file("gone"), "etc", "myinstall", "c"},
+        {-7, installation.dir.file("gone"), db, "etc", "myinstall", "c"},
+        {-8, home, installation.dir.file("gone"), "etc", "myinstall", "c"},
         {-9, home, db, "gone", "myinstall", "c"},
         {-9, home, db, "etc", "gone", "c"},
         {-9, file, db, "etc", "myinstall", "c"},
@@ -290,62 +218,64 @@ TEST_F(LoaderInfoValidateTest, ReturnsTheCodeOfEachCheckThatCanFail) {
         {-12, home, db, "etc", "file", "c"},
         {-15, home, db, "etc", "myinstall", ""},
         {-16, home, db, "etc", "", "c"},
+        {0, home, db, "etc", "myinstall", "c"},
         {0, home, db, "", "etc", "c"},
         {0, home, db, "/etc/", "//myinstall", "c"},
     };
     for (const auto& row : rows) {
-        _info._queltaHome = row.home;
-        _info._queltaDb = row.db;
-        _info._commonConfigPath = row.config;
-        _info._installName = row.install;
-        _info._componentName = row.component;
-        EXPECT_EQ(row.code, _info.validate())
+        info._queltaHome = row.home;
+        info._queltaDb = row.db;
+        info._commonConfigPath = row.config;
+        info._installName = row.install;
+        info._componentName = row.component;
+        EXPECT_EQ(row.code, info.validate())
             << row.home << ' ' << row.db << ' ' << row.config << ' ' << row.install;
     }
 }
 
-TEST_F(LoaderInfoValidateTest, ReturnsTheFirstOfSeveralFailures) {
-    // Everything wrong at once, then mended one by one in the order of the checks.
-    _info._queltaHome = "";
-    _info._queltaDb = "";
-    _info._componentName = "";
-    _info._installName = "gone";
-    EXPECT_EQ(-1, _info.validate());
-    _info._queltaHome = "relative";
-    EXPECT_EQ(-2, _info.validate());
-    _info._queltaDb = "relative";
-    EXPECT_EQ(-4, _info.validate());
-    _info._queltaHome = _dir.file("gone");
-    EXPECT_EQ(-5, _info.validate());
-    _info._queltaDb = _dir.file("gone");
-    EXPECT_EQ(-7, _info.validate());
-    _info._queltaHome = _dir.file("file");
-    EXPECT_EQ(-8, _info.validate());
-    _info._queltaDb = _dir.file("file");
-    EXPECT_EQ(-9, _info.validate());
-    _info._commonConfigPath = "";
-    _info._installName = "";
-    EXPECT_EQ(-10, _info.validate());
-    _info._queltaHome = _dir.file("home");
-    _info._commonConfigPath = "file";
-    EXPECT_EQ(-11, _info.validate());
-    _info._queltaDb = _dir.file("db");
-    EXPECT_EQ(-12, _info.validate());
-    _info._commonConfigPath = "etc";
-    EXPECT_EQ(-15, _info.validate());
-    _info._componentName = "c";
-    EXPECT_EQ(-16, _info.validate());
-    _info._installName = "myinstall";
-    EXPECT_EQ(0, _info.validate());
+TEST(LoaderInfoTest, ValidateReturnsTheFirstOfSeveralFailures) {
+    Installation installation;
+    LoaderInfo& info = installation.info;
+    const Pathname home = info._queltaHome;
+    const Pathname db = info._queltaDb;
+    info._queltaHome = "";
+    info._queltaDb = "";
+    info._componentName = "";
+    info._installName = "gone";
+    // Everything is wrong at first. Each step corrects what the check before it reported.
+    const struct {
+        int code;
+        std::function<void()> correct;
+    } steps[] = {
+        {-1, [&] { info._queltaHome = "relative"; }},
+        {-2, [&] { info._queltaDb = "relative"; }},
+        {-4, [&] { info._queltaHome = installation.dir.file("gone"); }},
+        {-5, [&] { info._queltaDb = installation.dir.file("gone"); }},
+        {-7, [&] { info._queltaHome = installation.dir.file("file"); }},
+        {-8, [&] { info._queltaDb = installation.dir.file("file"); }},
+        {-9, [&] { info._commonConfigPath = info._installName = ""; }},
+        {-10, [&] { (info._queltaHome = home, info._commonConfigPath = "file"); }},
+        {-11, [&] { info._queltaDb = db; }},
+        {-12, [&] { info._commonConfigPath = "etc"; }},
+        {-15, [&] { info._componentName = "c"; }},
+        {-16, [&] { info._installName = "myinstall"; }},
+        {0, [] {}},
+    };
+    for (const auto& step : steps) {
+        EXPECT_EQ(step.code, info.validate());
+        step.correct();
+    }
 }
 
-TEST_F(LoaderInfoValidateTest, ChecksNeitherWritabilityNorTheLengthOfNames) {
-    _info._componentName = std::string(1 << 16, 'c');
-    EXPECT_EQ(0, _info.validate());
-    ::chmod(_info._queltaHome.c_str(), 0555);
-    ::chmod(_info._queltaDb.c_str(), 0555);
-    EXPECT_EQ(0, _info.validate());
-    ::chmod(_info._queltaHome.c_str(), 0755);
+TEST(LoaderInfoTest, ValidateChecksNeitherWritabilityNorTheLengthOfNames) {
+    Installation installation;
+    LoaderInfo& info = installation.info;
+    info._componentName = std::string(1 << 16, 'c');
+    EXPECT_EQ(0, info.validate());
+    ::chmod(info._queltaHome.c_str(), 0555);
+    ::chmod(info._queltaDb.c_str(), 0555);
+    EXPECT_EQ(0, info.validate());
+    ::chmod(info._queltaHome.c_str(), 0755);
 }
 
 TEST(LoaderInfoTest, HasAMessageForEveryCode) {
@@ -380,7 +310,7 @@ TEST(LoaderInfoTest, HasAMessageForEveryCode) {
 
 // --- Copies and comparison -------------------------------------------------------------------
 
-// Sets every field that is not about options to something unlike a default.
+// Sets every field except those of the options to a value that is not its default.
 void fill(LoaderInfo& info) {
     info._queltaHome = "/home";
     info._queltaDb = "/db";
@@ -399,7 +329,7 @@ void fill(LoaderInfo& info) {
     info._startupMode = "mode";
 }
 
-// What a copy of a filled record has in common with it.
+// Expects what a copy takes from a filled record.
 void expectCopied(const LoaderInfo& copy) {
     EXPECT_EQ("/home", copy.getQueltaHome());
     EXPECT_EQ("component", copy.getComponentName());
@@ -416,45 +346,50 @@ void expectCopied(const LoaderInfo& copy) {
 }
 
 TEST(LoaderInfoTest, CopyHasNeitherDatabaseNorModeNorOptions) {
-    Parsed parsed({"-c", "c", "-h", "h", "-i", "i", "-n", "n", "-p", "7", "--mode", "m", "--noseg",
-                   "--nodaemon", "--debug", "--unknown"});
-    fill(parsed.info);
-    const LoaderInfo copy(parsed.info);
+    const StderrCapture err;
+    const Arguments options({"-h", "h", "-p", "7", "--noseg", "--unknown"});
+    LoaderInfo source;
+    source.init(options.argc(), options.argv());
+    source.populateFromCommandLine();
+    fill(source);
+    LoaderInfo copy(source);
     expectCopied(copy);
     EXPECT_EQ("", copy.getQueltaDb());
     EXPECT_EQ("", copy.getStartupMode());
     EXPECT_FALSE(copy.isError());
     EXPECT_EQ(nullptr, copy._poptContext);
     EXPECT_EQ(0, copy._poptIsDebug);
-    EXPECT_EQ(0, copy._poptUseDebugLog);
-    EXPECT_EQ(0, copy._poptIsNodaemon);
     EXPECT_EQ(0, copy._poptRpcPort);
-    for (const char* value : {copy._poptCommonConfigPath, copy._poptHost, copy._poptInstallName,
-                              copy._poptComponentName, copy._poptStartupMode}) {
-        EXPECT_EQ(nullptr, value);
-    }
-    for (const struct poptOption& entry : copy._poptOptionsTable) {
-        EXPECT_EQ(nullptr, entry.longName);
-        EXPECT_EQ(nullptr, entry.arg);
-    }
-    EXPECT_FALSE(parsed.info == copy);
+    EXPECT_EQ(nullptr, copy._poptHost);
+    EXPECT_EQ(nullptr, copy._poptOptionsTable[0].longName);
+    EXPECT_FALSE(source == copy);
+
+    const Arguments own({"-n", "copy"});
+    copy.init(own.argc(), own.argv());
+    copy.populateFromCommandLine();
+    EXPECT_EQ("copy", copy.getComponentName());
+    EXPECT_EQ("component", source.getComponentName());
 }
 
 TEST(LoaderInfoTest, AssignmentLeavesDatabaseModeAndOptionsOfTheTarget) {
+    const StderrCapture err;
     LoaderInfo source;
     fill(source);
-    Parsed target({"-h", "given", "--mode", "m", "--unknown"});
-    target.info._queltaDb = "/target";
-    poptContext const context = target.info._poptContext;
+    const Arguments options({"-h", "given", "--mode", "m", "--unknown"});
+    LoaderInfo target;
+    target.init(options.argc(), options.argv());
+    target.populateFromCommandLine();
+    target._queltaDb = "/target";
+    poptContext const context = target._poptContext;
 
-    EXPECT_EQ(&target.info, &(target.info = source));
-    expectCopied(target.info);
-    EXPECT_EQ("/target", target.info.getQueltaDb());
-    EXPECT_EQ("m", target.info.getStartupMode());
-    EXPECT_TRUE(target.info.isError());
-    EXPECT_EQ(context, target.info._poptContext);
-    EXPECT_STREQ("given", target.info._poptHost);
-    EXPECT_EQ(&target.info._poptHost, target.info._poptOptionsTable[3].arg);
+    EXPECT_EQ(&target, &(target = source));
+    expectCopied(target);
+    EXPECT_EQ("/target", target.getQueltaDb());
+    EXPECT_EQ("m", target.getStartupMode());
+    EXPECT_TRUE(target.isError());
+    EXPECT_EQ(context, target._poptContext);
+    EXPECT_STREQ("given", target._poptHost);
+    EXPECT_EQ(&target._poptHost, target._poptOptionsTable[3].arg);
 }
 
 TEST(LoaderInfoTest, AssignmentToItselfChangesNothing) {
@@ -466,71 +401,37 @@ TEST(LoaderInfoTest, AssignmentToItselfChangesNothing) {
     EXPECT_EQ("/db", info.getQueltaDb());
 }
 
-TEST(LoaderInfoTest, CopyParsesOptionsOfItsOwnAfterInit) {
-    Parsed source({"-n", "source"});
-    LoaderInfo copy(source.info);
-    const Arguments arguments{"-n", "copy", "--noseg"};
-    copy.init(arguments.argc(), arguments.argv());
-    copy.populateFromCommandLine();
-    EXPECT_EQ("copy", copy.getComponentName());
-    EXPECT_TRUE(copy.getDebug());
-    EXPECT_EQ("source", source.info.getComponentName());
-    EXPECT_FALSE(source.info.getDebug());
-}
-
-TEST(LoaderInfoTest, CopyWithoutDatabaseAndModeComparesEqual) {
-    LoaderInfo source;
-    fill(source);
-    EXPECT_FALSE(LoaderInfo(source) == source);
-    source._queltaDb = "";
-    EXPECT_FALSE(LoaderInfo(source) == source);
-    source._startupMode = "";
-    EXPECT_TRUE(LoaderInfo(source) == source);
-}
-
-TEST(LoaderInfoTest, ComparisonLooksAtEachFieldButNodeAndOptions) {
-    using Change = void (*)(LoaderInfo&);
-    const Change seen[] = {
-        [](LoaderInfo& info) { info._queltaHome = "/other"; },
-        [](LoaderInfo& info) { info._queltaDb = "/other"; },
-        [](LoaderInfo& info) { info._componentName = "other"; },
-        [](LoaderInfo& info) { info._commonConfigPath = "other"; },
-        [](LoaderInfo& info) { info._installName = "other"; },
-        [](LoaderInfo& info) { info._rpcPort = 9; },
-        [](LoaderInfo& info) { info._pid = 9; },
-        [](LoaderInfo& info) { info._startupTime = 9; },
-        [](LoaderInfo& info) { info._host = "other"; },
-        [](LoaderInfo& info) { info._isDebug = false; },
-        [](LoaderInfo& info) { info._isDaemon = false; },
-        [](LoaderInfo& info) { info._startupMode = "other"; },
-        [](LoaderInfo& info) { info._useDebugLog = false; },
+TEST(LoaderInfoTest, ComparisonIgnoresOnlyTheNodeAndTheOptions) {
+    const struct {
+        bool equal;
+        void (*change)(LoaderInfo&);
+    } rows[] = {
+        {true, [](LoaderInfo&) {}},
+        {false, [](LoaderInfo& info) { info._queltaHome = "/other"; }},
+        {false, [](LoaderInfo& info) { info._queltaDb = "/other"; }},
+        {false, [](LoaderInfo& info) { info._componentName = "other"; }},
+        {false, [](LoaderInfo& info) { info._commonConfigPath = "other"; }},
+        {false, [](LoaderInfo& info) { info._installName = "other"; }},
+        {false, [](LoaderInfo& info) { info._rpcPort = 9; }},
+        {false, [](LoaderInfo& info) { info._pid = 9; }},
+        {false, [](LoaderInfo& info) { info._startupTime = 9; }},
+        {false, [](LoaderInfo& info) { info._host = "other"; }},
+        {false, [](LoaderInfo& info) { info._isDebug = false; }},
+        {false, [](LoaderInfo& info) { info._isDaemon = false; }},
+        {false, [](LoaderInfo& info) { info._startupMode = "other"; }},
+        {false, [](LoaderInfo& info) { info._useDebugLog = false; }},
+        {true, [](LoaderInfo& info) { info._commonComponentNode = xml::node("other"); }},
+        {true, [](LoaderInfo& info) { info._optionsError = true; }},
+        {true, [](LoaderInfo& info) { info._poptRpcPort = 9; }},
+        {true, [](LoaderInfo& info) { info._poptIsDebug = 1; }},
     };
-    const Change unseen[] = {
-        [](LoaderInfo& info) {
-            xml::node other("other");
-            info.setCommonComponentNode(other);
-        },
-        [](LoaderInfo& info) { info._optionsError = true; },
-        [](LoaderInfo& info) { info._poptRpcPort = 9; },
-        [](LoaderInfo& info) { info._poptIsDebug = 1; },
-    };
-    int index = 0;
-    for (const Change change : seen) {
+    for (const auto& row : rows) {
         LoaderInfo left, right;
         fill(left);
         fill(right);
-        EXPECT_TRUE(left == right);
-        change(right);
-        EXPECT_FALSE(left == right) << index;
-        EXPECT_FALSE(right == left) << index;
-        ++index;
-    }
-    for (const Change change : unseen) {
-        LoaderInfo left, right;
-        fill(left);
-        fill(right);
-        change(right);
-        EXPECT_TRUE(left == right);
+        row.change(right);
+        EXPECT_EQ(row.equal, left == right) << &row - rows;
+        EXPECT_EQ(row.equal, right == left) << &row - rows;
     }
 }
 
@@ -548,7 +449,7 @@ TEST(LoaderInfoTest, KeepsADeepCopyOfTheComponentNode) {
 
 // --- The common start-up ---------------------------------------------------------------------
 
-// Runs in a child process: standard output goes where the test can see it.
+// Runs in a child process. Standard output goes to standard error, which a death test captures.
 [[noreturn]] void startUp(const Arguments& arguments, bool (*check)() = nullptr) {
     ::dup2(STDERR_FILENO, STDOUT_FILENO);
     LoaderInfo::common_main_setup(arguments.argc(), arguments.argv(), nullptr);
@@ -570,7 +471,7 @@ TEST(LoaderInfoTest, StartUpFillsTheRecordAnnouncesTheConfigurationAndStartsLogg
               "rootCategory=DEBUG,A\nappender.A.fileName=${QUELTA_HOME}/log\n");
     ::setenv("QUELTA_HOME", (dir.path() + "//").c_str(), 1);
     ::setenv("QUELTA_DB", "/db//", 1);
-    const Arguments arguments{"-c", "elsewhere", "-n", "ignored", "--unknown"};
+    const Arguments arguments({"-c", "elsewhere", "-n", "ignored", "--unknown"});
     EXPECT_EXIT(
         startUp(arguments,
                 [] {
@@ -587,7 +488,7 @@ TEST(LoaderInfoTest, StartUpFillsTheRecordAnnouncesTheConfigurationAndStartsLogg
     EXPECT_EQ("logged\n", readFile(dir.file("log")));
 }
 
-// Unbuffered, so that the order in which things are said shows.
+// Unbuffered, so that the order of the two lines shows.
 TEST(LoaderInfoTest, StartUpAnnouncesTheConfigurationBeforeItIsReadAndGoesOnWithoutIt) {
     const TempDir dir;
     ::setenv("QUELTA_HOME", dir.path().c_str(), 1);

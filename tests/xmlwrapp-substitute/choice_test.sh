@@ -1,17 +1,17 @@
 #!/bin/sh
 # Usage: choice_test.sh CXX
-# Configures the project with and without an installed xmlwrapp, which is one made up of the
-# stand-in's header, and looks at what is announced and what LoaderInfo is compiled with.
+# Configures the project with and without an installed xmlwrapp, and checks what CMake reports and
+# which header LoaderInfo is compiled with. The installed one is a copy of the substitute's header.
 set -eu
 cxx=$1
-# A compiler cache that makes paths relative would hide which header was taken.
+# A compiler cache that makes paths relative would hide which header is used.
 unset CMAKE_CXX_COMPILER_LAUNCHER CCACHE_BASEDIR
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 prefix=$scratch/prefix
 mkdir -p "$prefix/include" "$prefix/cmake" "$prefix/pkgconfig"
-cp -r "$source/src/xmlwrapp-bundled/xmlwrapp" "$prefix/include"
+cp -r "$source/src/xmlwrapp-substitute/xmlwrapp" "$prefix/include"
 cat >"$prefix/cmake/XmlwrappConfig.cmake" <<END
 add_library(xmlwrapp::xmlwrapp INTERFACE IMPORTED)
 target_include_directories(xmlwrapp::xmlwrapp INTERFACE "$prefix/include")
@@ -23,7 +23,7 @@ Version: 0.5.0
 Cflags: -I$prefix/include
 END
 
-# expect TITLE STATUS WORDS [cmake arguments]: configures, and looks for the words in what it says.
+# expect TITLE STATUS WORDS [cmake arguments]: configures, and checks the status and the output.
 expect() {
     title=$1
     wanted=$2
@@ -51,9 +51,9 @@ expect_header() {
 package_file=-DXmlwrapp_DIR=$prefix/cmake
 expect "its package file" 0 "xmlwrapp: system ($prefix/cmake/XmlwrappConfig.cmake)" "$package_file"
 expect_header "$prefix/include"
-expect "forced to its own" 0 "xmlwrapp: bundled" "$package_file" -DQUELTA_XMLWRAPP=bundled
-expect_header "$source/src/xmlwrapp-bundled"
-expect "no such choice" 1 "must be auto, system or bundled" -DQUELTA_XMLWRAPP=other
+expect "forced to its own" 0 "xmlwrapp: substitute" "$package_file" -DQUELTA_XMLWRAPP=substitute
+expect_header "$source/src/xmlwrapp-substitute"
+expect "no such choice" 1 "must be auto, system or substitute" -DQUELTA_XMLWRAPP=other
 
 PKG_CONFIG_PATH=$prefix/pkgconfig
 export PKG_CONFIG_PATH
@@ -62,7 +62,7 @@ expect_header "$prefix/include"
 
 unset PKG_CONFIG_PATH
 if ! pkg-config --exists xmlwrapp; then
-    expect "none installed" 0 "xmlwrapp: bundled"
+    expect "none installed" 0 "xmlwrapp: substitute"
     expect "none installed, one wanted" 1 "neither its package file nor pkg-config knows" \
         -DQUELTA_XMLWRAPP=system
 fi

@@ -38,7 +38,7 @@ NodePtr newElement(const xmlChar* name) {
     return element;
 }
 
-// libxml2 hands out a text node without its text when memory runs out between the two.
+// libxml2 returns a text node without its text if only the second allocation fails.
 NodePtr newText(const char* content) {
     const std::size_t length = std::strlen(content);
     if (length >= INT_MAX) {
@@ -66,34 +66,26 @@ node::node() : _tree(new tree{newElement(toXml(""))}) {}
 
 node::node(const char* name) : _tree(new tree{newElement(checkedName(name))}) {}
 
-// libxml2's own copying leaves parts out silently when memory runs out, so the copy is made of
-// the two parts that a node has.
+// Copies the name and the text one by one, because libxml2's own copy silently omits parts when
+// memory runs out.
 node::node(const node& other) : _tree(new tree{newElement(other._tree->element->name)}) {
     set_content(other.get_content());
 }
 
 node& node::operator=(const node& other) {
-    node(other).swap(*this);
+    node copy(other);
+    _tree.swap(copy._tree);
     return *this;
 }
 
 node::~node() = default;
-
-void node::swap(node& other) noexcept {
-    _tree.swap(other._tree);
-}
-
-void node::set_name(const char* name) {
-    const NodePtr renamed = newElement(checkedName(name));
-    std::swap(_tree->element->name, renamed->name);
-}
 
 const char* node::get_name() const {
     return fromXml(_tree->element->name);
 }
 
 void node::set_content(const char* content) {
-    // The text is made first: from there on nothing can fail.
+    // Create the new text first; nothing after that can fail.
     const bool empty = content == nullptr || *content == '\0';
     NodePtr text = empty ? NodePtr() : newText(content);
     xmlNode* const element = _tree->element.get();
