@@ -165,12 +165,14 @@ class Tree:
         self.ninja = ['ninja', f'-j{ninja_jobs}', '-C', self.build]
         self.original = None  # path and text of the source that is broken at the moment
         self.mirror()
+        # ccache sees the same relative paths in each copy; assertions print them without "../tree/".
         launcher = 'ccache' if shutil.which('ccache') else ''
         self.environment = {**os.environ, 'CCACHE_BASEDIR': str(self.root),
                             'CCACHE_SLOPPINESS': 'pch_defines,time_macros'}
         # The cases are not listed after each link, as nothing runs them by ctest.
         subprocess.run(['cmake', '-G', 'Ninja', '-S', self.root, '-B', self.build,
                         '-DCMAKE_BUILD_TYPE=Debug', f'-DCMAKE_CXX_COMPILER_LAUNCHER={launcher}',
+                        '-DCMAKE_CXX_FLAGS=-fmacro-prefix-map=../tree/=',
                         '-DCMAKE_CXX_FLAGS_DEBUG=-O0 -D_GLIBCXX_ASSERTIONS',
                         '-DCMAKE_GTEST_DISCOVER_TESTS_DISCOVERY_MODE=PRE_TEST'],
                        check=True, stdout=subprocess.DEVNULL, env=self.environment)
