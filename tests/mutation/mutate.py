@@ -163,6 +163,7 @@ class Tree:
         self.root = directory / 'tree'
         self.build = directory / 'build'
         self.ninja = ['ninja', f'-j{ninja_jobs}', '-C', self.build]
+        self.programs = {}  # name to path
         self.original = None  # path and text of the source that is broken at the moment
         self.mirror()
         # ccache sees the same relative paths in each copy; assertions print them without "../tree/".
@@ -197,7 +198,9 @@ class Tree:
                               stderr=subprocess.DEVNULL, env=self.environment).returncode == 0
 
     def passes(self, target):
-        program = next(p for p in self.build.rglob(target) if p.is_file())
+        if target not in self.programs:
+            self.programs[target] = next(p for p in self.build.rglob(target) if p.is_file())
+        program = self.programs[target]
         # In a session of its own, so that its children can be ended with it.
         run = subprocess.Popen([program, '--gtest_brief=1', '--gtest_fail_fast'],
                                cwd=program.parent, stdin=subprocess.DEVNULL,
@@ -213,8 +216,9 @@ class Tree:
             run.wait()
 
     def measure(self, target):
+        built = self.make(target)
         started = time.monotonic()
-        if not self.make(target) or not self.passes(target):
+        if not built or not self.passes(target):
             sys.exit(f'{target} does not pass unbroken')
         self.limits[target] = GRACE_SECONDS + 10 * (time.monotonic() - started)
 
@@ -262,7 +266,7 @@ def run(chosen, options, explained):
     with concurrent.futures.ThreadPoolExecutor(jobs) as pool:
         for done, (pair, result) in enumerate(zip(chosen, pool.map(test, chosen))):
             mutant = pair[0]
-            if mutant.path != shown:
+            if mutant.path != shown or done % 50 == 0:
                 shown = mutant.path
                 print(f'{done} of {len(chosen)}: {shown}', file=sys.stderr, flush=True)
             counts[result] += 1
