@@ -51,7 +51,8 @@ HIDDEN = re.compile(r'//.*|/\*(?s:.*?)\*/|"(?:[^"\\\n]|\\.)*"|\'(?:[^\'\\\n]|\\.
                     r'__attribute__\(\(.*\)\)|^ *#(?:.*\\\n)*.*', re.MULTILINE)
 SKIPPED = re.compile(r'^\s*(QUELTA_ASSERT|static_assert|template|using|namespace|case .*:$)')
 
-SCOPE = re.compile(r'(?s:.*)(?<!enum )\b(namespace|class|struct|union|extern)\b[\s\0]*([\w:]*)[^=()]*$')
+SCOPE = re.compile(r'(?s:.*)(?<!enum )\b(namespace|class|struct|union|extern)\b[\s\0]*'
+                   r'([\w:]*)[^=()]*$')
 ENUM = re.compile(r'\benum\s+(?:class\s+)?(\w+)')
 FUNCTION = re.compile(r'((?:\w+::)*(?:operator\s*\(\)|operator\s*[^\s(]+|~?\w+))\s*\(')
 VARIABLE = re.compile(r'(\w+)\s*(?:\[[^\]]*\]\s*)*(?:[={;]|$)')
@@ -120,8 +121,8 @@ def mutants(path, root=ROOT):
                     place = names[bisect.bisect_right(ends, start + match.start())]
                     kind = path.name, place, f'{match.group().strip()} -> {new.strip()}'.strip()
                     seen[kind] += 1
-                    yield Mutant(path, number, line, line[:match.start()] + new + line[match.end():],
-                                 (*kind, seen[kind]))
+                    mutated = line[:match.start()] + new + line[match.end():]
+                    yield Mutant(path, number, line, mutated, (*kind, seen[kind]))
         start += len(line) + 1
 
 
@@ -140,10 +141,14 @@ def check_explained(explained, present):
     return len(problems)
 
 
+def git(*arguments):
+    return subprocess.run(['git', *arguments], cwd=ROOT, check=True, stdout=subprocess.PIPE,
+                          text=True).stdout
+
+
 def changed_lines(revision):
     """Returns the lines of src/ that differ from the revision: path to a set of numbers, from 0."""
-    diff = subprocess.run(['git', 'diff', '-U0', '--no-color', '--no-prefix', revision, '--', 'src'],
-                          cwd=ROOT, check=True, stdout=subprocess.PIPE, text=True).stdout
+    diff = git('diff', '-U0', '--no-color', '--no-prefix', revision, '--', 'src')
     changed, lines = {}, set()
     for line in diff.splitlines():
         if line.startswith('+++ '):
@@ -166,7 +171,7 @@ class Tree:
         self.programs = {}  # name to path
         self.original = None  # path and text of the source that is broken at the moment
         self.mirror()
-        # ccache sees the same relative paths in each copy; assertions print them without "../tree/".
+        # ccache sees the same relative paths in each copy, and assertions print them mapped.
         launcher = 'ccache' if shutil.which('ccache') else ''
         self.environment = {**os.environ, 'CCACHE_BASEDIR': str(self.root),
                             'CCACHE_SLOPPINESS': 'pch_defines,time_macros'}
@@ -179,16 +184,15 @@ class Tree:
                        check=True, stdout=subprocess.DEVNULL, env=self.environment)
 
     def mirror(self):
-        names = subprocess.run(['git', 'ls-files', '--cached', '--others', '--exclude-standard', '-z'],
-                               cwd=ROOT, check=True, stdout=subprocess.PIPE, text=True).stdout
-        files = {name for name in names.split('\0') if (ROOT / name).is_file()}
+        names = git('ls-files', '--cached', '--others', '--exclude-standard', '-z').split('\0')
+        files = {name for name in names if (ROOT / name).is_file()}
         for path in list(self.root.rglob('*')):
             if path.is_file() and str(path.relative_to(self.root)) not in files:
                 path.unlink()
         for name in files:
             copy = self.root / name
-            # An interrupted run may leave a mutant here. Do not copy time stamps, or the build would
-            # think the object made from the mutant is up to date.
+            # An interrupted run may leave a mutant here. Do not copy time stamps, or the build
+            # would think the object made from the mutant is up to date.
             if not copy.exists() or not filecmp.cmp(ROOT / name, copy, shallow=False):
                 copy.parent.mkdir(parents=True, exist_ok=True)
                 shutil.copy(ROOT / name, copy)

@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: scripts_test.sh
-# Runs the scripts in a copy, in a directory whose name has a blank. The package tools, cmake and the
-# program are replaced by ones that print how they were called.
+# Runs the scripts in a copy, in a directory whose name has a blank. The package tools, cmake and
+# the program are replaced by ones that print how they were called.
 set -eu
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(cd "$(mktemp -d)" && pwd -P)

@@ -9,12 +9,13 @@ import check_units
 
 class CheckUnits(unittest.TestCase):
     def problems(self, listed, **files):
-        """The problems of a project with this units.txt, these files and the programs ATest, BTest."""
+        """The problems of a project with this list, these files and the programs ATest, BTest."""
         with tempfile.TemporaryDirectory() as directory:
             root = pathlib.Path(directory)
             (root / 'src' / 'util').mkdir(parents=True)
             (root / 'tests').mkdir()
-            (root / 'tests' / 'CMakeLists.txt').write_text('quelta_test(ATest)\nquelta_test(\n  BTest)')
+            (root / 'tests' / 'CMakeLists.txt').write_text('quelta_test(ATest)\n'
+                                                           'quelta_test(\n  BTest)')
             (root / 'tests' / 'units.txt').write_text(listed)
             for name, text in files.items():
                 (root / 'src' / 'util' / name.replace('_', '.')).write_text(text)
