@@ -132,5 +132,5 @@ refused bootstrap "no group is named"
 refused bootstrap "unknown group 'nonsense'" run nonsense
 refused bench "unknown program '--fast', not one of LoggerBench" --fast
 refused check "unknown check 'nonsense'" format nonsense
-refused fuzz "'ten' is no number of seconds" ten
+refused fuzz "'ten' is not a number of seconds" ten
 refused fuzz "unknown topic 'nonsense', not one of Strings" 10 nonsense
