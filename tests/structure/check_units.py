@@ -91,7 +91,7 @@ def check(project):
 
 
 def main():
-    if len(sys.argv) != 2 or sys.argv[1] in ('-h', '--help'):
+    if len(sys.argv) != 2 or sys.argv[1] == '--help':
         sys.exit(__doc__)
     count, problems = check(pathlib.Path(sys.argv[1]))
     print(*problems, f'{count} files, {len(problems)} problems', sep='\n')
