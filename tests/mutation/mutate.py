@@ -180,7 +180,8 @@ class Tree:
                         '-DCMAKE_BUILD_TYPE=Debug', f'-DCMAKE_CXX_COMPILER_LAUNCHER={launcher}',
                         '-DCMAKE_CXX_FLAGS=-fmacro-prefix-map=../tree/=',
                         '-DCMAKE_CXX_FLAGS_DEBUG=-O0 -D_GLIBCXX_ASSERTIONS',
-                        '-DCMAKE_GTEST_DISCOVER_TESTS_DISCOVERY_MODE=PRE_TEST'],
+                        '-DCMAKE_GTEST_DISCOVER_TESTS_DISCOVERY_MODE=PRE_TEST',
+                        f'-DCMAKE_PROJECT_INCLUDE={HERE}/precompile.cmake'],
                        check=True, stdout=subprocess.DEVNULL, env=self.environment)
 
     def mirror(self):
