@@ -1,20 +1,19 @@
 #ifndef QUELTA_BENCH_HARNESS_H_
 #define QUELTA_BENCH_HARNESS_H_
 
-// The frame of every benchmark program: its main, the defaults of a run, the progress line on
-// standard error and the rows of results.csv.
+// The frame of every benchmark program: its main, the defaults of a run and the progress line on
+// standard error.
 //
 // A program hands its registering function to a static Suite; main parses the flags and calls it.
 // The function calls add() once for each topic ("what is measured") and peer ("by whom"), so that
-// the report can set the peers of one topic side by side:
+// bench/report.py can compare the peers of one topic:
 //
 //     const bench::Suite suite([] {
 //         bench::add("single match", "fnmatch", [](benchmark::State& state) { ... })->Arg(100);
 //     });
 //
-// Plain BENCHMARK() programs work as well: "topic/peer" is then read from the function's name.
 // Repetitions of all peers of a program are interleaved at random, so that a slow moment of the
-// machine does not fall on one of them alone.
+// machine does not affect one of them alone.
 //
 // Not thread-safe; registration and reporting run in the main thread.
 
@@ -34,18 +33,15 @@ public:
     explicit Suite(void (*registerAll)());
 };
 
-// Adds one benchmark. Times are kept in nanoseconds; sizes are given with Arg(), threads with
-// Threads().
+// Adds the benchmark "topic/peer". Times are in nanoseconds; sizes are given with Arg(), threads
+// with Threads(). A peer that takes no part says why with State::SkipWithError.
 benchmark::internal::Benchmark* add(const std::string& topic, const std::string& peer,
                                     std::function<void(benchmark::State&)> body);
 
-// Writes a row that says why a peer takes no part, and a line on standard error.
-void leaveOut(const std::string& topic, const std::string& peer, const std::string& reason);
-
-// Says on standard error what runs now.
+// Prints on standard error what runs now.
 void progress(const std::string& what);
 
-// Ends the program with a message: a result that is wrong must not be timed.
+// Ends the program with a message: a wrong result must not be timed.
 [[noreturn]] void fail(const std::string& message);
 
 }  // namespace bench

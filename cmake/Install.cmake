@@ -53,7 +53,7 @@ install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/var/log")
 # The README, and what it links to.
 install(FILES README.md CHANGELOG.md CONTRIBUTING.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs examples DESTINATION "${CMAKE_INSTALL_DOCDIR}"
-  FILES_MATCHING REGEX "\\.(md|cpp|cfg|txt)$" PATTERN "CMakeLists.txt" EXCLUDE)
+  FILES_MATCHING REGEX "\\.(md|svg|cpp|cfg|txt)$" PATTERN "CMakeLists.txt" EXCLUDE)
 
 set(CPACK_GENERATOR DEB)
 set(CPACK_PACKAGE_CONTACT "The Quelta developers <quelta@localhost>")

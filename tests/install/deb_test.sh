@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: deb_test.sh BUILD-TREE UNIFORM-RANDOM-LIBRARY
-# Makes the Debian package, and installs, runs and removes it under dpkg in a scratch root. Needs no
-# rights: without root's it takes fakeroot's.
+# Makes the Debian package, and installs, runs and removes it under dpkg in a scratch root. Without
+# root's rights it uses fakeroot.
 set -eu
 here=$(CDPATH= cd -- "$(dirname -- "$0")" && pwd)
 build=$1
@@ -25,8 +25,8 @@ set -- "$scratch"/package/quelta_*.deb
 [ $# -eq 1 ] && [ -f "$1" ] || fail "not one package: $*"
 deb=$1
 
-# The scratch root knows the packages of this machine, so that dependencies are checked for real;
-# it has no file lists, which makes dpkg warn and does no harm.
+# The scratch root has this machine's list of packages, so that dependencies are checked. It has no
+# file lists, so dpkg warns, which is harmless.
 mkdir -p "$root/var/lib/dpkg/info" "$root/var/lib/dpkg/updates"
 cp /var/lib/dpkg/status "$root/var/lib/dpkg/status"
 in_root() {
@@ -51,8 +51,10 @@ status=0
 out=$(env -u QUELTA_HOME "$root/usr/bin/Rete") || status=$?
 [ "$status" -eq 255 ] || fail "Rete ended with $status"
 [ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete said: $out"
-# With a random() that draws nothing but 0 a whole run takes a moment.
-out=$(LD_PRELOAD="$uniform_random" QUELTA_HOME="$home" "$root/usr/bin/Rete") ||
+# With a random() that always returns 0, a run is short. The library gets a name without blanks,
+# because LD_PRELOAD separates its names by them.
+ln -s "$uniform_random" "$scratch/random.so"
+out=$(LD_PRELOAD="$scratch/random.so" QUELTA_HOME="$home" "$root/usr/bin/Rete") ||
     fail "Rete ended with $?"
 expected="Using logging configuration at $home/etc/log-cmdline.cfg.
 1 conditions
@@ -70,6 +72,6 @@ done
 
 in_root --purge quelta
 left=$(files_below)
-[ -z "$left" ] || fail "left behind: $left"
+[ -z "$left" ] || fail "files are left: $left"
 [ ! -e "$root/usr/share/quelta" ] && [ ! -e "$root/usr/include/quelta" ] ||
-    fail "folders are left behind"
+    fail "directories are left"

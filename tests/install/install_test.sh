@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: install_test.sh BUILD-TREE CXX [compiler flags]
-# Installs the build tree into a scratch prefix, and builds and runs one program against what is
-# there by CMake and by pkg-config; and configures one that has the sources in a folder of its own.
+# Installs the build tree into a scratch prefix, builds and runs a program with it by CMake and by
+# pkg-config, and configures a project that has the sources in a subdirectory.
 set -eu
 build=$1
 cxx=$2
@@ -30,11 +30,11 @@ done
 for link in $(grep -o ']([^)]*)' "$prefix/share/doc/quelta/README.md" | tr -d ']()'); do
     [ -e "$prefix/share/doc/quelta/$link" ] || fail "the README links to $link"
 done
-for folder in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
-    [ -d "$prefix/$folder" ] || fail "missing: $folder"
+for directory in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
+    [ -d "$prefix/$directory" ] || fail "missing: $directory"
 done
 
-# What was installed must not need the place that it was built in.
+# What is installed does not depend on the source or the build tree.
 source=$(CDPATH= cd -- "$here/../.." && pwd)
 if grep -rIl -e "$source" -e "$build" "$prefix"; then
     fail "these files name the source or the build tree"

@@ -1,17 +1,21 @@
 #!/bin/sh
 # Usage: scripts_test.sh
-# Runs the scripts in a scratch copy, with the package tools, cmake and the program replaced by ones
-# that note how they were called.
+# Runs the scripts in a copy, in a directory whose name has a blank. The package tools, cmake and
+# the program are replaced by ones that print how they were called.
 set -eu
 source=$(CDPATH= cd -- "$(dirname -- "$0")/../.." && pwd)
 scratch=$(cd "$(mktemp -d)" && pwd -P)
 trap 'rm -rf "$scratch"' EXIT
-clone=$scratch/clone
+clone="$scratch/a clone"
 tools=$scratch/tools
-mkdir -p "$clone" "$tools"
+mkdir -p "$clone/bench" "$clone/fuzz/corpus/Strings" "$tools"
 cp -r "$source/script" "$source/sample" "$clone"
-mkdir -p "$clone/bench" "$clone/fuzz/corpus/Strings"
 touch "$clone/bench/LoggerBench.cpp"
+cat >"$clone/script/packages.txt" <<'END'
+run shell sh
+run libpopt-dev is_there popt
+test libgtest-dev is_there gtest
+END
 
 tool() {
     mkdir -p "$(dirname "$1")"
@@ -30,9 +34,8 @@ END
 tool "$tools/sudo" <<'END'
 exit 1
 END
-tool "$tools/dpkg-query" <<'END'
-for package do :; done
-[ "$package" = "$absent" ] || echo 'install ok installed'
+tool "$tools/is_there" <<'END'
+[ "$1" != "$absent" ]
 END
 tool "$clone/build/release/src/services/pipeline/indexprocessor/Rete" <<'END'
 echo "home=$QUELTA_HOME in=$(pwd -P) args=$*"
@@ -46,7 +49,7 @@ absent=
 export user absent
 unset QUELTA_HOME
 
-# Runs a script; its status, standard output and standard error are left in $status, $out, $err.
+# Runs a script; leaves its status, standard output and standard error in $status, $out and $err.
 run() {
     status=0
     out=$("$@" 2>"$scratch/err") || status=$?
@@ -61,9 +64,9 @@ expect() {
 home=$clone/build/release/sample
 cd "$scratch"
 run "$clone/script/run" one "two words"
-expect "status passes through" "$status" 3
-expect "only the program's own output" "$out" "home=$home in=$scratch args=one two words"
-expect "the build's words and the program's" "$err" "cmake --preset release
+expect "the program's status" "$status" 3
+expect "only the program's output" "$out" "home=$home in=$scratch args=one two words"
+expect "the messages of the build and the program" "$err" "cmake --preset release
 cmake --build --preset release --target Rete
 from the program"
 cmp "$source/sample/etc/log-cmdline.cfg" "$home/etc/log-cmdline.cfg"
@@ -71,40 +74,39 @@ cmp "$source/sample/etc/log-cmdline.cfg" "$home/etc/log-cmdline.cfg"
 
 echo "# edited" >"$home/etc/log-cmdline.cfg"
 run "$clone/script/run"
-expect "an edited configuration stays" "$(cat "$home/etc/log-cmdline.cfg")" "# edited"
+expect "an edited configuration is kept" "$(cat "$home/etc/log-cmdline.cfg")" "# edited"
 
 rm -r "$home"
 QUELTA_HOME=relative/home run "$clone/script/run"
 expect "the caller's installation" "$out" "home=relative/home in=$scratch args="
 QUELTA_HOME= run "$clone/script/run"
-expect "an installation set to nothing" "$out" "home= in=$scratch args="
-expect "no sample is laid down then" "$(ls -d "$home" 2>/dev/null || true)" ""
+expect "an empty QUELTA_HOME" "$out" "home= in=$scratch args="
+expect "no sample is created then" "$(ls -d "$home" 2>/dev/null || true)" ""
 
-absent=libpopt-dev
+absent=popt
 user=1000
 for script in "run" "bootstrap run" "test"; do
     # shellcheck disable=SC2086  # a list of words on purpose
     run "$clone/script/"$script
     expect "$script without rights: status" "$status" 77
     expect "$script without rights: output" "$out" ""
-    expect "$script without rights: what to do" "$err" \
+    expect "$script without rights: the line to run" "$err" \
         "Some packages are missing. Run this once, then try again:
-    sudo apt-get install -y libpopt-dev"
+    sudo apt-get update && sudo apt-get install -y libpopt-dev"
 done
 
 user=0
-run "$clone/script/bootstrap" run
-expect "with rights: status" "$status" 0
-expect "with rights: output" "$out" ""
+run "$clone/script/bootstrap" run test
+expect "with rights: status and output" "$status $out" "0 "
 expect "with rights: installs" "$err" "Installing: libpopt-dev
 apt-get update -qq
 apt-get install -y -qq --no-install-recommends libpopt-dev"
 
 absent=
 run "$clone/script/bootstrap" run test
-expect "nothing missing" "$status $out$err" "0 "
+expect "nothing is missing" "$status $out$err" "0 "
 
-for script in bench bootstrap check coverage docs fuzz lint run sanitize test; do
+for script in bench bootstrap check fuzz run test; do
     run "$clone/script/$script" --help
     expect "$script --help: status and error" "$status $err" "0 "
     case $out in
@@ -112,23 +114,23 @@ for script in bench bootstrap check coverage docs fuzz lint run sanitize test; d
     *) expect "$script --help" "$out" "Usage: script/$script ..." ;;
     esac
 done
+run "$clone/script/check" --list
+expect "check --list: first line" "$(printf '%s\n' "$out" | sed -n '1s/  .*//p')" format
 
-# refused "SCRIPT ARGUMENTS" REASON: nothing is installed or built.
-absent=clang
+# refused SCRIPT REASON [ARGUMENT...]: nothing is installed or built.
+absent=popt
 refused() {
-    # shellcheck disable=SC2086  # a list of words on purpose
-    run clone/script/$1
-    expect "$1: status and output" "$status $out" "2 "
-    expect "$1: reason" "$(printf '%s\n' "$err" | head -n 2)" "script/${1%% *}: $2
-$(sed -n '2s/^# //p' "$clone/script/${1%% *}")"
+    script=$1
+    reason=$2
+    shift 2
+    run "$clone/script/$script" "$@"
+    expect "$script $*: status and output" "$status $out" "2 "
+    expect "$script $*: reason" "$(printf '%s\n' "$err" | head -n 2)" "script/$script: $reason
+$(sed -n '2s/^# //p' "$clone/script/$script")"
 }
 refused bootstrap "no group is named"
-refused "bootstrap run nonsense" "unknown group 'nonsense'"
-refused "bench --fast" "unknown program '--fast', not one of LoggerBench"
-refused "check nonsense" "unknown check 'nonsense'"
-refused "docs nonsense" "it takes no arguments"
-refused "fuzz ten" "'ten' is no number of seconds"
-refused "fuzz 10 nonsense" "unknown topic 'nonsense', not one of Strings"
-refused "lint format nonsense" "unknown check 'nonsense'"
-refused "sanitize asan" "a sanitizer and a compiler are needed"
-refused "sanitize ubsan g++" "unknown sanitizer 'ubsan'"
+refused bootstrap "unknown group 'nonsense'" run nonsense
+refused bench "unknown program '--fast', not one of LoggerBench" --fast
+refused check "unknown check 'nonsense'" format nonsense
+refused fuzz "'ten' is not a number of seconds" ten
+refused fuzz "unknown topic 'nonsense', not one of Strings" 10 nonsense

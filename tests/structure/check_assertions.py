@@ -3,9 +3,8 @@
 
 Usage: check_assertions.py SRC_DIR LIST_FILE
 
-A line of the list is a source below SRC_DIR, a tab and the text that a failure prints. Every line
-must be in its source, every assertion of a source in the list, as often there as here. Exits with
-1 when there is anything to report.
+A line of the list is a source below SRC_DIR, a tab and the text that a failure prints. Each
+assertion must be listed as often as it is in its source. Exits with 1 if there is a problem.
 """
 import collections
 import pathlib
@@ -23,6 +22,8 @@ def found(source_dir):
 
 
 def main():
+    if len(sys.argv) != 3:
+        sys.exit(__doc__)
     source_dir, list_file = (pathlib.Path(arg) for arg in sys.argv[1:3])
     listed = collections.Counter(line for line in list_file.read_text().splitlines()
                                  if line and not line.startswith('#'))

@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
-"""Checks that every test that a document names exists.
+"""Checks that every test that documents name exists.
 
-Usage: check_named_tests.py TESTS_DIR DOCUMENT
+Usage: check_named_tests.py TESTS_DIR DOCUMENT...
 
-A test is named as `Suite.Case`. Exits with 1 when a name has no test, or the document has no name.
+A test is named as `Suite.Case`. Exits with 1 if a test does not exist, or a document names none.
 """
 import pathlib
 import re
@@ -14,16 +14,19 @@ DEFINED = re.compile(r'^(?:TYPED_)?TEST(?:_F|_P)?\(\s*(\w+)\s*,\s*(\w+)\s*\)', r
 
 
 def main():
-    tests_dir, document = (pathlib.Path(arg) for arg in sys.argv[1:3])
+    if len(sys.argv) < 3:
+        sys.exit(__doc__)
+    tests_dir, *documents = (pathlib.Path(arg) for arg in sys.argv[1:])
     defined = {f'{suite}.{case}' for path in tests_dir.rglob('*.cpp')
                for suite, case in DEFINED.findall(path.read_text())}
-    lines = document.read_text().splitlines()
-    named = [(number, name) for number, line in enumerate(lines, 1) for name in NAMED.findall(line)]
-    missing = [(number, name) for number, name in named if name not in defined]
-    for number, name in missing:
-        print(f'{document}:{number} names {name}, and there is no such test')
-    print(f'{len(named)} tests named, {len(missing)} missing')
-    return 1 if missing or not named else 0
+    problems = []
+    for document in documents:
+        named = NAMED.findall(document.read_text())
+        problems += [f'{document} names {name}, which does not exist'
+                     for name in named if name not in defined]
+        problems += [] if named else [f'{document} names no test']
+    print(*problems, f'{len(problems)} problems', sep='\n')
+    return 1 if problems else 0
 
 
 if __name__ == '__main__':
