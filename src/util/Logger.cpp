@@ -1,6 +1,3 @@
-// Keeps the inline bodies of the entry points out of this source, which holds their other ones.
-#define QUELTA_LOGGER_OUT_OF_LINE
-
 #include "util/Logger.h"
 
 #include <cerrno>
@@ -115,8 +112,8 @@ Logger::~Logger() {
     }
 }
 
-bool Logger::rootDebugEnabled() {
-    return rootChannel().minlevel < INFO;
+bool Logger::isDebugEnabled() const {
+    return (_channel != nullptr ? *_channel : rootChannel()).minlevel < INFO;
 }
 
 void Logger::initialize() {
@@ -164,35 +161,44 @@ void Logger::format(std::string& out, int errnum, const char* fmt, ...) {
     va_end(ap);
 }
 
-void Logger::route(LogLevel level, const std::string& msg) {
-    LogFormat::do_log(this, level, msg);
-}
-
-void Logger::route(LogLevel level, const char* fmt, ...) {
+void Logger::fatal(const char* fmt, ...) {
     va_list ap;
     va_start(ap, fmt);
-    LogFormat::do_log(this, level, fmt, ap);
+    LogFormat::do_log(this, FATAL, fmt, ap);
     va_end(ap);
 }
 
-// The bodies of the printf-style entry points differ in the level alone, but a variadic function
-// cannot hand its arguments on before it has taken them.
-#define QUELTA_LOG_ENTRY_POINT(method, level)    \
-    void Logger::method(const char* fmt, ...) {  \
-        if (suppresses(level)) {                 \
-            return;                              \
-        }                                        \
-        va_list ap;                              \
-        va_start(ap, fmt);                       \
-        LogFormat::do_log(this, level, fmt, ap); \
-        va_end(ap);                              \
-    }
+void Logger::crit(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, CRIT, fmt, ap);
+    va_end(ap);
+}
 
-QUELTA_LOG_ENTRY_POINT(fatal, FATAL)
-QUELTA_LOG_ENTRY_POINT(crit, CRIT)
-QUELTA_LOG_ENTRY_POINT(error, ERROR)
-QUELTA_LOG_ENTRY_POINT(warn, WARN)
-QUELTA_LOG_ENTRY_POINT(info, INFO)
-QUELTA_LOG_ENTRY_POINT(debug, DEBUG)
+void Logger::error(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, ERROR, fmt, ap);
+    va_end(ap);
+}
 
-#undef QUELTA_LOG_ENTRY_POINT
+void Logger::warn(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, WARN, fmt, ap);
+    va_end(ap);
+}
+
+void Logger::info(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, INFO, fmt, ap);
+    va_end(ap);
+}
+
+void Logger::debug(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, DEBUG, fmt, ap);
+    va_end(ap);
+}

@@ -46,31 +46,29 @@ public:
     ~Logger();
 
     // True when the channel's level is DEBUG, so that callers can skip building expensive text.
-    bool isDebugEnabled() const {
-        return _channel != nullptr ? _channel->minlevel < INFO : rootDebugEnabled();
-    }
+    bool isDebugEnabled() const;
 
     // The entry points. The first form of each takes a printf format, in which "%m" stands for the
     // text of errno; the second takes the message as it stands; the third takes e.what().
     // Cost: one comparison when the message is below the channel's level.
     void fatal(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void fatal(const std::string& msg) { log(FATAL, msg); }
-    void fatal(const std::exception& e) { log(FATAL, e); }
+    void fatal(const std::string& msg) { LogFormat::do_log(this, FATAL, msg); }
+    void fatal(const std::exception& e) { fatal("%s", e.what()); }
     void crit(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void crit(const std::string& msg) { log(CRIT, msg); }
-    void crit(const std::exception& e) { log(CRIT, e); }
+    void crit(const std::string& msg) { LogFormat::do_log(this, CRIT, msg); }
+    void crit(const std::exception& e) { crit("%s", e.what()); }
     void error(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void error(const std::string& msg) { log(ERROR, msg); }
-    void error(const std::exception& e) { log(ERROR, e); }
+    void error(const std::string& msg) { LogFormat::do_log(this, ERROR, msg); }
+    void error(const std::exception& e) { error("%s", e.what()); }
     void warn(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void warn(const std::string& msg) { log(WARN, msg); }
-    void warn(const std::exception& e) { log(WARN, e); }
+    void warn(const std::string& msg) { LogFormat::do_log(this, WARN, msg); }
+    void warn(const std::exception& e) { warn("%s", e.what()); }
     void info(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void info(const std::string& msg) { log(INFO, msg); }
-    void info(const std::exception& e) { log(INFO, e); }
+    void info(const std::string& msg) { LogFormat::do_log(this, INFO, msg); }
+    void info(const std::exception& e) { info("%s", e.what()); }
     void debug(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void debug(const std::string& msg) { log(DEBUG, msg); }
-    void debug(const std::exception& e) { log(DEBUG, e); }
+    void debug(const std::string& msg) { LogFormat::do_log(this, DEBUG, msg); }
+    void debug(const std::exception& e) { debug("%s", e.what()); }
 
     // Fixes the logging epoch and binds the waiting loggers.
     // Requires: logging is not initialized yet (assertion).
@@ -102,52 +100,10 @@ public:
 private:
     friend class LogFormat;  // the layouts print the name; the routing reads the channel
 
-    // False for every message of a logger that is not bound, which needs a closer look.
-    bool suppresses(LogLevel level) const {
-        return _channel != nullptr && level < _channel->minlevel;
-    }
-    void log(LogLevel level, const std::string& msg) {
-        if (!suppresses(level)) {
-            route(level, msg);
-        }
-    }
-    void log(LogLevel level, const std::exception& e) {
-        if (!suppresses(level)) {
-            route(level, "%s", e.what());
-        }
-    }
-    void route(LogLevel level, const std::string& msg);
-    void route(LogLevel level, const char* fmt, ...) __attribute__((format(printf, 3, 4)));
-    static bool rootDebugEnabled();
-
     const char* _channel_name;      // not owned
     std::size_t _channel_name_len;  // its length, for the layouts
     LogChannel* _channel;           // not owned; null, read as the root channel, until bound
     Logger* _next;                  // the next older logger that waits to be bound
 };
-
-// g++ can hand variadic arguments on from a function that is always inlined, and so tests the level
-// where the message is written; with other compilers the test is the first thing behind the call.
-// Each body here shadows the ordinary function of that name in Logger.cpp, which is what a pointer
-// to the member points to (gnu_inline).
-#if defined(__GNUC__) && !defined(__clang__) && !defined(QUELTA_LOGGER_OUT_OF_LINE)
-#define QUELTA_LOG_ENTRY_POINT(method, level)                                          \
-    inline __attribute__((always_inline, gnu_inline, artificial)) void Logger::method( \
-        const char* fmt, ...) {                                                        \
-        if (!suppresses(level)) {                                                      \
-            route(level, fmt, __builtin_va_arg_pack());                                \
-        }                                                                              \
-    }
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wformat-nonliteral"  // checked where the message is written
-QUELTA_LOG_ENTRY_POINT(fatal, FATAL)
-QUELTA_LOG_ENTRY_POINT(crit, CRIT)
-QUELTA_LOG_ENTRY_POINT(error, ERROR)
-QUELTA_LOG_ENTRY_POINT(warn, WARN)
-QUELTA_LOG_ENTRY_POINT(info, INFO)
-QUELTA_LOG_ENTRY_POINT(debug, DEBUG)
-#pragma GCC diagnostic pop
-#undef QUELTA_LOG_ENTRY_POINT
-#endif
 
 #endif  // QUELTA_UTIL_LOGGER_H_
