@@ -75,15 +75,15 @@ public:
 
     // Compiles a pattern.
     // Requires: `pattern` is not null.
-    // Errors: std::bad_alloc; a malformed pattern is none.
+    // Errors: std::bad_alloc; a malformed pattern is not an error.
     explicit LogFormat(const char* pattern);
     ~LogFormat();
     LogFormat(const LogFormat&) = delete;
     LogFormat& operator=(const LogFormat&) = delete;
 
     // Appends the line for one message to `out`; a final line feed comes only from "%n".
-    // Requires: `msg` and `out` are different objects.
-    // Errors: std::bad_alloc, with `out` as it was.
+    // Requires: `msg` and `out` are different objects; only "%c" needs `mdata.category`.
+    // Errors: std::bad_alloc.
     // Threads: safe from any thread.
     // Cost: at most one conversion to local time, none without a date.
     void apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const;
@@ -105,8 +105,6 @@ public:
         __attribute__((format(printf, 3, 4)));
 
 private:
-    LogFormat() = default;
-
     void compile();
     const char* compileConversion(const char* p, const char* end);
     static bool setKind(Atom& atom, char conversion, const char* arg, std::size_t arglen);
@@ -114,7 +112,6 @@ private:
     Atom* new_atom();
     void appendAtom(std::string& out, const Atom* a, CachedTm& tm, const LogMsgMetadata& mdata,
                     const std::string& msg) const;
-    std::size_t likelyLength(const LogMsgMetadata& mdata, const std::string& msg) const;
 
     std::string _fmt;              // the pattern; literal atoms point into it
     Atom* _atoms = nullptr;        // array of _max_atoms, owned
@@ -155,8 +152,6 @@ private:
         char* str = nullptr;
         StringStorage* next = nullptr;
     };
-
-    LogFormattedDate() = default;
 
     void compile(const char* fmtstr, const char* fmtend);
     void addPiece(const char* begin, const char* end);

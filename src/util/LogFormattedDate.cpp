@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstring>
 #include <ctime>
-#include <memory>
 #include <string>
 #include <string_view>
 
@@ -40,11 +39,8 @@ string_view datePattern(string_view arg) {
 
 // Appends the milliseconds of a stamp, three digits.
 void appendMsec(std::string& out, const Timeval& stamp) {
-    const auto msec = static_cast<int>(stamp.msec() - stamp.sec() * 1000);
-    const char digits[] = {static_cast<char>('0' + msec / 100),
-                           static_cast<char>('0' + msec / 10 % 10),
-                           static_cast<char>('0' + msec % 10)};
-    out.append(digits, sizeof(digits));
+    const std::string padded = std::to_string(1000 + stamp.msec() - stamp.sec() * 1000);
+    out.append(padded, 1);
 }
 
 // Returns: whether strftime may yield no text for a piece, which it tells like a buffer that is too
@@ -70,28 +66,22 @@ bool mayBeEmpty(const char* piece) {
     return true;
 }
 
-// Appends a piece that does not fit a buffer of `size` bytes.
-void appendLongPiece(std::string& out, CachedTm& tm, const char* piece, std::size_t size,
-                     const LogMsgMetadata& mdata) {
-    const std::size_t cap = std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece));
-    while (size < cap) {
-        size = std::min(2 * size, cap);
-        const std::unique_ptr<char[]> buf(new char[size]);
-        const std::size_t len = tm.ftime(buf.get(), size, piece, mdata);
+void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsgMetadata& mdata) {
+    char first[64];
+    std::string larger;
+    char* buf = first;
+    for (std::size_t size = sizeof(first);; size *= 2) {
+        const std::size_t len = tm.ftime(buf, size, piece, mdata);
         if (len > 0 && len < size) {
-            out.append(buf.get(), len);
+            out.append(buf, len);
             return;
         }
-    }
-}
-
-void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsgMetadata& mdata) {
-    char buf[64];
-    const std::size_t len = tm.ftime(buf, sizeof(buf), piece, mdata);
-    if (len > 0 && len < sizeof(buf)) {
-        out.append(buf, len);
-    } else if (len > 0 || !mayBeEmpty(piece)) {
-        appendLongPiece(out, tm, piece, sizeof(buf), mdata);
+        if ((len == 0 && mayBeEmpty(piece)) ||
+            size >= std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece))) {
+            return;
+        }
+        larger.resize(2 * size);
+        buf = larger.data();
     }
 }
 
@@ -110,8 +100,7 @@ std::size_t CachedTm::ftime(char* buf, std::size_t size, const char* fmt,
 }
 #pragma GCC diagnostic pop
 
-// Delegates, so that the destructor releases what was built when an allocation fails half way.
-LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) : LogFormattedDate() {
+LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) {
     const string_view pattern =
         datePattern(fmtstr == nullptr ? string_view() : string_view(fmtstr, fmtlen));
     compile(pattern.data(), pattern.data() + pattern.size());
@@ -119,9 +108,10 @@ LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) : Log
 
 LogFormattedDate::~LogFormattedDate() {
     while (_sstor != nullptr) {
-        const std::unique_ptr<StringStorage> node(_sstor);
+        StringStorage* const node = _sstor;
         _sstor = node->next;
         delete[] node->str;
+        delete node;
     }
     delete[] _atoms;
 }
@@ -169,13 +159,10 @@ LogFormattedDate::Atom* LogFormattedDate::new_atom() {
 
 // Returns: a NUL-terminated copy that lives as long as this object.
 const char* LogFormattedDate::store_string(const char* str, std::size_t len) {
-    auto node = std::make_unique<StringStorage>();
-    node->str = new char[len + 1];
-    std::memcpy(node->str, str, len);
-    node->str[len] = '\0';
-    node->next = _sstor;
-    _sstor = node.release();
-    return _sstor->str;
+    char* const copy = new char[len + 1];
+    copy[std::string_view(str, len).copy(copy, len)] = '\0';
+    _sstor = new StringStorage{copy, _sstor};
+    return copy;
 }
 
 void LogFormattedDate::fmt(std::string& out, CachedTm& tm, const LogMsgMetadata& mdata) const {

@@ -108,12 +108,10 @@ Widths takeWidths(std::string& rest) {
     return widths;
 }
 
-// Widths stay small enough here that a number of more than nine digits can only mean "no limit".
+// Widths stay small enough here that a number of more than nine digits can only mean one that does
+// not fit 32 bits, and is ignored.
 std::size_t widthOf(const std::string& digits, std::size_t none) {
-    if (digits.empty()) {
-        return none;
-    }
-    return digits.size() > 9 ? std::string::npos : std::stoul(digits);
+    return digits.empty() || digits.size() > 9 ? none : std::stoul(digits);
 }
 
 std::string fitted(const std::string& text, const Widths& widths) {
