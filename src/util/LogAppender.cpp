@@ -4,32 +4,49 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <charconv>
-#include <limits>
-#include <memory>
-#include <new>
+#include <list>
 #include <string_view>
-#include <vector>
+#include <utility>
 
 #include "util/Assert.h"
-#include "util/ErrnoKeeper.h"
 #include "util/LogFormat.h"
 #include "util/LogInternal.h"
 #include "util/LogLevel.h"
 #include "util/LogMsgMetadata.h"
 
-// What could not be done, and why.
-struct LogAppender::Failure {
-    Problem what = Problem::NONE;
-    int errnum = 0;
-};
-
 namespace {
 
-// Holds an appender's lock for a scope. A lock that cannot be had is no reason to lose the line,
-// and must not be reported from within: the scope then goes without.
+// Marks an appender, for the current thread and scope, as one whose failure is being reported.
+// The marks of nested reports are linked through the stack.
+class ReportMark {
+public:
+    explicit ReportMark(const LogAppender* appender) : _appender(appender), _outer(s_innermost) {
+        s_innermost = this;
+    }
+    ~ReportMark() { s_innermost = _outer; }
+    ReportMark(const ReportMark&) = delete;
+    ReportMark& operator=(const ReportMark&) = delete;
+
+    static bool covers(const LogAppender* appender) {
+        const ReportMark* mark = s_innermost;
+        while (mark != nullptr && mark->_appender != appender) {
+            mark = mark->_outer;
+        }
+        return mark != nullptr;
+    }
+
+private:
+    static constinit thread_local const ReportMark* s_innermost;
+
+    const LogAppender* const _appender;
+    const ReportMark* const _outer;
+};
+constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
+
+// Holds an appender's lock for a scope. If the lock fails, the line is written without it: a report
+// from here would come back to this appender.
 class ScopedLogLock {
 public:
     explicit ScopedLogLock(Mutex& mutex) : _mutex(mutex), _locked(mutex.NOLOG_lock()) {}
@@ -49,23 +66,11 @@ private:
 const std::uint64_t IDENTITY_CHECK_SECONDS = 5;
 const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 
-// Every layout ever made for an appender. A layout that an attribute line has replaced may still be
-// in use by an appender that took it over, so none is freed; the list keeps them reachable.
+// Creates a layout. None is freed: an appender may still use one that another appender has
+// replaced.
 const LogFormat* newLayout(const char* pattern) {
-    static auto* const layouts = new std::vector<std::unique_ptr<const LogFormat>>;
-    layouts->push_back(std::make_unique<const LogFormat>(pattern));
-    return layouts->back().get();
-}
-
-// The shared layouts are never destroyed: appenders write through them until the process ends.
-const LogFormat* basicLayout() {
-    static const LogFormat* const layout = new LogFormat("%R %p %c %m%n");
-    return layout;
-}
-
-const LogFormat* simpleLayout() {
-    static const LogFormat* const layout = new LogFormat("%-8p: %m%n");
-    return layout;
+    static Everlasting<std::list<LogFormat>> created;
+    return &created.value.emplace_back(pattern);
 }
 
 // Reads a plain decimal number: digits only, no leading zero but in "0" itself.
@@ -81,9 +86,13 @@ bool readNumber(std::string_view text, Number& result) {
 
 }  // namespace
 
+bool report_in_progress(const LogAppender* appender) {
+    return ReportMark::covers(appender);
+}
+
 const LogFormat& defaultFormat() {
-    static const LogFormat* const format = new LogFormat("%m%n");
-    return *format;
+    static const Everlasting<LogFormat> format("%m%n");
+    return format.value;
 }
 
 LogAppender& rootAppender() {
@@ -109,12 +118,6 @@ LogAppenderMap& appenders() {
 }
 
 LogAppender::LogAppender() : _fd(-1) {}
-
-LogAppender::~LogAppender() noexcept {
-    if (!_filename.empty()) {
-        closeFd();
-    }
-}
 
 // Around a fork: the child has only the forking thread, so no other may hold a lock then.
 void LogAppender::lockAll() {
@@ -142,9 +145,7 @@ LogAppender* LogAppender::find(const std::string& name, bool create) {
     if (!create) {
         return nullptr;
     }
-    auto made = std::make_unique<LogAppender>();
-    appenders().emplace(name, made.get());
-    return made.release();
+    return appenders()[name] = new LogAppender;
 }
 
 bool LogAppender::setAttribute(const std::string& aname, const char* val,
@@ -180,9 +181,11 @@ void LogAppender::setFileName(std::string_view value, const Pathname& queltaHome
 
 bool LogAppender::setLayout(std::string_view name) {
     if (name == "BasicLayout") {
-        _fmt = basicLayout();
+        static const Everlasting<LogFormat> layout("%R %p %c %m%n");
+        _fmt = &layout.value;
     } else if (name == "SimpleLayout") {
-        _fmt = simpleLayout();
+        static const Everlasting<LogFormat> layout("%-8p: %m%n");
+        _fmt = &layout.value;
     } else if (name != "PatternLayout") {  // its pattern comes with the next key
         return false;
     }
@@ -222,12 +225,12 @@ void LogAppender::finalSetup(const char* name) {
     if (!_filename.empty()) {
         closeFd();  // open already when another appender's setup was reported through this one
         openFile();
+        report(std::exchange(_failure, {}));
         closeFd();
     }
 }
 
 void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
-    const ErrnoKeeper keeper;
     // An appender may be asked to report another one's trouble before its own setup is finished.
     const LogFormat* const layout = _fmt != nullptr ? _fmt : rootAppender()._fmt;
     std::string line;
@@ -235,36 +238,34 @@ void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
     Failure failure;
     {
         const ScopedLogLock lock(_mutex);
-        writeLine(line, mdata.stamp.sec(), failure);
+        writeLine(line, mdata.stamp.sec());
+        failure = std::exchange(_failure, {});
     }
+    const ReportMark mark(this);
     report(failure);
 }
 
 // Everything that `write` does under the lock.
-void LogAppender::writeLine(const std::string& line, time_t now, Failure& failure) {
+void LogAppender::writeLine(const std::string& line, time_t now) {
     if (_fd.valid() && !_filename.empty()) {
         checkIdentity(now);
     }
-    if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now, &failure)) {
+    if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now)) {
         return;
     }
     // Without a file and before its setup, an appender is asked to report another one's trouble.
     const FileDescriptor out = _fd.valid() ? _fd : FileDescriptor(STDERR_FILENO);
     const ssize_t count = out.write(line);
-    if (count < 0 || (count == 0 && !line.empty())) {
-        if (count == 0) {
-            errno = ENOSPC;  // neither taken nor refused: the device is full
-        }
-        failed(Problem::WRITE, &failure);
+    if (count < 0) {
+        failed(CRIT, "writing to");
         if (!_filename.empty()) {
             closeFd();
         }
         return;
     }
-    const file_offset_t room = std::numeric_limits<file_offset_t>::max() - _curSize;
-    _curSize += std::min<file_offset_t>(count, room);
+    _curSize += count;
     if (_maxSize > 0 && _curSize > _maxSize && !_filename.empty()) {
-        rotateFile(now, &failure);
+        rotateFile(now);
     }
 }
 
@@ -277,32 +278,31 @@ void LogAppender::checkIdentity(time_t now) {
         return;
     }
     struct stat status;
-    if (uninterrupted([&] { return _filename.stat(&status); }) && status.st_ino == _inodeNum) {
+    if (_filename.stat(&status) && status.st_ino == _inodeNum) {
         _lastCheck = now;
     } else {
         closeFd();
     }
 }
 
-bool LogAppender::openFile(Failure* later) {
+bool LogAppender::openFile() {
     const bool opened = uninterrupted([this] {
         _fd = _filename.openCreateOrAppend(Pathname::CREATE_NORMAL);
         return _fd.valid();
     });
     if (!opened) {
-        failed(Problem::OPEN, later);
-        return false;
+        failed(ERROR, "opening");
     }
-    return true;
+    return opened;
 }
 
-bool LogAppender::openAndInitFile(time_t now, Failure* later) {
-    if (!openFile(later)) {
+bool LogAppender::openAndInitFile(time_t now) {
+    if (!openFile()) {
         return false;
     }
     struct stat status;
-    if (!uninterrupted([&] { return _fd.stat(&status); })) {
-        failed(Problem::FSTAT, later);
+    if (!_fd.stat(&status)) {
+        failed(CRIT, "calling fstat on");
         closeFd();
         return false;
     }
@@ -312,20 +312,11 @@ bool LogAppender::openAndInitFile(time_t now, Failure* later) {
     return true;
 }
 
-void LogAppender::rotateFile(time_t now, Failure* later) {
-    closeFd();
-    try {
-        shiftBackups();
-    } catch (const std::bad_alloc&) {
-        // The line that led here is written; the next one leads here again.
-    }
-    openAndInitFile(now, later);
-}
-
-// Makes the base file's name free: moves each file up to the first free number one further, or
-// deletes the last one when there is no free number.
+// Moves each file up to the first free number one further, or deletes the last one if no number is
+// free, and starts a new file.
 // Deliberate: a file that cannot be moved is not waited for; the next one may take its name.
-void LogAppender::shiftBackups() {
+void LogAppender::rotateFile(time_t now) {
+    closeFd();
     Pathname from;
     Pathname to;
     unsigned suffix = 0;
@@ -333,18 +324,19 @@ void LogAppender::shiftBackups() {
         filenameWithSuffix(to, suffix);
         if (suffix >= _maxBackupIndex) {
             QUELTA_ASSERT(suffix == _maxBackupIndex);
-            uninterrupted([&] { return to.unlink(); });
+            to.unlink();
             break;
         }
-        if (!uninterrupted([&] { return to.exists(); })) {
+        if (!to.exists()) {
             break;
         }
     }
     for (; suffix > 0; --suffix) {
         filenameWithSuffix(from, suffix - 1);
-        uninterrupted([&] { return from.renameTo(to); });
+        from.renameTo(to);
         to.swap(from);
     }
+    openAndInitFile(now);
 }
 
 void LogAppender::filenameWithSuffix(Pathname& result, unsigned suffix) const {
@@ -358,30 +350,15 @@ void LogAppender::closeFd() {
     _fd.close();
 }
 
-// Notes a failure with the present errno, or reports it at once.
-void LogAppender::failed(Problem what, Failure* later) const {
-    const Failure failure{what, errno};
-    if (later != nullptr) {
-        *later = failure;
-    } else {
-        report(failure);
-    }
+// Notes that a call failed with the present errno.
+void LogAppender::failed(LogLevel level, const char* what) {
+    _failure = {level, what, errno};
 }
 
 void LogAppender::report(const Failure& failure) const {
-    const char* const name = _filename.c_str();
-    errno = failure.errnum;
-    switch (failure.what) {
-        case Problem::NONE:
-            break;
-        case Problem::OPEN:
-            LogFormat::internal(this, ERROR, "Error opening \"%s\": %m", name);
-            break;
-        case Problem::FSTAT:
-            LogFormat::internal(this, CRIT, "Error calling fstat on \"%s\": %m", name);
-            break;
-        case Problem::WRITE:
-            LogFormat::internal(this, CRIT, "Error writing to \"%s\": %m", name);
-            break;
+    if (failure.what != nullptr) {
+        errno = failure.errnum;
+        LogFormat::internal(this, failure.level, "Error %s \"%s\": %m", failure.what,
+                            _filename.c_str());
     }
 }

@@ -35,6 +35,7 @@
 #include <string_view>
 
 #include "util/FileDescriptor.h"
+#include "util/LogLevel.h"
 #include "util/Mutex.h"
 #include "util/Pathname.h"
 
@@ -51,8 +52,6 @@ class LogAppender {
 public:
     // Makes a closed appender without file name, size limit, backups and layout.
     LogAppender();
-    // Closes the file; standard error stays open.
-    ~LogAppender() noexcept;
     LogAppender(const LogAppender&) = delete;
     LogAppender& operator=(const LogAppender&) = delete;
 
@@ -81,16 +80,19 @@ public:
     // Writes one line, formatted by the layout, and rotates the file when it has grown beyond its
     // limit. The time by which the file's identity is checked is the message's stamp.
     // A line of which nothing could be written is reported and lost; a line cut short by a full
-    // device counts with the bytes that went out. The next line tries again. What a signal
-    // interrupts is made again at once.
-    // Errors: std::bad_alloc when the line cannot be formatted; errno is left as it was.
+    // device counts with the bytes that went out. The next line tries again.
+    // Errors: std::bad_alloc when the line cannot be formatted. errno is not kept.
     // Cost: one `write`; at most one `stat` in five seconds of message time.
     void write(const LogMsgMetadata& mdata, const std::string& msg);
 
 private:
     friend LogAppender& rootAppender();
-    struct Failure;
-    enum class Problem { NONE, OPEN, FSTAT, WRITE };
+    // A failed system call, to be reported after the lock is released.
+    struct Failure {
+        LogLevel level = ERROR;
+        const char* what = nullptr;  // null: nothing failed
+        int errnum = 0;
+    };
 
     static void lockAll();
     static void unlockAll();
@@ -98,18 +100,17 @@ private:
     void setFileName(std::string_view value, const Pathname& queltaHome);
     bool setLayout(std::string_view name);
 
-    // The operations below run under the lock (but for the check at start-up). With `later` they
-    // leave a failure there, for a report after the unlock; with null they report at once.
-    bool openFile(Failure* later = nullptr);
-    bool openAndInitFile(time_t now, Failure* later = nullptr);
-    void rotateFile(time_t now, Failure* later = nullptr);
+    // The operations below run under the lock, except for the check at start-up. They store a
+    // failure in _failure, for a report after the unlock.
+    void writeLine(const std::string& line, time_t now);
+    void checkIdentity(time_t now);
+    bool openFile();
+    bool openAndInitFile(time_t now);
+    void rotateFile(time_t now);
     void filenameWithSuffix(Pathname& result, unsigned suffix) const;
     void closeFd();
 
-    void writeLine(const std::string& line, time_t now, Failure& failure);
-    void checkIdentity(time_t now);
-    void shiftBackups();
-    void failed(Problem what, Failure* later) const;
+    void failed(LogLevel level, const char* what);
     void report(const Failure& failure) const;
 
     FileDescriptor _fd;          // negative: closed
@@ -121,6 +122,7 @@ private:
     Mutex _mutex;                     // held around everything `write` does after formatting
     ino_t _inodeNum = 0;              // of the file when it was opened
     time_t _lastCheck = 0;            // seconds of message stamps: identity last confirmed
+    Failure _failure;
 };
 
 // The appender that takes every message of a channel without appenders: standard error, with the

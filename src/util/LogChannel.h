@@ -23,10 +23,8 @@ class LogChannel {
 public:
     // Finds a channel by its name. For an unknown name, either makes a copy of the root channel
     // under that name (`create`) or falls back to the root channel itself, recording nothing.
-    // Requires: `name` is not null.
     // Returns: never null.
     static LogChannel* find(const std::string& name, bool create);
-    static LogChannel* find(const char* name, bool create);
 
     // Sets the minimum level by its name; upper case only, so "debug" is no level.
     // Returns: false, with the level as it was, when `word` names no level.

@@ -5,9 +5,9 @@
 #include <cstring>
 #include <memory>
 #include <string_view>
-#include <utility>
 
 #include "util/Assert.h"
+#include "util/ErrnoKeeper.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
 #include "util/LogFormat.h"
@@ -23,14 +23,10 @@ const char* const BLANKS = " \t";
 const std::string_view KEY_PREFIX = "log4cpp.";
 const std::string_view COMMENT_START = "<!--";
 const std::string_view COMMENT_END = "-->";
-const std::string_view FEED_READ("\n\0", 2);
 
 // Removes everything from the first "#" on.
-void cutRemark(std::string& line) {
-    const std::size_t remark = line.find('#');
-    if (remark != std::string::npos) {
-        line.resize(remark);
-    }
+void cutComment(std::string& line) {
+    line.erase(std::min(line.find('#'), line.size()));
 }
 
 // Takes leading characters out of `set` off the text.
@@ -70,6 +66,20 @@ bool wasInterrupted(std::FILE* file) {
     return true;
 }
 
+// handle_xml_comment for a text that may hold NUL bytes.
+bool skipComment(std::string& result, std::string text, unsigned& lineno, std::FILE* ifile) {
+    std::size_t end = text.find(COMMENT_END);
+    while (end == std::string::npos) {
+        if (!read_line(text, ifile)) {
+            return false;
+        }
+        ++lineno;
+        end = text.find(COMMENT_END);
+    }
+    result.append(text, end + COMMENT_END.size());
+    return true;
+}
+
 struct FileCloser {
     void operator()(std::FILE* file) const { std::fclose(file); }
 };
@@ -96,39 +106,24 @@ void ConfigReader::readLines() {
     }
 }
 
-// Removes remarks and XML comments, which may span lines. What stands before and behind a comment
-// is one line, in which both may occur again. A "#" hides what follows it on the line where a
-// comment may begin, but not on the lines inside of a comment.
-// Returns: false, with the line of no use, when the file ends inside a comment.
-// Cost: linear, however many comments there are.
+// Removes "#" comments and XML comments, which may span lines. The text before and after an XML
+// comment is joined and read again as one line.
+// Returns: false, with the line of no use, if the file ends inside an XML comment.
 bool ConfigReader::dropComments(std::string& line) {
-    cutRemark(line);
-    if (line.find(COMMENT_START) == std::string::npos) {
-        return true;
-    }
-    std::string rest;
-    rest.swap(line);
-    for (std::size_t next = 0; next < rest.size();) {
-        line.push_back(rest[next++]);
-        if (!line.ends_with(COMMENT_START)) {
-            continue;
+    for (;;) {
+        cutComment(line);
+        const std::size_t start = line.find(COMMENT_START);
+        if (start == std::string::npos) {
+            return true;
         }
-        line.resize(line.size() - COMMENT_START.size());
-        const std::size_t end = rest.find(COMMENT_END, next);
-        if (end != std::string::npos) {
-            next = end + COMMENT_END.size();
-            continue;
-        }
+        const std::string after = line.substr(start + COMMENT_START.size());
+        line.resize(start);
         const unsigned startedAt = _lineno;
-        rest.clear();
-        next = 0;
-        if (!handle_xml_comment(rest, "", _lineno, _file)) {
+        if (!skipComment(line, after, _lineno, _file)) {
             _openComment = startedAt;
             return false;
         }
-        cutRemark(rest);
     }
-    return true;
 }
 
 // Returns: false for a parse error.
@@ -136,7 +131,11 @@ bool ConfigReader::parse(const std::string& line) {
     std::string_view rest = line;
     const std::string_view key = takeUntil(rest, ".= \t");
     if (key == "rootCategory") {
-        return parseRoot(line, rest);
+        if (!takeEquals(rest)) {
+            return false;
+        }
+        _root = {_lineno, std::string(rest)};
+        return true;
     }
     if (!rest.starts_with('.')) {
         return false;
@@ -148,15 +147,6 @@ bool ConfigReader::parse(const std::string& line) {
         return true;
     }
     return key == "appender" && parseAppender(rest);
-}
-
-bool ConfigReader::parseRoot(const std::string& line, std::string_view rest) {
-    if (!takeEquals(rest)) {
-        return false;
-    }
-    _rootValue = rest;
-    _root = {_lineno, line};
-    return true;
 }
 
 // "NAME = anything" or "NAME.ATTRIBUTE = value". The appender is made as soon as it has a name.
@@ -177,7 +167,7 @@ bool ConfigReader::parseAppender(std::string_view rest) {
 
 // The root channel comes first: the others begin as copies of it.
 void ConfigReader::setUpChannels() {
-    if (_root.lineno != 0 && !rootChannel().setConfig(_rootValue.c_str())) {
+    if (_root.lineno != 0 && !rootChannel().setConfig(_root.text.c_str())) {
         _errors.push_back(_root);
     }
     for (const NumberedText& category : _categories) {
@@ -200,47 +190,28 @@ void ConfigReader::report(const Pathname& cfgFile) const {
 
 bool read_line(std::string& result, std::FILE* ifile) {
     char buf[128];
+    const std::string_view filled(buf, sizeof(buf));
     result.clear();
-    for (;;) {
-        // fgets does not tell how much it has read, and the text may hold NUL bytes. Filled with
-        // line feeds beforehand, the buffer shows it: a line feed that was read is followed by the
-        // NUL that ends the text; the first one of the filling stands behind that NUL, or behind
-        // what came before a signal.
+    while (!result.ends_with('\n')) {
+        // fgets does not return the length, and the text may hold NUL bytes. In a buffer filled
+        // with newlines, the last NUL is the one that ends the text.
         std::memset(buf, '\n', sizeof(buf));
         const char* const p = std::fgets(buf, sizeof(buf), ifile);
-        const std::string_view filled(buf, sizeof(buf));
-        const std::size_t feed = filled.find('\n');
-        if (p == nullptr) {
-            if (!wasInterrupted(ifile)) {
-                return !result.empty();
-            }
-            result.append(filled.substr(0, feed));
-            continue;
-        }
-        QUELTA_ASSERT(p == buf);
-        if (feed == std::string_view::npos) {
-            result.append(buf, sizeof(buf) - 1);
-        } else if (filled.substr(feed).starts_with(FEED_READ)) {
-            result.append(buf, feed);
-            return true;
+        if (p != nullptr) {
+            QUELTA_ASSERT(p == buf);
+            result += filled.substr(0, filled.rfind('\0'));
+        } else if (wasInterrupted(ifile)) {
+            result += filled.substr(0, filled.find('\n'));  // what came before the signal
         } else {
-            result.append(buf, feed - 1);
+            return !result.empty();
         }
     }
+    result.pop_back();
+    return true;
 }
 
 bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile) {
-    std::string text = cf;
-    std::size_t end = text.find(COMMENT_END);
-    while (end == std::string::npos) {
-        if (!read_line(text, ifile)) {
-            return false;
-        }
-        ++lineno;
-        end = text.find(COMMENT_END);
-    }
-    result.append(text, end + COMMENT_END.size());
-    return true;
+    return skipComment(result, cf, lineno, ifile);
 }
 
 bool Logger::initialize(const Pathname& cfgFile, const Pathname& queltaHome) {
@@ -252,9 +223,10 @@ bool Logger::initialize(const Pathname& cfgFile, const Pathname& queltaHome) {
         return file != nullptr;
     });
     if (!opened) {
-        const int errnum = errno;
-        initialize();
-        errno = errnum;
+        {
+            const ErrnoKeeper keeper;
+            initialize();
+        }
         LogFormat::internal(nullptr, ERROR, "Couldn't open log file configuration \"%s\": %m",
                             cfgFile.c_str());
         return false;

@@ -55,15 +55,13 @@ private:
 
     bool dropComments(std::string& line);
     bool parse(const std::string& line);
-    bool parseRoot(const std::string& line, std::string_view rest);
     bool parseAppender(std::string_view rest);
 
     std::FILE* const _file;
     const Pathname& _queltaHome;
     unsigned _lineno = 0;                   // of the last line read
     unsigned _openComment = 0;              // line of the comment that has no end; 0: none
-    NumberedText _root = {0, {}};           // the last rootCategory line; 0: none
-    std::string _rootValue;                 // what it sets
+    NumberedText _root = {0, {}};           // the value of the last rootCategory line; 0: none
     std::vector<NumberedText> _categories;  // category lines, without "category."
     std::vector<NumberedText> _errors;      // in the order in which they are reported
 };

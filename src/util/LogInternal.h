@@ -60,10 +60,9 @@ Timeval& epoch_timeval();
 
 // Writes "LEVEL - message" and a line feed to standard error, with one write whose result is
 // ignored.
-// Errors: std::bad_alloc.
-void fallback_to_stderr(LogLevel level, const std::string& msg);
+void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept;
 
-// True while LogFormat::internal reports a failure of `appender` on the calling thread.
+// Returns: whether LogAppender::write reports a failure of `appender` on the calling thread.
 bool report_in_progress(const LogAppender* appender);
 
 #endif  // QUELTA_UTIL_LOGINTERNAL_H_

@@ -87,19 +87,11 @@ Logger::Logger(const char* name)
     }
 }
 
-Logger::Logger(const Logger& other)
-    : _channel_name(other._channel_name),
-      _channel_name_len(other._channel_name_len),
-      _channel(other._channel),
-      _next(nullptr) {}
-
 // The link stays: it belongs to this logger's place in the list, if it has one.
 Logger& Logger::operator=(const Logger& other) {
-    if (this != &other) {
-        _channel_name = other._channel_name;
-        _channel_name_len = other._channel_name_len;
-        _channel = other._channel;
-    }
+    _channel_name = other._channel_name;
+    _channel_name_len = other._channel_name_len;
+    _channel = other._channel;
     return *this;
 }
 

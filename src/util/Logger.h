@@ -40,7 +40,7 @@ public:
     // Requires: `name` is not null and outlives the logger; the pointer is kept, not the text.
     explicit Logger(const char* name);
     // A copy logs to the same channel under the same name, but never waits to be bound.
-    Logger(const Logger& other);
+    Logger(const Logger& other) = default;
     Logger& operator=(const Logger& other);
     // Takes a logger that still waits to be bound off the list.
     ~Logger();

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdio>
 #include <cstdlib>
 #include <string>
 
@@ -74,6 +75,7 @@ TEST(LogClosedDescriptors, TheStatusIsAsEverAndEveryLineIsWhole) {
                   "appender.A.maxFileSize=4000\n"
                   "appender.A.maxBackupIndex=50\n"
                   "appender.A.layout.ConversionPattern=%m%n\n");
+        std::fflush(nullptr);
         const pid_t child = ::fork();
         if (child == 0) {
             runProgram(dir, closed);

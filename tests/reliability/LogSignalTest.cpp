@@ -103,6 +103,7 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
             log.write(stampedAt(1000), line);
             expected += line + "\n";
         }
+        log.closeFd();
     }
     reader.join();
     EXPECT_GT(signals, 10U);
@@ -130,6 +131,7 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
         const SignalStorm storm;
         log.write(stampedAt(1000), "first");
         log.write(stampedAt(1010), "second");
+        log.closeFd();
     }
     // Lets a reader go to whom nobody came.
     ::close(::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK));

@@ -34,6 +34,9 @@ public:
         set("layout.ConversionPattern", "%m%n");
         finalSetup("Test");
     }
+    ~FileAppender() noexcept { closeFd(); }
+    FileAppender(const FileAppender&) = delete;
+    FileAppender& operator=(const FileAppender&) = delete;
 
     // Writes one line, `text` and a line feed, at a time in seconds.
     void line(const std::string& text, long long seconds = 1000) {

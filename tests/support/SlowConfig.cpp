@@ -117,8 +117,7 @@ bool readLine(SlowConfig& config, const SlowConfig::Line& line, const std::strin
         if (!takeEquals(rest)) {
             return false;
         }
-        config.root = line;
-        config.rootValue = rest;
+        config.root = {line.number, rest};
         return true;
     }
     if (rest.substr(0, 1) != ".") {

@@ -20,9 +20,8 @@ struct SlowConfig {
         std::string pattern;  // of the layout; empty: none was set
     };
 
-    unsigned openComment = 0;  // line of the comment that has no end; 0: none
-    Line root;                 // the last rootCategory line
-    std::string rootValue;
+    unsigned openComment = 0;                   // line of the comment that has no end; 0: none
+    Line root;                                  // the value of the last rootCategory line
     std::vector<Line> categories;               // without "category."
     std::vector<Line> errors;                   // found while reading
     std::map<std::string, Appender> appenders;  // "rootAppender" too, when a line names it

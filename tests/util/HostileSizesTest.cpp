@@ -140,20 +140,6 @@ TEST_F(HostileSizesTest, ABadLineOf256MebibytesIsReportedWhole) {
     EXPECT_TRUE(log.atEnd());
 }
 
-TEST_F(HostileSizesTest, ALineOfCommentOpenersTakesTimeInProportion) {
-    append("a");
-    append("<!-- <!-- -->", 4 * MIB);
-    append("b\n");
-    append("<!--", 16 * MIB);
-    const ChildRun run = start([](bool complete) {
-        EXPECT_FALSE(complete);
-        expectPeakBelow(6 * 64 * MIB);
-    });
-    EXPECT_EQ(0, run.status);
-    EXPECT_EQ(_cfg + ":2: Unterminated XML comment started\n" + parseError(1, "ab") + '\n',
-              run.err);
-}
-
 TEST_F(HostileSizesTest, TwoMillionLinesAreCountedInTheMemoryOfOne) {
     const std::string ten =
         "# remark\n\nappender.A.maxFileSize=5\n<!--\n-->appender.A.maxBackupIndex=1\n"

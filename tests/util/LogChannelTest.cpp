@@ -8,7 +8,6 @@
 #include <type_traits>
 #include <vector>
 
-#include "support/AllocationProbe.h"
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "util/LogAppender.h"
@@ -53,14 +52,13 @@ TEST_F(LogChannelTest, KeepsTheOrderOfItsFields) {
 
 TEST_F(LogChannelTest, AnUnknownNameIsTheRootChannelAndIsNotRecorded) {
     EXPECT_EQ(&rootChannel(), LogChannel::find("unknown", false));
-    EXPECT_EQ(&rootChannel(), LogChannel::find(std::string("unknown"), false));
     EXPECT_NE(&rootChannel(), LogChannel::find("unknown", true));
 }
 
 TEST_F(LogChannelTest, FindsAChannelByItsWholeName) {
     LogChannel* const channel = LogChannel::find("name", true);
     EXPECT_EQ(channel, LogChannel::find("name", true));
-    EXPECT_EQ(channel, LogChannel::find(std::string("name"), false));
+    EXPECT_EQ(channel, LogChannel::find("name", false));
     EXPECT_EQ(&rootChannel(), LogChannel::find("Name", false));
     EXPECT_EQ(&rootChannel(), LogChannel::find("name ", false));
     EXPECT_EQ(&rootChannel(), LogChannel::find("nam", false));
@@ -79,23 +77,6 @@ TEST_F(LogChannelTest, ANewChannelCopiesTheRootChannelOfThatMoment) {
     EXPECT_EQ(channel, LogChannel::find("copy", true));
     EXPECT_EQ(ERROR, channel->minlevel);
     EXPECT_EQ(Appenders{&_a1}, channel->_appenders);
-}
-
-TEST_F(LogChannelTest, AFailedCreationLeavesNothingBehind) {
-    REQUIRE_ALLOCATION_PROBE();
-    rootChannel()._appenders = {&_a1};
-    const std::string name(100, 'n');
-    // The map's entry, its name, the channel and its list of appenders.
-    for (std::size_t failing = 1; failing <= 4; ++failing) {
-        AllocationProbe allocations(failing);
-        EXPECT_THROW(LogChannel::find(name, true), std::bad_alloc) << failing;
-        EXPECT_EQ(0, allocations.live()) << failing;
-        allocations.stop();
-        EXPECT_EQ(&rootChannel(), LogChannel::find(name, false)) << failing;
-    }
-    LogChannel* const channel = LogChannel::find(name, true);
-    EXPECT_NE(nullptr, channel);
-    EXPECT_NE(&rootChannel(), channel);
 }
 
 TEST_F(LogChannelTest, ChangesItsLevelByName) {

@@ -8,14 +8,14 @@
 #include <new>
 #include <stdexcept>
 #include <string>
-#include <thread>
 #include <vector>
 
-#include "support/AllocationProbe.h"
+#include "support/FileAppender.h"
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "support/ScriptedCalls.h"
 #include "support/StderrCapture.h"
+#include "support/TempDir.h"
 #include "util/LogFormat.h"
 #include "util/LogInternal.h"
 #include "util/Logger.h"
@@ -84,21 +84,6 @@ TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
     }
 }
 
-TEST(FallbackTest, ALineOfAKibibyteNeedsNoMemory) {
-    REQUIRE_ALLOCATION_PROBE();
-    const std::string prefix = "INFO - ";
-    const std::string text(1024 - prefix.size() - 1, 'x');
-    const std::string longer = text + 'x';
-    const StderrCapture err;
-    AllocationProbe allocations;
-    fallback_to_stderr(INFO, text);
-    const std::size_t count = allocations.count();
-    fallback_to_stderr(INFO, longer);
-    allocations.stop();
-    EXPECT_EQ(0u, count);
-    EXPECT_EQ(prefix + text + '\n' + prefix + longer + '\n', err.text());
-}
-
 TEST(FallbackTest, IgnoresTheResultOfTheCall) {
     ScriptedCalls writes("write");
     writes.fail(EIO).limit(3).fail(EINTR);
@@ -130,48 +115,6 @@ TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted)
     const StderrCapture err;
     copy.debug("%s %d", "text", 1);
     EXPECT_EQ("DEBUG - %s %d\n", err.text());
-}
-
-// Every allocation of a call fails once; whatever it is for, the message or its format comes out,
-// except when the fallback itself has no room.
-TEST(FallbackTest, ExhaustedMemoryLosesAMessageAtMost) {
-    REQUIRE_ALLOCATION_PROBE();
-    Logger logger("name");
-    Logger copy(logger);
-    const std::string text(500, 'x');
-    const std::string longText(2000, 'y');
-    for (Logger* const each : {&logger, &copy}) {
-        std::size_t failing = 1;
-        bool failed = true;
-        for (; failed; ++failing) {
-            const StderrCapture err;
-            AllocationProbe allocations(failing);
-            errno = ENOENT;
-            each->error("%s", text.c_str());
-            EXPECT_EQ(ENOENT, errno);
-            failed = allocations.count() >= failing;
-            allocations.stop();
-            const std::string expected = each == &logger && !failed ? text : "ERROR - " + text;
-            EXPECT_TRUE(err.text() == expected + '\n' || err.text() == "ERROR - %s\n")
-                << failing << ": " << err.text();
-        }
-        EXPECT_LT(2u, failing);
-    }
-}
-
-TEST(FallbackTest, AMessageThatItHasNoRoomForIsLost) {
-    REQUIRE_ALLOCATION_PROBE();
-    const Logger logger("name");
-    Logger copy(logger);
-    const std::string longText(2000, 'y');
-    const StderrCapture err;
-    AllocationProbe allocations(1);
-    EXPECT_THROW(fallback_to_stderr(ERROR, longText), std::bad_alloc);
-    AllocationProbe again(1);
-    copy.error(longText);
-    EXPECT_EQ(1u, again.count());
-    again.stop();
-    EXPECT_EQ("", err.text());
 }
 
 TEST(InternalReportTest, ReachesTheRootAppenderBeforeInitialization) {
@@ -260,7 +203,6 @@ TEST(InternalReportTest, FallsBackWhenAnAppenderThrows) {
         errno = ENOSPC;
         LogFormat::internal(nullptr, ERROR, "report %d", 1);
         EXPECT_EQ(ENOSPC, errno);
-        EXPECT_FALSE(report_in_progress(nullptr));
     });
 }
 
@@ -272,71 +214,31 @@ TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
     });
 }
 
-TEST(InternalReportTest, AppendersThatReportEachOthersFailuresEndOnStandardError) {
-    // A1 fails; its report goes to A2, which fails, too; the report of that goes nowhere else.
-    expectInChild("ERROR - A2 failed\n", [] {
-        channelNamedLogger(INFO, {appender("A1"), appender("A2")});
-        const RecordedWrites writes([](const RecordedWrites::Message& message) {
-            EXPECT_TRUE(report_in_progress(appender("A1")));
-            EXPECT_EQ(appender("A2"), message.appender);
-            EXPECT_FALSE(report_in_progress(appender("A2")));
-            LogFormat::internal(appender("A2"), ERROR, "A2 failed");
-        });
-        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
-        EXPECT_EQ("ERROR Logger A1 failed\n", writes.text());
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-        EXPECT_FALSE(report_in_progress(appender("A2")));
-    });
-}
-
-TEST(InternalReportTest, AThirdAppenderHearsOfBothFailures) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A1"), appender("A2"), appender("A3")});
-        const RecordedWrites writes([](const RecordedWrites::Message& message) {
-            if (message.appender == appender("A2")) {
-                LogFormat::internal(appender("A2"), ERROR, "A2 failed");
-                EXPECT_TRUE(report_in_progress(appender("A1")));
+// The first report goes to the second appender, which fails in turn, and to the third.
+TEST(InternalReportTest, EachOfTwoFailingAppendersIsReportedToTheRest) {
+    for (const bool third : {true, false}) {
+        const TempDir dir;
+        const std::string missing = dir.file("missing/b.log");
+        const std::string secondReport =
+            "Error opening \"" + missing + "\": No such file or directory\n";
+        const ChildRun run = inChild([&] {
+            LogAppender full;
+            LogAppender unopened;
+            FileAppender good(dir.file("good.log"));
+            ASSERT_TRUE(full.setAttribute("fileName", "/dev/full", Pathname()));
+            ASSERT_TRUE(unopened.setAttribute("fileName", missing.c_str(), Pathname()));
+            LogChannel& channel = channelNamedLogger(INFO, {&full, &unopened});
+            if (third) {
+                channel._appenders.push_back(&good);
             }
+            full.write(stampedAt(1000), "lost");
         });
-        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
-        EXPECT_EQ("ERROR Logger A1 failed\nERROR Logger A2 failed\nERROR Logger A1 failed\n",
-                  writes.text());
-        EXPECT_EQ((Written{appender("A2"), appender("A3"), appender("A3")}), writes.appenders());
-    });
-}
-
-TEST(InternalReportTest, IsInProgressOnItsOwnThreadOnly) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A2")});
-        bool here = false;
-        bool elsewhere = true;
-        const RecordedWrites writes([&](const RecordedWrites::Message&) {
-            here = report_in_progress(appender("A1"));
-            std::thread([&] { elsewhere = report_in_progress(appender("A1")); }).join();
-        });
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-        LogFormat::internal(appender("A1"), ERROR, "report");
-        EXPECT_TRUE(here);
-        EXPECT_FALSE(elsewhere);
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-    });
-}
-
-TEST(InternalReportTest, OrdinaryMessagesStillReachAnAppenderWhoseReportIsInProgress) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A2")});
-        LogChannel ordinary;
-        ordinary._appenders = {appender("A1")};
-        Logger logger("name");
-        logger._channel = &ordinary;
-        const RecordedWrites writes([&](const RecordedWrites::Message& message) {
-            if (message.appender == appender("A2")) {
-                logger.info("%s", "ordinary");
-            }
-        });
-        LogFormat::internal(appender("A1"), ERROR, "report");
-        EXPECT_EQ((Written{appender("A2"), appender("A1")}), writes.appenders());
-    });
+        EXPECT_EQ(0, run.status);
+        EXPECT_EQ(third ? "" : "ERROR - " + secondReport, run.err);
+        EXPECT_EQ(
+            third ? secondReport + "Error writing to \"/dev/full\": No space left on device\n" : "",
+            readFile(dir.file("good.log")));
+    }
 }
 
 }  // namespace

@@ -18,12 +18,16 @@ namespace {
 std::vector<std::string> lookups;  // the names; "+" marks a lookup with creation
 }
 
-// LogChannel::find(const char*, bool)
+// LogChannel::find
+// clang-format off
+#define CHANNEL_FIND(prefix) \
+    prefix##__ZN10LogChannel4findERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEb
+// clang-format on
 extern "C" {
-LogChannel* __real__ZN10LogChannel4findEPKcb(const char* name, bool create);
-LogChannel* __wrap__ZN10LogChannel4findEPKcb(const char* name, bool create) {
-    lookups.push_back(std::string(name) + (create ? "+" : ""));
-    return __real__ZN10LogChannel4findEPKcb(name, create);
+LogChannel* CHANNEL_FIND(__real)(const std::string& name, bool create);
+LogChannel* CHANNEL_FIND(__wrap)(const std::string& name, bool create) {
+    lookups.push_back(name + (create ? "+" : ""));
+    return CHANNEL_FIND(__real)(name, create);
 }
 }
 
@@ -41,7 +45,7 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
         const Logger oldest("oldest");
         const Logger middle("middle");
         const Logger newest("newest");
-        LogChannel* const channel = LogChannel::find(std::string("middle"), true);
+        LogChannel* const channel = LogChannel::find("middle", true);
         lookups.clear();
         Logger::initialize();
         EXPECT_TRUE(logger_initialized);
@@ -59,7 +63,7 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
 
 TEST(LoggerBindingTest, LaterLoggersAreBoundAtOnce) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("known"), true);
+        LogChannel* const channel = LogChannel::find("known", true);
         Logger::initialize();
         lookups.clear();
         const Logger known("known");
@@ -81,7 +85,7 @@ TEST(LoggerBindingTest, BindingHappensOnce) {
         const Logger late("name");
         EXPECT_EQ(&rootChannel(), waiting._channel);
         EXPECT_EQ(&rootChannel(), early._channel);
-        EXPECT_EQ(LogChannel::find(std::string("name"), false), late._channel);
+        EXPECT_EQ(LogChannel::find("name", false), late._channel);
         EXPECT_FALSE(waiting.isDebugEnabled());
         EXPECT_TRUE(late.isDebugEnabled());
     });
@@ -150,9 +154,9 @@ TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItMakes) {
         lookups.clear();
         EXPECT_TRUE(Logger::setChannelLevel("new", "FATAL"));
         EXPECT_EQ(std::vector<std::string>{"new+"}, lookups);
-        EXPECT_EQ(FATAL, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_EQ(FATAL, LogChannel::find("new", false)->minlevel);
         EXPECT_TRUE(Logger::setChannelLevel("new", "NOTICE"));
-        EXPECT_EQ(NOTICE, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_EQ(NOTICE, LogChannel::find("new", false)->minlevel);
         EXPECT_EQ(INFO, rootChannel().minlevel);
     });
 }
@@ -160,8 +164,8 @@ TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItMakes) {
 TEST(LoggerBindingTest, AWordThatIsNoLevelStillMakesTheChannel) {
     expectInChild("", [] {
         EXPECT_FALSE(Logger::setChannelLevel("new", "loud"));
-        EXPECT_NE(&rootChannel(), LogChannel::find(std::string("new"), false));
-        EXPECT_EQ(INFO, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_NE(&rootChannel(), LogChannel::find("new", false));
+        EXPECT_EQ(INFO, LogChannel::find("new", false)->minlevel);
     });
 }
 
@@ -209,7 +213,7 @@ TEST(LoggerBindingTest, TheRootChannelDecidesBeforeInitialization) {
 
 TEST(LoggerBindingTest, MessagesGoToTheBoundChannelAfterInitialization) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("name"), true);
+        LogChannel* const channel = LogChannel::find("name", true);
         LogAppender* const appender = LogAppender::find("A1", true);
         channel->minlevel = WARN;
         channel->_appenders = {appender};
@@ -255,7 +259,7 @@ TEST(LoggerBindingTest, ACopyOfAWaitingLoggerGoesUnfilteredToStandardError) {
             copy.fatal("%s", "last");
 
             // Nobody binds it, so that it stays with the root channel.
-            LogChannel::find(std::string("name"), true)->minlevel = EMERG;
+            LogChannel::find("name", true)->minlevel = EMERG;
             Logger::initialize();
             EXPECT_EQ(nullptr, copy._channel);
             copy.debug("%s", "suppressed");
@@ -265,7 +269,7 @@ TEST(LoggerBindingTest, ACopyOfAWaitingLoggerGoesUnfilteredToStandardError) {
 
 TEST(LoggerBindingTest, ACopyOfABoundLoggerIsBound) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("name"), true);
+        LogChannel* const channel = LogChannel::find("name", true);
         Logger::initialize();
         const Logger logger("name");
         const Logger copy(logger);
