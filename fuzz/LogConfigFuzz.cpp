@@ -18,7 +18,7 @@
 #include "support/SlowConfig.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
-#include "util/LogConfig.h"
+#include "util/internal/LogConfig.h"
 #include "util/LogFormat.h"
 #include "util/Pathname.h"
 

@@ -16,7 +16,7 @@
 #include "support/SlowConfig.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 

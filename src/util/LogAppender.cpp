@@ -12,38 +12,13 @@
 
 #include "util/Assert.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/LogLevel.h"
 #include "util/LogMsgMetadata.h"
+#include "util/internal/LogRouting.h"
+#include "util/internal/NeverDestroyed.h"
+#include "util/internal/RetryOnEintr.h"
 
 namespace {
-
-// Marks an appender, for the current thread and scope, as one whose failure is being reported.
-// The marks of nested reports are linked through the stack.
-class ReportMark {
-public:
-    explicit ReportMark(const LogAppender* appender) : _appender(appender), _outer(s_innermost) {
-        s_innermost = this;
-    }
-    ~ReportMark() { s_innermost = _outer; }
-    ReportMark(const ReportMark&) = delete;
-    ReportMark& operator=(const ReportMark&) = delete;
-
-    static bool covers(const LogAppender* appender) {
-        const ReportMark* mark = s_innermost;
-        while (mark != nullptr && mark->_appender != appender) {
-            mark = mark->_outer;
-        }
-        return mark != nullptr;
-    }
-
-private:
-    static constinit thread_local const ReportMark* s_innermost;
-
-    const LogAppender* const _appender;
-    const ReportMark* const _outer;
-};
-constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
 
 // Holds an appender's lock for a scope. If the lock fails, the line is written without it: a report
 // from here would come back to this appender.
@@ -69,7 +44,7 @@ const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 // Creates a layout. None is freed: an appender may still use one that another appender has
 // replaced.
 const LogFormat* newLayout(const char* pattern) {
-    static Everlasting<std::list<LogFormat>> created;
+    static NeverDestroyed<std::list<LogFormat>> created;
     return &created.value.emplace_back(pattern);
 }
 
@@ -86,34 +61,28 @@ bool readNumber(std::string_view text, Number& result) {
 
 }  // namespace
 
-bool report_in_progress(const LogAppender* appender) {
-    return ReportMark::covers(appender);
-}
-
 const LogFormat& defaultFormat() {
-    static const Everlasting<LogFormat> format("%m%n");
+    static const NeverDestroyed<LogFormat> format("%m%n");
     return format.value;
 }
 
 LogAppender& rootAppender() {
-    // The appender itself outlives everything; only its descriptor is closed at exit. What is
-    // logged even later finds a closed appender and not a destroyed one.
-    struct Root {
-        LogAppender* const appender = new LogAppender;
-        Root() {
-            appender->_fd = FileDescriptor(STDERR_FILENO);
-            appender->_fmt = &defaultFormat();
+    static NeverDestroyed<LogAppender> root;
+    // At exit only the descriptor is closed. What is logged later finds a closed appender.
+    static const struct Setup {
+        Setup() {
+            root.value._fd = FileDescriptor(STDERR_FILENO);
+            root.value._fmt = &defaultFormat();
             ::pthread_atfork(&LogAppender::lockAll, &LogAppender::unlockAll,
                              &LogAppender::unlockAll);
         }
-        ~Root() { appender->closeFd(); }
-    };
-    static const Root root;
-    return *root.appender;
+        ~Setup() { root.value.closeFd(); }
+    } setup;
+    return root.value;
 }
 
 LogAppenderMap& appenders() {
-    static Everlasting<LogAppenderMap> map;
+    static NeverDestroyed<LogAppenderMap> map;
     return map.value;
 }
 
@@ -181,10 +150,10 @@ void LogAppender::setFileName(std::string_view value, const Pathname& queltaHome
 
 bool LogAppender::setLayout(std::string_view name) {
     if (name == "BasicLayout") {
-        static const Everlasting<LogFormat> layout("%R %p %c %m%n");
+        static const NeverDestroyed<LogFormat> layout("%R %p %c %m%n");
         _fmt = &layout.value;
     } else if (name == "SimpleLayout") {
-        static const Everlasting<LogFormat> layout("%-8p: %m%n");
+        static const NeverDestroyed<LogFormat> layout("%-8p: %m%n");
         _fmt = &layout.value;
     } else if (name != "PatternLayout") {  // its pattern comes with the next key
         return false;
@@ -286,7 +255,7 @@ void LogAppender::checkIdentity(time_t now) {
 }
 
 bool LogAppender::openFile() {
-    const bool opened = uninterrupted([this] {
+    const bool opened = retryOnEintr([this] {
         _fd = _filename.openCreateOrAppend(Pathname::CREATE_NORMAL);
         return _fd.valid();
     });

@@ -5,24 +5,24 @@
 #include <string_view>
 
 #include "util/LogAppender.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/LogRouting.h"
+#include "util/internal/NeverDestroyed.h"
 
 namespace {
 
 constexpr std::string_view SEPARATORS = " \t,";
 
-constinit Everlasting<LogChannel> root;
-
 // Every channel ever created. Loggers still write through them after the map below is emptied.
 LogChannel* newChannel() {
-    static Everlasting<std::list<LogChannel>> created;
-    return &created.value.emplace_back(root.value);
+    static NeverDestroyed<std::list<LogChannel>> created;
+    return &created.value.emplace_back(rootChannel());
 }
 
 // Channels by name, emptied at exit. The map itself is never destroyed: a logger that is created
 // even later looks its name up and finds the root channel.
 std::map<std::string, LogChannel*>& channels() {
-    static Everlasting<std::map<std::string, LogChannel*>> map;
+    static NeverDestroyed<std::map<std::string, LogChannel*>> map;
     static const struct Emptier {
         ~Emptier() { map.value.clear(); }
     } emptier;
@@ -31,26 +31,12 @@ std::map<std::string, LogChannel*>& channels() {
 
 }  // namespace
 
-LogChannel& rootChannel() {
-    return root.value;
-}
-
-bool setup_log_channel(const std::string& line) {
-    const std::size_t equals = line.find('=');
-    if (equals == std::string::npos) {
-        return false;
-    }
-    std::string name = line.substr(0, equals);
-    name.erase(name.find_last_not_of(" \t") + 1);  // npos + 1: nothing but blanks
-    return LogChannel::find(name, true)->setConfig(line.c_str() + equals + 1);
-}
-
 LogChannel* LogChannel::find(const std::string& name, bool create) {
     const auto found = channels().find(name);
     if (found != channels().end()) {
         return found->second;
     }
-    return create ? channels()[name] = newChannel() : &root.value;
+    return create ? channels()[name] = newChannel() : &rootChannel();
 }
 
 bool LogChannel::changeLevel(const std::string& word) {
@@ -110,7 +96,7 @@ bool LogChannel::write(const LogMsgMetadata& mdata, const std::string& msg,
                        const LogAppender* dont_touch) {
     bool written = false;
     const auto writeTo = [&](LogAppender& appender) {
-        if (&appender != dont_touch && !report_in_progress(&appender)) {
+        if (&appender != dont_touch && !ReportMark::covers(&appender)) {
             appender.write(mdata, msg);
             written = true;
         }

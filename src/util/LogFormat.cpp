@@ -6,12 +6,12 @@
 #include <string_view>
 
 #include "util/Assert.h"
-#include "util/LogAtoms.h"
-#include "util/LogInternal.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Logger.h"
 #include "util/Thread.h"
 #include "util/Timeval.h"
+#include "util/internal/LogAtoms.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 

@@ -7,9 +7,9 @@
 #include <string_view>
 
 #include "util/Assert.h"
-#include "util/LogAtoms.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Timeval.h"
+#include "util/internal/LogAtoms.h"
 
 namespace {
 

@@ -7,9 +7,10 @@
 #include <utility>
 
 #include "util/Assert.h"
-#include "util/LogInternal.h"
 #include "util/LogLevel.h"
 #include "util/Logger.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/LogRouting.h"
 
 namespace {
 

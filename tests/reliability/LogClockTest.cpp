@@ -16,7 +16,7 @@
 #include "support/TimeZone.h"
 #include "util/LogChannel.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 

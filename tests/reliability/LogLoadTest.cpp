@@ -11,7 +11,8 @@
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 

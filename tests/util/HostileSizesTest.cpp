@@ -17,7 +17,7 @@
 #include "support/InChild.h"
 #include "support/TempDir.h"
 #include "util/LogAppender.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 

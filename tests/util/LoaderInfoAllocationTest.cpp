@@ -16,7 +16,7 @@
 #include "support/ScriptedCalls.h"
 #include "support/TempDir.h"
 #include "util/LoaderInfo.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 
 namespace fs = std::filesystem;

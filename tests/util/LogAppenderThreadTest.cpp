@@ -20,7 +20,7 @@
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 
 namespace fs = std::filesystem;
 

@@ -11,7 +11,8 @@
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "util/LogAppender.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 
 namespace {

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "util/LogConfig.h"
+#include "util/internal/LogConfig.h"
 
 namespace {
 

@@ -19,7 +19,7 @@
 #include "support/TempDir.h"
 #include "util/LogAppender.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 #include "util/Timeval.h"
@@ -224,7 +224,7 @@ TEST_F(LogConfig, InitializingTwiceIsAnError) {
             Logger::initialize();
             (void)Logger::initialize(Pathname(_cfg), Pathname());
         },
-        "src/util/LogConfig.cpp:[0-9]+: failed assertion `!logger_initialized'");
+        "src/util/Logger.cpp:[0-9]+: failed assertion `!logger_initialized'");
 }
 
 TEST_F(LogConfig, KeysMayCarryThePrefixOnce) {

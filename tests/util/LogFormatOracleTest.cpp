@@ -15,7 +15,7 @@
 #include "support/LogLine.h"
 #include "support/SlowLayout.h"
 #include "support/TimeZone.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 
 // Processor time stands still, so that "%u" can be compared.

@@ -13,7 +13,7 @@
 
 #include "support/LogLine.h"
 #include "support/TimeZone.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Thread.h"
 

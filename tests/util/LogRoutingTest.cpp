@@ -17,7 +17,8 @@
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/LogRouting.h"
 #include "util/Logger.h"
 
 extern "C" {

@@ -10,7 +10,7 @@
 #include "support/RecordedWrites.h"
 #include "support/StderrCapture.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Timeval.h"
 

@@ -17,7 +17,7 @@
 #include "support/ScriptedCalls.h"
 #include "support/StderrCapture.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Timeval.h"
 
 extern "C" {

@@ -16,7 +16,7 @@
 
 #include "support/ScriptedPthread.h"
 #include "support/Workers.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Thread.h"
 

@@ -5,14 +5,11 @@
 #undef _GNU_SOURCE
 #define _POSIX_C_SOURCE 200809L  // NOLINT(bugprone-reserved-identifier): read by the system headers
 
-#include "util/ErrorText.h"
+#include "util/internal/ErrorText.h"
 
 #include <errno.h>
 #include <string.h>
 
 bool errorText(int errnum, char* buf, size_t size) noexcept {
-    const int callersErrno = errno;
-    const int failure = ::strerror_r(errnum, buf, size);
-    errno = callersErrno;
-    return failure == 0;
+    return ::strerror_r(errnum, buf, size) == 0;
 }

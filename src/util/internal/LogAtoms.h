@@ -1,5 +1,5 @@
-#ifndef QUELTA_UTIL_LOGATOMS_H_
-#define QUELTA_UTIL_LOGATOMS_H_
+#ifndef QUELTA_UTIL_INTERNAL_LOGATOMS_H_
+#define QUELTA_UTIL_INTERNAL_LOGATOMS_H_
 
 // The growth that the two kinds of atom array have in common. Internal to the layouts.
 // Not thread-safe; one thread at a time per object.
@@ -20,4 +20,4 @@ void growAtoms(Atom*& atoms, Atom*& end, std::uint32_t& capacity) {
     capacity = grown;
 }
 
-#endif  // QUELTA_UTIL_LOGATOMS_H_
+#endif  // QUELTA_UTIL_INTERNAL_LOGATOMS_H_

@@ -1,5 +1,5 @@
-#ifndef QUELTA_UTIL_ERRORTEXT_H_
-#define QUELTA_UTIL_ERRORTEXT_H_
+#ifndef QUELTA_UTIL_INTERNAL_ERRORTEXT_H_
+#define QUELTA_UTIL_INTERNAL_ERRORTEXT_H_
 
 // The text of a system error, by the strerror_r that reports numbers without a text.
 // Safe from any thread.
@@ -10,4 +10,4 @@
 // Returns: false, with the contents of `buf` undefined, when there is no text or no room for it.
 bool errorText(int errnum, char* buf, size_t size) noexcept;
 
-#endif  // QUELTA_UTIL_ERRORTEXT_H_
+#endif  // QUELTA_UTIL_INTERNAL_ERRORTEXT_H_

@@ -1,8 +1,8 @@
-#ifndef QUELTA_UTIL_LOGCONFIG_H_
-#define QUELTA_UTIL_LOGCONFIG_H_
+#ifndef QUELTA_UTIL_INTERNAL_LOGCONFIG_H_
+#define QUELTA_UTIL_INTERNAL_LOGCONFIG_H_
 
-// Internal header: how a logging configuration file is read. Logger::initialize(cfgFile, home) is
-// the only caller; the tests reach the parts from here, as that one runs once per process.
+// How a logging configuration file is read. Logger::initialize(cfgFile, home) is the only caller;
+// the tests call the parts declared here, because that function runs once per process.
 // Not thread-safe; one thread at a time per file.
 
 #include <cstdio>
@@ -25,6 +25,11 @@ bool read_line(std::string& result, std::FILE* ifile);
 // `lineno` counts them. The text behind the closing "-->" is appended to `result`.
 // Returns: false, with `result` as it was, when the file ends inside the comment.
 bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile);
+
+// Applies one channel setting, "name=value", and creates the channel if it does not exist. Blanks
+// after the name are dropped; the name may be empty.
+// Returns: false without "=", and if LogChannel::setConfig does not accept the whole value.
+bool setup_log_channel(const std::string& line);
 
 // Reads one configuration file. Appenders are made and filled while their lines are read; channels
 // are set up afterwards, because they name appenders and inherit from the root channel. Problems
@@ -66,4 +71,4 @@ private:
     std::vector<NumberedText> _errors;      // in the order in which they are reported
 };
 
-#endif  // QUELTA_UTIL_LOGCONFIG_H_
+#endif  // QUELTA_UTIL_INTERNAL_LOGCONFIG_H_

@@ -1,5 +1,5 @@
-#ifndef QUELTA_UTIL_ERRNOKEEPER_H_
-#define QUELTA_UTIL_ERRNOKEEPER_H_
+#ifndef QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_
+#define QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_
 
 // Puts errno back at the end of a scope to what it was at its beginning.
 // Not thread-safe; one thread at a time per object.
@@ -20,4 +20,4 @@ private:
     const int _saved = errno;
 };
 
-#endif  // QUELTA_UTIL_ERRNOKEEPER_H_
+#endif  // QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_

@@ -1,21 +1,17 @@
-#include "util/LogConfig.h"
+#include "util/internal/LogConfig.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <memory>
 #include <string_view>
 
 #include "util/Assert.h"
-#include "util/ErrnoKeeper.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
-#include "util/LogLevel.h"
-#include "util/Logger.h"
 #include "util/Pathname.h"
-#include "util/Timeval.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
@@ -79,10 +75,6 @@ bool skipComment(std::string& result, std::string text, unsigned& lineno, std::F
     result.append(text, end + COMMENT_END.size());
     return true;
 }
-
-struct FileCloser {
-    void operator()(std::FILE* file) const { std::fclose(file); }
-};
 
 }  // namespace
 
@@ -188,6 +180,16 @@ void ConfigReader::report(const Pathname& cfgFile) const {
     }
 }
 
+bool setup_log_channel(const std::string& line) {
+    const std::size_t equals = line.find('=');
+    if (equals == std::string::npos) {
+        return false;
+    }
+    std::string name = line.substr(0, equals);
+    name.erase(name.find_last_not_of(BLANKS) + 1);  // npos + 1: nothing but blanks
+    return LogChannel::find(name, true)->setConfig(line.c_str() + equals + 1);
+}
+
 bool read_line(std::string& result, std::FILE* ifile) {
     char buf[128];
     const std::string_view filled(buf, sizeof(buf));
@@ -212,33 +214,4 @@ bool read_line(std::string& result, std::FILE* ifile) {
 
 bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile) {
     return skipComment(result, cf, lineno, ifile);
-}
-
-bool Logger::initialize(const Pathname& cfgFile, const Pathname& queltaHome) {
-    QUELTA_ASSERT(!logger_initialized);
-    epoch_timeval();
-    std::unique_ptr<std::FILE, FileCloser> file;
-    const bool opened = uninterrupted([&] {
-        file.reset(cfgFile.fopen("r"));
-        return file != nullptr;
-    });
-    if (!opened) {
-        {
-            const ErrnoKeeper keeper;
-            initialize();
-        }
-        LogFormat::internal(nullptr, ERROR, "Couldn't open log file configuration \"%s\": %m",
-                            cfgFile.c_str());
-        return false;
-    }
-    ConfigReader reader(file.get(), queltaHome);
-    reader.readLines();
-    file.reset();
-    reader.setUpChannels();
-    initialize();
-    for (const auto& [name, appender] : appenders()) {
-        appender->finalSetup(name.c_str());
-    }
-    reader.report(cfgFile);
-    return reader.complete();
 }

@@ -1,14 +1,16 @@
-// The way of a message from the entry points of Logger to a channel, and the two ways around it:
-// standard error for what no channel can take, and the reports of the logging subsystem itself.
+#include "util/internal/LogRouting.h"
 
 #include <unistd.h>
 
 #include <string>
 
-#include "util/ErrnoKeeper.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/Logger.h"
+#include "util/internal/ErrnoKeeper.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/NeverDestroyed.h"
+
+constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
 
 void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept try {
     std::size_t length = 0;
@@ -65,8 +67,8 @@ void LogFormat::do_log(Logger* logger, LogLevel level, const char* fmt, va_list 
 }
 
 void LogFormat::internal(const LogAppender* failing, LogLevel level, const char* fmt, ...) {
-    static Everlasting<Logger> logger("Logger");
-    static constinit Everlasting<LogChannel> empty_channel;
+    static NeverDestroyed<Logger> logger("Logger");
+    static constinit NeverDestroyed<LogChannel> empty_channel;
 
     const ErrnoKeeper errnoKeeper;
     LogChannel& channel =
