@@ -1,9 +1,11 @@
 # quelta_test(NAME SOURCES file... [LIBS target...] [LABELS label...] [DEFINES macro...]
-#             [WRAP function...])
+#             [WRAP function...] [COUNT_ALLOCATIONS])
 #
 # One GoogleTest program per unit. Each case is discovered and runs in a process of its own, so
 # cases share no state and run in any order and in parallel. The test sees private members
-# (-fno-access-control); WRAP lets it replace system calls through the linker's --wrap.
+# (-fno-access-control). WRAP names the functions that go through the linker's --wrap to
+# tests/support/ScriptedLibc.h, or to a __wrap_ function of the test's own. COUNT_ALLOCATIONS adds
+# the operator new of tests/support/AllocationProbe.h.
 find_package(GTest REQUIRED)
 include(GoogleTest)
 
@@ -35,8 +37,15 @@ endforeach()
 quelta_test_flags(test_headers_quick FALSE)
 quelta_test_flags(test_headers_optimized TRUE)
 
+# Without quelta_sanitize: see the source.
+add_library(scripted_libc OBJECT ${PROJECT_SOURCE_DIR}/tests/support/ScriptedLibc.cpp)
+set_property(TARGET scripted_libc PROPERTY POSITION_INDEPENDENT_CODE ON)
+target_include_directories(scripted_libc PRIVATE ${PROJECT_SOURCE_DIR}/tests)
+target_compile_features(scripted_libc PRIVATE cxx_std_20)
+quelta_warnings(scripted_libc)
+
 function(quelta_test name)
-  cmake_parse_arguments(arg "" "TIMEOUT" "SOURCES;LIBS;LABELS;DEFINES;WRAP" ${ARGN})
+  cmake_parse_arguments(arg "COUNT_ALLOCATIONS" "TIMEOUT" "SOURCES;LIBS;LABELS;DEFINES;WRAP" ${ARGN})
   add_executable(${name} ${arg_SOURCES})
   target_include_directories(${name} PRIVATE
     ${PROJECT_SOURCE_DIR}/src ${PROJECT_SOURCE_DIR}/tests)
@@ -49,9 +58,14 @@ function(quelta_test name)
     target_precompile_headers(${name} REUSE_FROM test_headers_quick)
   endif()
   target_compile_definitions(${name} PRIVATE ${arg_DEFINES})
-  foreach(function ${arg_WRAP})
-    target_link_options(${name} PRIVATE -Wl,--wrap=${function})
-  endforeach()
+  if(arg_WRAP)
+    list(TRANSFORM arg_WRAP PREPEND -Wl,--wrap=)
+    target_link_options(${name} PRIVATE ${arg_WRAP})
+    target_sources(${name} PRIVATE $<TARGET_OBJECTS:scripted_libc>)
+  endif()
+  if(arg_COUNT_ALLOCATIONS)
+    target_sources(${name} PRIVATE ${PROJECT_SOURCE_DIR}/tests/support/AllocationProbe.cpp)
+  endif()
   if(NOT arg_LABELS)
     set(arg_LABELS unit)
   endif()

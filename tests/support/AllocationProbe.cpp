@@ -14,6 +14,7 @@ namespace {
 struct State {
     bool counting;
     std::size_t failing;
+    std::size_t largest;
     std::size_t count;
     long live;
 };
@@ -22,7 +23,7 @@ thread_local State state = {};
 
 [[maybe_unused]] void* allocate(std::size_t size) {
     if (state.counting) {
-        if (++state.count == state.failing) {
+        if (++state.count == state.failing || size > state.largest) {
             throw std::bad_alloc();
         }
         ++state.live;
@@ -92,10 +93,13 @@ bool AllocationProbe::available() {
 #endif
 
 AllocationProbe::AllocationProbe(std::size_t failing) {
-    state = {true, failing, 0, 0};
+    state = {true, failing, std::size_t(-1), 0, 0};
 }
 AllocationProbe::~AllocationProbe() {
     stop();
+}
+void AllocationProbe::refuseBeyond(std::size_t bytes) {
+    state.largest = bytes;
 }
 std::size_t AllocationProbe::count() const {
     return state.count;
