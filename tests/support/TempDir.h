@@ -1,14 +1,12 @@
 #ifndef QUELTA_TESTS_SUPPORT_TEMPDIR_H_
 #define QUELTA_TESTS_SUPPORT_TEMPDIR_H_
 
-// A fresh folder for one test case, removed with all that is in it at the end of the scope; and
-// whole files as strings.
+// A new directory that is removed at the end of the scope with everything in it; and whole files as
+// strings. A failure throws.
 //
 //     TempDir dir;
 //     writeFile(dir.file("a.cfg"), "x=1\n");
 // Not thread-safe; one thread at a time per object.
-
-#include <gtest/gtest.h>
 
 #include <cerrno>
 #include <cstdlib>
@@ -20,7 +18,7 @@
 
 class TempDir {
 public:
-    TempDir() : _path(testing::TempDir() + "quelta-XXXXXX") {
+    TempDir() : _path((std::filesystem::temp_directory_path() / "quelta-XXXXXX").string()) {
         if (::mkdtemp(_path.data()) == nullptr) {
             throw std::system_error(errno, std::generic_category(), _path);
         }
@@ -32,7 +30,7 @@ public:
     TempDir(const TempDir&) = delete;
     TempDir& operator=(const TempDir&) = delete;
 
-    // The folder, absolute, without a '/' at its end.
+    // The directory, absolute, without a '/' at its end.
     const std::string& path() const { return _path; }
     // The path of an entry in it, which need not exist.
     std::string file(const std::string& name) const { return _path + '/' + name; }
@@ -41,10 +39,12 @@ private:
     std::string _path;
 };
 
-// The bytes of a file; a failure of the test, and the empty string, when it cannot be read.
+// Returns: the bytes of a file.
 inline std::string readFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    EXPECT_TRUE(in) << "cannot read " << path;
+    if (!in) {
+        throw std::system_error(errno, std::generic_category(), path);
+    }
     return std::string(std::istreambuf_iterator<char>(in), {});
 }
 
@@ -53,7 +53,9 @@ inline void writeFile(const std::string& path, const std::string& contents) {
     std::ofstream out(path, std::ios::binary | std::ios::trunc);
     out << contents;
     out.close();
-    EXPECT_TRUE(out) << "cannot write " << path;
+    if (!out) {
+        throw std::system_error(errno, std::generic_category(), path);
+    }
 }
 
 #endif  // QUELTA_TESTS_SUPPORT_TEMPDIR_H_
