@@ -53,7 +53,7 @@ std::string localTime() {
 }
 
 // A logger whose lines, dated by the clock, go to a file.
-class LogClock : public testing::Test {
+class LogClockTest : public testing::Test {
 protected:
     LogClock() {
         setClock(START);
@@ -85,7 +85,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogClock, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
+TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     _log._maxSize = 2000;
     _log._maxBackupIndex = 10000;
@@ -104,7 +104,7 @@ TEST_F(LogClock, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
 
 // A clock that was set says nothing about the time since the last check: both directions count as
 // a long one.
-TEST_F(LogClock, AStepByHoursLeadsToACheckOfTheFile) {
+TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
     for (const long long step : {HOUR, -HOUR, 12 * HOUR, -12 * HOUR, 9000 * HOUR, -9000 * HOUR}) {
         line("before", START);
         const std::string moved = _file + ".moved";
@@ -121,7 +121,7 @@ TEST_F(LogClock, AStepByHoursLeadsToACheckOfTheFile) {
 }
 
 // The C library decides when it looks at TZ; a line is stamped by the zone that it has then.
-TEST_F(LogClock, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
+TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     const TimeZone utc("UTC0");
     std::string expected = line("in Greenwich", START);
     EXPECT_EQ("2023-11-14 22:13:20,000 in Greenwich\n", expected);
@@ -142,7 +142,7 @@ TEST_F(LogClock, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogClock, InstantsUpToTheLastOnesAreWhole) {
+TEST_F(LogClockTest, InstantsUpToTheLastOnesAreWhole) {
     const struct {
         const char* zone;
         long long seconds;

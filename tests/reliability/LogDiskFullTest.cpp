@@ -55,7 +55,7 @@ Logger& diskLogger(const std::string& file, const std::string& reports) {
 
 }  // namespace
 
-TEST(LogDiskFull, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
+TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -80,7 +80,7 @@ TEST(LogDiskFull, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFull, ALineCutShortCountsWithTheBytesThatWentOut) {
+TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -96,7 +96,7 @@ TEST(LogDiskFull, ALineCutShortCountsWithTheBytesThatWentOut) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFull, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
+TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         int err[2];  // a pipe, which the limit does not concern
@@ -122,7 +122,7 @@ TEST(LogDiskFull, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST(LogDiskFull, ASmallFileSystemFillsUpAndIsCleared) {
+TEST(LogDiskFullTest, ASmallFileSystemFillsUpAndIsCleared) {
     const TempDir dir;
     const ChildRun run = inChild([&dir] {
         if (::unshare(CLONE_NEWNS) != 0 ||

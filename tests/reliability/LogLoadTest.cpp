@@ -36,7 +36,7 @@ void onSixteenThreads(unsigned lines, Write write) {
 
 }  // namespace
 
-TEST(LogLoad, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
+TEST(LogLoadTest, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
     const unsigned lines = scaled("QUELTA_LOAD_LINES", 2000);
     const TempDir dir;
     const StderrCapture err;
@@ -47,7 +47,7 @@ TEST(LogLoad, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogLoad, TwoAppendersOnOneChannelEachGetEveryLine) {
+TEST(LogLoadTest, TwoAppendersOnOneChannelEachGetEveryLine) {
     const unsigned lines = scaled("QUELTA_LOAD_LINES", 2000);
     const TempDir dir;
     const StderrCapture err;

@@ -59,7 +59,7 @@ void blockSignals() {
 
 }  // namespace
 
-TEST(LogSignal, NoLineIsLostThroughRotation) {
+TEST(LogSignalTest, NoLineIsLostThroughRotation) {
     const unsigned LINES = 20000;
     const TempDir dir;
     const StderrCapture err;
@@ -75,7 +75,7 @@ TEST(LogSignal, NoLineIsLostThroughRotation) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
+TEST(LogSignalTest, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     const unsigned LINES = 40;
     const TempDir dir;
     const StderrCapture err;
@@ -112,7 +112,7 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
 }
 
 // Nobody reads yet, so the open itself waits, in the middle of the storm.
-TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
+TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     const TempDir dir;
     const StderrCapture err;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
@@ -141,7 +141,7 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
 }
 
 // The configuration comes through a pipe, late and in pieces, while signals interrupt the reader.
-TEST(LogSignal, AConfigurationThatComesSlowlyIsReadWhole) {
+TEST(LogSignalTest, AConfigurationThatComesSlowlyIsReadWhole) {
     const unsigned LINES = 200;
     const TempDir dir;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));

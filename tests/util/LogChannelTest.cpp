@@ -11,9 +11,9 @@
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "util/LogAppender.h"
+#include "util/Logger.h"
 #include "util/internal/LogConfig.h"
 #include "util/internal/LogGlobals.h"
-#include "util/Logger.h"
 
 namespace {
 

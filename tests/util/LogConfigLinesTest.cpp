@@ -10,6 +10,18 @@
 #include "util/internal/LogConfig.h"
 
 namespace {
+std::vector<int> pieceSizes;  // of the calls of fgets
+}
+
+extern "C" {
+char* __real_fgets(char* buf, int size, std::FILE* file);
+char* __wrap_fgets(char* buf, int size, std::FILE* file) {
+    pieceSizes.push_back(size);
+    return __real_fgets(buf, size, file);
+}
+}
+
+namespace {
 
 using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 using Lines = std::vector<std::string>;
@@ -64,7 +76,7 @@ Skipped skip(const char* behindOpening, const std::string& contents) {
 
 }  // namespace
 
-TEST(ReadLine, SplitsEveryShortTextAtItsLineFeeds) {
+TEST(ReadLineTest, SplitsEveryShortTextAtItsLineFeeds) {
     const char alphabet[] = {'a', '\0', '\n', '\r'};
     for (unsigned length = 0; length <= 6; ++length) {
         for (unsigned code = 0; code < 1U << (2 * length); ++code) {
@@ -77,7 +89,7 @@ TEST(ReadLine, SplitsEveryShortTextAtItsLineFeeds) {
     }
 }
 
-TEST(ReadLine, JoinsThePiecesOfLongLines) {
+TEST(ReadLineTest, JoinsThePiecesOfLongLines) {
     for (const std::size_t middle : {127U, 254U, 381U, 1270U, 10000U}) {
         for (std::size_t length = middle - 3; length <= middle + 3; ++length) {
             const std::string line(length, 'x');
@@ -91,7 +103,15 @@ TEST(ReadLine, JoinsThePiecesOfLongLines) {
     }
 }
 
-TEST(ReadLine, KeepsEveryByteButTheLineFeed) {
+TEST(ReadLineTest, ReadsPiecesOf127Characters) {
+    const File file = fileWith(std::string(300, 'x') + "\n");
+    pieceSizes.clear();
+    std::string line;
+    EXPECT_TRUE(read_line(line, file.get()));
+    EXPECT_EQ((std::vector<int>{128, 128, 128}), pieceSizes);  // each with room for a NUL
+}
+
+TEST(ReadLineTest, KeepsEveryByteExceptTheNewline) {
     std::string line;
     for (int byte = 0; byte < 256; ++byte) {
         if (byte != '\n') {
@@ -101,7 +121,7 @@ TEST(ReadLine, KeepsEveryByteButTheLineFeed) {
     EXPECT_EQ((Lines{line, line}), linesOf(line + "\n" + line));
 }
 
-TEST(ReadLine, AfterTheEndThereAreNoMoreLines) {
+TEST(ReadLineTest, AfterTheEndThereAreNoMoreLines) {
     const File file = fileWith("only");
     std::string line;
     EXPECT_TRUE(read_line(line, file.get()));
@@ -109,7 +129,7 @@ TEST(ReadLine, AfterTheEndThereAreNoMoreLines) {
     EXPECT_FALSE(read_line(line, file.get()));
 }
 
-TEST(HandleXmlComment, AppendsWhatFollowsTheEnd) {
+TEST(HandleXmlCommentTest, AppendsWhatFollowsTheEnd) {
     const struct {
         const char* behindOpening;
         const char* contents;
@@ -136,7 +156,7 @@ TEST(HandleXmlComment, AppendsWhatFollowsTheEnd) {
     }
 }
 
-TEST(HandleXmlComment, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
+TEST(HandleXmlCommentTest, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
     for (const char* const contents : {"", "one\ntwo\n", "->", "--\n>"}) {
         const Skipped skipped = skip(" open", contents);
         EXPECT_FALSE(skipped.closed) << contents;
@@ -145,7 +165,7 @@ TEST(HandleXmlComment, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
     }
 }
 
-TEST(HandleXmlComment, NulBytesDoNotHideTheEnd) {
+TEST(HandleXmlCommentTest, NulBytesDoNotHideTheEnd) {
     using namespace std::string_literals;
     const Skipped skipped = skip("", "a\0b\0-->x\0y\nnext\n"s);
     EXPECT_TRUE(skipped.closed);

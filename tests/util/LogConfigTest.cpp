@@ -19,17 +19,17 @@
 #include "support/TempDir.h"
 #include "util/LogAppender.h"
 #include "util/LogFormat.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 #include "util/Timeval.h"
+#include "util/internal/LogGlobals.h"
 
 namespace fs = std::filesystem;
 using namespace std::string_literals;
 
 namespace {
 
-class LogConfig : public testing::Test {
+class LogConfigTest : public testing::Test {
 protected:
     // Reads a configuration in a child and then runs `body` there, with initialize's result.
     template <typename Body>
@@ -83,7 +83,7 @@ std::vector<LogAppender*> appendersNamed(const std::vector<std::string>& names) 
 
 }  // namespace
 
-TEST_F(LogConfig, ExampleRunsEndToEnd) {
+TEST_F(LogConfigTest, ExampleRunsEndToEnd) {
     fs::create_directories(_dir.file("var/log"));
     const char* const config =
         "# logging for the command-line tools\n"
@@ -119,7 +119,7 @@ TEST_F(LogConfig, ExampleRunsEndToEnd) {
                                       time + "FATAL Rete - the end\n"));
 }
 
-TEST_F(LogConfig, AnEmptyFileLeavesTheDefaults) {
+TEST_F(LogConfigTest, AnEmptyFileLeavesTheDefaults) {
     for (const char* const config : {"", "\n\n", "# nothing\n \t \n", "<!-- a -->\n"}) {
         const ChildRun run = configured(config, [](bool complete) {
             EXPECT_TRUE(complete);
@@ -134,7 +134,7 @@ TEST_F(LogConfig, AnEmptyFileLeavesTheDefaults) {
     }
 }
 
-TEST_F(LogConfig, AMissingFileIsReportedAndLeavesLoggingUsable) {
+TEST_F(LogConfigTest, AMissingFileIsReportedAndLeavesLoggingUsable) {
     const struct {
         std::string file;
         const char* error;
@@ -161,7 +161,16 @@ TEST_F(LogConfig, AMissingFileIsReportedAndLeavesLoggingUsable) {
     }
 }
 
-TEST_F(LogConfig, AMissingFileAndAnOpenCommentAreErrorsAndABadLineIsAWarning) {
+TEST_F(LogConfigTest, AMissingFileIsReportedByTheChannelNamedLogger) {
+    const ChildRun run = inChild([&] {
+        LogChannel::find("Logger", true)->minlevel = CRIT;
+        EXPECT_FALSE(Logger::initialize(Pathname(_cfg), Pathname()));
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+}
+
+TEST_F(LogConfigTest, AMissingFileAndAnOpenCommentAreErrorsAndABadLineIsAWarning) {
     const ChildRun missing = inChild([&] {
         const RootLayout layout("%p %c %m%n");
         EXPECT_FALSE(Logger::initialize(Pathname(_cfg), Pathname()));
@@ -180,7 +189,7 @@ TEST_F(LogConfig, AMissingFileAndAnOpenCommentAreErrorsAndABadLineIsAWarning) {
     EXPECT_EQ(0, missing.status | open.status);
 }
 
-TEST_F(LogConfig, APipeIsReadAsItComes) {
+TEST_F(LogConfigTest, APipeIsReadAsItComes) {
     ASSERT_EQ(0, ::mkfifo(_cfg.c_str(), 0600));
     const pid_t writer = ::fork();
     if (writer == 0) {
@@ -200,7 +209,7 @@ TEST_F(LogConfig, APipeIsReadAsItComes) {
     EXPECT_EQ(parseError(2, "bad"), run.err);
 }
 
-TEST_F(LogConfig, TheEpochIsFixedBeforeTheFileIsRead) {
+TEST_F(LogConfigTest, TheEpochIsFixedBeforeTheFileIsRead) {
     ASSERT_EQ(0, ::mkfifo(_cfg.c_str(), 0600));
     const ChildRun run = inChild([&] {
         Timeval opened;
@@ -217,7 +226,7 @@ TEST_F(LogConfig, TheEpochIsFixedBeforeTheFileIsRead) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST_F(LogConfig, InitializingTwiceIsAnError) {
+TEST_F(LogConfigTest, InitializingTwiceIsAnError) {
     writeFile(_cfg, "");
     EXPECT_DEATH(
         {
@@ -227,7 +236,7 @@ TEST_F(LogConfig, InitializingTwiceIsAnError) {
         "src/util/Logger.cpp:[0-9]+: failed assertion `!logger_initialized'");
 }
 
-TEST_F(LogConfig, KeysMayCarryThePrefixOnce) {
+TEST_F(LogConfigTest, KeysMayCarryThePrefixOnce) {
     const ChildRun run = configured(
         "  log4cpp.rootCategory = DEBUG\n"
         "log4cpp.category.X=ERROR\n"
@@ -253,7 +262,7 @@ TEST_F(LogConfig, KeysMayCarryThePrefixOnce) {
               run.err);
 }
 
-TEST_F(LogConfig, EveryBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
+TEST_F(LogConfigTest, EveryBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
     const std::vector<std::string> bad = {
         "rootCategory",
         "rootCategory WARN",
@@ -321,7 +330,7 @@ TEST_F(LogConfig, EveryBadLineIsReportedWithItsNumberAndTheRestTakesEffect) {
     EXPECT_EQ(expected, run.err);
 }
 
-TEST_F(LogConfig, AnAppenderIsMadeByEachLineThatNamesOne) {
+TEST_F(LogConfigTest, AnAppenderIsMadeByEachLineThatNamesOne) {
     const ChildRun run = configured(
         "appender.A=FileAppender\n"
         "appender.B = \n"
@@ -337,7 +346,7 @@ TEST_F(LogConfig, AnAppenderIsMadeByEachLineThatNamesOne) {
     EXPECT_THAT(run.err, testing::HasSubstr("Appender \"E\" has no filename, assuming stderr\n"));
 }
 
-TEST_F(LogConfig, BlanksAroundNamesAndValuesAreDropped) {
+TEST_F(LogConfigTest, BlanksAroundNamesAndValuesAreDropped) {
     const ChildRun run = configured(
         " \trootCategory \t= \tWARN , A \t\n"
         "category. X = DEBUG\n"
@@ -357,7 +366,7 @@ TEST_F(LogConfig, BlanksAroundNamesAndValuesAreDropped) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, TheLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
+TEST_F(LogConfigTest, TheLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
     const ChildRun run = configured(
         "rootCategory=BOGUS\n"
         "rootCategory=ERROR,nobody\n"
@@ -372,7 +381,7 @@ TEST_F(LogConfig, TheLastRootCategoryCountsAndOnlyItsWordsAreChecked) {
     EXPECT_EQ(parseErrors({{3, "rootCategory"}, {2, "ERROR,nobody"}}), run.err);
 }
 
-TEST_F(LogConfig, ErrorsAreReportedLinesFirstThenRootThenCategories) {
+TEST_F(LogConfigTest, ErrorsAreReportedLinesFirstThenRootThenCategories) {
     EXPECT_EQ(parseErrors({{2, "first"},
                            {5, "second"},
                            {3, "WARN nobody"},
@@ -389,7 +398,7 @@ TEST_F(LogConfig, ErrorsAreReportedLinesFirstThenRootThenCategories) {
                         "category.\n"));
 }
 
-TEST_F(LogConfig, SettingsWithoutWordsAndEmptyValuesAreNoErrors) {
+TEST_F(LogConfigTest, SettingsWithoutWordsAndEmptyValuesAreNoErrors) {
     const ChildRun run = configured(
         "rootCategory=\n"
         "category.X = \n"
@@ -407,7 +416,7 @@ TEST_F(LogConfig, SettingsWithoutWordsAndEmptyValuesAreNoErrors) {
     EXPECT_EQ("Appender \"A\" has no filename, assuming stderr\n", run.err);
 }
 
-TEST_F(LogConfig, AnUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppenders) {
+TEST_F(LogConfigTest, AnUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppenders) {
     const ChildRun run = configured("rootCategory=WARN,A\n" + fileLine("A") + "category.X=INFO,B\n",
                                     [&](bool complete) {
                                         EXPECT_TRUE(complete);
@@ -420,7 +429,7 @@ TEST_F(LogConfig, AnUndeclaredAppenderInACategoryLeavesTheLevelAndTheRootsAppend
     EXPECT_EQ(parseError(3, "X=INFO,B"), readFile(logFile("A")));
 }
 
-TEST_F(LogConfig, TheOrderOfTheLinesDoesNotMatter) {
+TEST_F(LogConfigTest, TheOrderOfTheLinesDoesNotMatter) {
     std::vector<std::string> lines = {"rootCategory=WARN,A,B\n",
                                       "category.X=DEBUG\n",
                                       "category.Y=ERROR,B\n",
@@ -461,7 +470,7 @@ TEST_F(LogConfig, TheOrderOfTheLinesDoesNotMatter) {
     }
 }
 
-TEST_F(LogConfig, AttributesTakeEffectInTheOrderOfTheFile) {
+TEST_F(LogConfigTest, AttributesTakeEffectInTheOrderOfTheFile) {
     const ChildRun run = configured("appender.A.fileName=" + _dir.file("one") + "\n" +
                                         "appender.A.fileName=.two\n"
                                         "appender.A.layout=BasicLayout\n"
@@ -478,7 +487,7 @@ TEST_F(LogConfig, AttributesTakeEffectInTheOrderOfTheFile) {
     EXPECT_EQ("", readFile(_dir.file("one.two")));
 }
 
-TEST_F(LogConfig, SetupsAreReportedInNameOrderBeforeBadLines) {
+TEST_F(LogConfigTest, SetupsAreReportedInNameOrderBeforeBadLines) {
     EXPECT_EQ(
         "Appender \"A\" has no filename, assuming stderr\n"
         "Error opening \"" +
@@ -492,7 +501,7 @@ TEST_F(LogConfig, SetupsAreReportedInNameOrderBeforeBadLines) {
                   "appender.A=x\n"));
 }
 
-TEST_F(LogConfig, TheRootAppenderTakesAttributesButNoSetup) {
+TEST_F(LogConfigTest, TheRootAppenderTakesAttributesButNoSetup) {
     const ChildRun run = configured(
         "appender.rootAppender=x\n"
         "appender.rootAppender.layout=SimpleLayout\n"
@@ -508,7 +517,7 @@ TEST_F(LogConfig, TheRootAppenderTakesAttributesButNoSetup) {
     EXPECT_EQ("WARN    : " + parseError(5, "bad") + "DEBUG   : text\n", run.err);
 }
 
-TEST_F(LogConfig, AppendersWithoutALayoutTakeTheRootAppenders) {
+TEST_F(LogConfigTest, AppendersWithoutALayoutTakeTheRootAppenders) {
     const ChildRun run = configured(
         "rootCategory=DEBUG,A\n" + fileLine("A") + "appender.rootAppender.layout=SimpleLayout\n",
         [&](bool) { Logger("any").info("text"); });
@@ -516,7 +525,7 @@ TEST_F(LogConfig, AppendersWithoutALayoutTakeTheRootAppenders) {
     EXPECT_EQ("INFO    : text\n", readFile(logFile("A")));
 }
 
-TEST_F(LogConfig, ReportsReachTheChannelOfThatName) {
+TEST_F(LogConfigTest, ReportsReachTheChannelOfThatName) {
     const ChildRun run = configured("rootCategory=WARN,A\n" + fileLine("A") + fileLine("L") +
                                         "category.Logger=WARN,L\n"
                                         "appender.L.layout.ConversionPattern=%p %c %m%n\n"
@@ -528,7 +537,7 @@ TEST_F(LogConfig, ReportsReachTheChannelOfThatName) {
     EXPECT_EQ("WARN Logger " + parseError(6, "bad"), readFile(logFile("L")));
 }
 
-TEST_F(LogConfig, ReportsBelowTheLevelOfTheirChannelAreDropped) {
+TEST_F(LogConfigTest, ReportsBelowTheLevelOfTheirChannelAreDropped) {
     const ChildRun run = configured(
         "category.Logger=ERROR\n"
         "bad\n"
@@ -538,7 +547,7 @@ TEST_F(LogConfig, ReportsBelowTheLevelOfTheirChannelAreDropped) {
     EXPECT_EQ(_cfg + ":3: Unterminated XML comment started\n", run.err);
 }
 
-TEST_F(LogConfig, ABadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
+TEST_F(LogConfigTest, ABadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
     const ChildRun run = configured(
         "rootCategory=WARN,A,B\n"
         "appender.A.fileName=" +
@@ -553,7 +562,7 @@ TEST_F(LogConfig, ABadPathIsReportedThroughAppendersThatAreNotSetUpYet) {
               readFile(logFile("B")));
 }
 
-TEST_F(LogConfig, ABadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardError) {
+TEST_F(LogConfigTest, ABadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardError) {
     const std::string report =
         "Error opening \"" + _dir.file("missing/a.log") + "\": No such file or directory\n";
     const ChildRun run = configured(
@@ -566,7 +575,7 @@ TEST_F(LogConfig, ABadPathIsReportedThroughAnAppenderThatIsYetToBecomeStandardEr
     EXPECT_EQ("ERROR   : " + report + "ERROR   : " + report, run.err);
 }
 
-TEST_F(LogConfig, AnAppenderWhoseSettingIsReportedTakesTheReportsOfOthers) {
+TEST_F(LogConfigTest, AnAppenderWhoseSettingIsReportedTakesTheReportsOfOthers) {
     const std::string missing = _dir.file("missing/b.log");
     const ChildRun run =
         configured("rootCategory=WARN,A,B\n" + fileLine("A") +
@@ -579,7 +588,7 @@ TEST_F(LogConfig, AnAppenderWhoseSettingIsReportedTakesTheReportsOfOthers) {
     EXPECT_EQ(report + report, readFile(logFile("A")));
 }
 
-TEST_F(LogConfig, LoggersMadeBeforeAreBoundToTheChannels) {
+TEST_F(LogConfigTest, LoggersMadeBeforeAreBoundToTheChannels) {
     writeFile(_cfg, "rootCategory=WARN\ncategory.X=DEBUG\n");
     const ChildRun run = inChild([&] {
         Logger x("X");
@@ -594,7 +603,7 @@ TEST_F(LogConfig, LoggersMadeBeforeAreBoundToTheChannels) {
     EXPECT_EQ("x\n", run.err);
 }
 
-TEST_F(LogConfig, CommentsAreRemovedAndLinesKeepTheirNumbers) {
+TEST_F(LogConfigTest, CommentsAreRemovedAndLinesKeepTheirNumbers) {
     const struct {
         const char* config;
         std::vector<std::pair<unsigned, std::string>> errors;
@@ -636,7 +645,7 @@ TEST_F(LogConfig, CommentsAreRemovedAndLinesKeepTheirNumbers) {
     }
 }
 
-TEST_F(LogConfig, ACommentInAValueIsCutOutOfIt) {
+TEST_F(LogConfigTest, ACommentInAValueIsCutOutOfIt) {
     const ChildRun run = configured(
         "appender.A.fileName=" + _dir.file("a") + "<!-- not\nany\nmore -->.log # note\nbad\n",
         [&](bool) { EXPECT_EQ(logFile("a"), LogAppender::find("A", false)->_filename); });
@@ -644,7 +653,7 @@ TEST_F(LogConfig, ACommentInAValueIsCutOutOfIt) {
     EXPECT_EQ(parseError(4, "bad"), run.err);
 }
 
-TEST_F(LogConfig, AnOpenCommentIsReportedWithTheLineWhereItBegan) {
+TEST_F(LogConfigTest, AnOpenCommentIsReportedWithTheLineWhereItBegan) {
     const struct {
         const char* config;
         unsigned lineno;
@@ -667,7 +676,7 @@ TEST_F(LogConfig, AnOpenCommentIsReportedWithTheLineWhereItBegan) {
     }
 }
 
-TEST_F(LogConfig, TheLastLineNeedsNoLineFeed) {
+TEST_F(LogConfigTest, TheLastLineNeedsNoLineFeed) {
     EXPECT_EQ(parseError(2, "bad"), reportsOf("\nbad"));
     const ChildRun run = configured("rootCategory=ALERT", [](bool complete) {
         EXPECT_TRUE(complete);
@@ -676,7 +685,7 @@ TEST_F(LogConfig, TheLastLineNeedsNoLineFeed) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST_F(LogConfig, LinesMayBeLong) {
+TEST_F(LogConfigTest, LinesMayBeLong) {
     const std::string longText(10000, 'x');
     const std::string blanks(10000, ' ');
     EXPECT_EQ(parseErrors({{1, longText}, {3, longText}, {4, "last"}}),
@@ -689,7 +698,7 @@ TEST_F(LogConfig, LinesMayBeLong) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, ACarriageReturnIsNoBlank) {
+TEST_F(LogConfigTest, ACarriageReturnIsNoBlank) {
     const ChildRun run = configured(
         "rootCategory=WARN\r\n"
         "\r\n"
@@ -709,7 +718,7 @@ TEST_F(LogConfig, ACarriageReturnIsNoBlank) {
               run.err);
 }
 
-TEST_F(LogConfig, NulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
+TEST_F(LogConfigTest, NulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
     const ChildRun run = configured(
         "category.X\0Y=DEBUG\n"
         "# \0 -->\n"
@@ -725,7 +734,7 @@ TEST_F(LogConfig, NulBytesAreOrdinaryAndDoNotHideTheRestOfTheFile) {
     EXPECT_EQ("", run.err);
 }
 
-TEST_F(LogConfig, BytesBeyondAsciiAreOrdinary) {
+TEST_F(LogConfigTest, BytesBeyondAsciiAreOrdinary) {
     const ChildRun run = configured(
         "category.\xff\xfe\x80=DEBUG\n"
         "\xc3\n",
@@ -734,7 +743,7 @@ TEST_F(LogConfig, BytesBeyondAsciiAreOrdinary) {
     EXPECT_EQ(parseError(2, "\xc3"), run.err);
 }
 
-TEST_F(LogConfig, ValuesMayHoldEqualsSignsAndPoints) {
+TEST_F(LogConfigTest, ValuesMayHoldEqualsSignsAndPoints) {
     const ChildRun run = configured(fileLine("A") +
                                         "appender.A.layout.ConversionPattern=a=b.c = %m\n"
                                         "category.a.b.c=DEBUG\n"

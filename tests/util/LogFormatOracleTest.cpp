@@ -15,8 +15,8 @@
 #include "support/LogLine.h"
 #include "support/SlowLayout.h"
 #include "support/TimeZone.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
+#include "util/internal/LogGlobals.h"
 
 // Processor time stands still, so that "%u" can be compared.
 extern "C" std::clock_t __wrap_clock() {
@@ -175,7 +175,7 @@ void compareRandom(unsigned seed, int patterns, std::string (*draw)(Random&)) {
 
 }  // namespace
 
-TEST(LogFormatOracle, EveryShortPatternOfASmallAlphabet) {
+TEST(LogFormatOracleTest, EveryShortPatternOfASmallAlphabet) {
     const TimeZone utc("UTC0");
     epoch_timeval().set(EPOCH, 0);
     const Message& message = messages()[0];
@@ -188,15 +188,15 @@ TEST(LogFormatOracle, EveryShortPatternOfASmallAlphabet) {
     EXPECT_EQ(66430u, patterns);
 }
 
-TEST(LogFormatOracle, RandomPatterns) {
+TEST(LogFormatOracleTest, RandomPatterns) {
     compareRandom(20010203, 20000, randomPattern);
 }
 
-TEST(LogFormatOracle, RandomNoise) {
+TEST(LogFormatOracleTest, RandomNoise) {
     compareRandom(20010204, 20000, randomNoise);
 }
 
-TEST(LogFormatOracle, ThePatternsReachEveryConversion) {
+TEST(LogFormatOracleTest, ThePatternsReachEveryConversion) {
     Random random(20010203);
     std::string kinds;
     for (int i = 0; i < 1000; ++i) {

@@ -13,28 +13,13 @@
 #include "support/FileAppender.h"
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
-#include "support/ScriptedCalls.h"
+#include "support/ScriptedLibc.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogFormat.h"
+#include "util/Logger.h"
 #include "util/internal/LogGlobals.h"
 #include "util/internal/LogRouting.h"
-#include "util/Logger.h"
-
-extern "C" {
-ssize_t __real_write(int fd, const void* buf, std::size_t size);
-ssize_t __wrap_write(int fd, const void* buf, std::size_t size) {
-    return scriptedCall("write", size,
-                        [&](std::size_t limit) { return __real_write(fd, buf, limit); });
-}
-int __real_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
-    return scriptedCall("vsnprintf", [&] { return __real_vsnprintf(buf, size, fmt, ap); });
-}
-}
 
 namespace {
 
@@ -59,7 +44,7 @@ LogChannel& channelNamedLogger(LogLevel minlevel, const std::vector<LogAppender*
     return channel;
 }
 
-TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
+TEST(LogFallbackTest, WritesLevelAndMessageWithOneCall) {
     const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the line feed fill 1024 bytes
     const struct {
         int level;
@@ -85,7 +70,7 @@ TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
     }
 }
 
-TEST(FallbackTest, IgnoresTheResultOfTheCall) {
+TEST(LogFallbackTest, IgnoresTheResultOfTheCall) {
     ScriptedCalls writes("write");
     writes.fail(EIO).limit(3).fail(EINTR);
     const StderrCapture err;
@@ -96,7 +81,7 @@ TEST(FallbackTest, IgnoresTheResultOfTheCall) {
     EXPECT_EQ(3u, writes.calls());
 }
 
-TEST(FallbackTest, KeepsErrnoForTheCallerOfALogger) {
+TEST(LogFallbackTest, KeepsErrnoForTheCallerOfALogger) {
     const Logger logger("name");
     Logger copy(logger);  // goes to the fallback
     ScriptedCalls writes("write");
@@ -108,7 +93,7 @@ TEST(FallbackTest, KeepsErrnoForTheCallerOfALogger) {
     EXPECT_EQ(2u, writes.calls());
 }
 
-TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted) {
+TEST(LogFallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted) {
     const Logger logger("name");
     Logger copy(logger);
     ScriptedCalls formats("vsnprintf");
@@ -118,14 +103,14 @@ TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted)
     EXPECT_EQ("DEBUG - %s %d\n", err.text());
 }
 
-TEST(InternalReportTest, ReachesTheRootAppenderBeforeInitialization) {
+TEST(LogReportTest, ReachesTheRootAppenderBeforeInitialization) {
     expectInChild("report 1\n", [] {
         LogFormat::internal(nullptr, WARN, "report %d", 1);
         LogFormat::internal(nullptr, DEBUG, "suppressed %d", 1);
     });
 }
 
-TEST(InternalReportTest, IgnoresTheRootChannelBeforeInitialization) {
+TEST(LogReportTest, IgnoresTheRootChannelBeforeInitialization) {
     expectInChild("report\n", [] {
         rootChannel().minlevel = EMERG;
         rootChannel()._appenders = {appender("A1")};
@@ -135,12 +120,12 @@ TEST(InternalReportTest, IgnoresTheRootChannelBeforeInitialization) {
     });
 }
 
-TEST(InternalReportTest, FallsBackWhenTheRootAppenderItselfFails) {
+TEST(LogReportTest, FallsBackWhenTheRootAppenderItselfFails) {
     expectInChild("CRIT - report\n",
                   [] { LogFormat::internal(&rootAppender(), CRIT, "%s", "report"); });
 }
 
-TEST(InternalReportTest, WaitsForItsChannelLikeAnyLogger) {
+TEST(LogReportTest, WaitsForItsChannelLikeAnyLogger) {
     expectInChild("", [] {
         const RecordedWrites writes;
         LogFormat::internal(nullptr, WARN, "before");
@@ -153,7 +138,7 @@ TEST(InternalReportTest, WaitsForItsChannelLikeAnyLogger) {
     });
 }
 
-TEST(InternalReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
+TEST(LogReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
     expectInChild("", [] {
         channelNamedLogger(DEBUG, {appender("A1")});
         const RecordedWrites writes;
@@ -163,7 +148,7 @@ TEST(InternalReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
     });
 }
 
-TEST(InternalReportTest, SparesTheAppenderThatFailed) {
+TEST(LogReportTest, SparesTheAppenderThatFailed) {
     expectInChild("WARN - nobody left\n", [] {
         LogChannel& channel = channelNamedLogger(INFO, {appender("A1"), appender("A2")});
         const RecordedWrites writes;
@@ -175,7 +160,7 @@ TEST(InternalReportTest, SparesTheAppenderThatFailed) {
     });
 }
 
-TEST(InternalReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
+TEST(LogReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
     expectInChild("", [] {
         const RecordedWrites writes([](const RecordedWrites::Message&) { errno = EIO; });
         errno = ENOSPC;
@@ -189,7 +174,7 @@ TEST(InternalReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
     });
 }
 
-TEST(InternalReportTest, DoesNotFormatWhatItSuppresses) {
+TEST(LogReportTest, DoesNotFormatWhatItSuppresses) {
     expectInChild("", [] {
         const ScriptedCalls formats("vsnprintf");
         LogFormat::internal(nullptr, DEBUG, "%d", 1);
@@ -197,7 +182,7 @@ TEST(InternalReportTest, DoesNotFormatWhatItSuppresses) {
     });
 }
 
-TEST(InternalReportTest, FallsBackWhenAnAppenderThrows) {
+TEST(LogReportTest, FallsBackWhenAnAppenderThrows) {
     expectInChild("ERROR - report 1\n", [] {
         const RecordedWrites writes(
             [](const RecordedWrites::Message&) { throw std::runtime_error("thrown"); });
@@ -207,7 +192,7 @@ TEST(InternalReportTest, FallsBackWhenAnAppenderThrows) {
     });
 }
 
-TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
+TEST(LogReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
     expectInChild("ERROR - report %d\n", [] {
         ScriptedCalls formats("vsnprintf");
         formats.give(-1, 20);
@@ -216,7 +201,7 @@ TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
 }
 
 // The first report goes to the second appender, which fails in turn, and to the third.
-TEST(InternalReportTest, EachOfTwoFailingAppendersIsReportedToTheRest) {
+TEST(LogReportTest, EachOfTwoFailingAppendersIsReportedToTheRest) {
     for (const bool third : {true, false}) {
         const TempDir dir;
         const std::string missing = dir.file("missing/b.log");
@@ -239,6 +224,29 @@ TEST(InternalReportTest, EachOfTwoFailingAppendersIsReportedToTheRest) {
         EXPECT_EQ(
             third ? secondReport + "Error writing to \"/dev/full\": No space left on device\n" : "",
             readFile(dir.file("good.log")));
+    }
+}
+
+TEST(LogReportTest, WarningsOfAnAppendersSetupGoToTheOthersOnly) {
+    const struct {
+        const char* file;
+        const char* limit;
+        const char* backups;
+        std::size_t warnings;
+    } rows[] = {{"", "0", "0", 1}, {"", "0", "1", 2},          {"", "5", "0", 2},
+                {"", "5", "1", 3}, {"/dev/null", "0", "1", 1}, {"/no/such/file", "0", "0", 1}};
+    for (const auto& row : rows) {
+        const ChildRun run = inChild([&] {
+            LogAppender& a1 = *appender("A1");
+            ASSERT_TRUE(a1.setAttribute("fileName", row.file, Pathname()));
+            ASSERT_TRUE(a1.setAttribute("maxFileSize", row.limit, Pathname()));
+            ASSERT_TRUE(a1.setAttribute("maxBackupIndex", row.backups, Pathname()));
+            channelNamedLogger(INFO, {&a1, appender("A2")});
+            const RecordedWrites writes;
+            a1.finalSetup("A1");
+            EXPECT_EQ(Written(row.warnings, appender("A2")), writes.appenders());
+        });
+        EXPECT_EQ(0, run.status) << row.file << ' ' << row.limit << ' ' << row.backups;
     }
 }
 

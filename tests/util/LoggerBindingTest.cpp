@@ -1,6 +1,8 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <filesystem>
+#include <functional>
 #include <memory>
 #include <string>
 #include <utility>
@@ -9,14 +11,16 @@
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "support/StderrCapture.h"
+#include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Timeval.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
-std::vector<std::string> lookups;  // the names; "+" marks a lookup with creation
-}
+std::vector<std::string> lookups;    // the names; "+" marks a lookup with creation
+std::function<void()> duringLookup;  // called by each
+}  // namespace
 
 // LogChannel::find
 // clang-format off
@@ -27,6 +31,9 @@ extern "C" {
 LogChannel* CHANNEL_FIND(__real)(const std::string& name, bool create);
 LogChannel* CHANNEL_FIND(__wrap)(const std::string& name, bool create) {
     lookups.push_back(name + (create ? "+" : ""));
+    if (duringLookup) {
+        duringLookup();
+    }
     return CHANNEL_FIND(__real)(name, create);
 }
 }
@@ -47,8 +54,9 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
         const Logger newest("newest");
         LogChannel* const channel = LogChannel::find("middle", true);
         lookups.clear();
+        EXPECT_FALSE(logger_initialized);
+        duringLookup = [] { EXPECT_TRUE(logger_initialized); };
         Logger::initialize();
-        EXPECT_TRUE(logger_initialized);
         ASSERT_LE(3u, lookups.size());
         EXPECT_EQ("newest", lookups[0]);
         EXPECT_EQ("middle", lookups[1]);
@@ -59,6 +67,25 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
         EXPECT_EQ(channel, middle._channel);
         EXPECT_EQ(&rootChannel(), newest._channel);
     });
+}
+
+TEST(LoggerBindingTest, TheConfigurationFileIsClosedBeforeChannelsAreSetUp) {
+    const TempDir dir;
+    const std::string cfg = dir.file("log.cfg");
+    writeFile(cfg, "category.X=DEBUG\n");
+    const ChildRun run = inChild([&] {
+        lookups.clear();
+        duringLookup = [&] {
+            for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+                std::error_code gone;  // the iterator's own descriptor
+                EXPECT_NE(cfg, std::filesystem::read_symlink(entry.path(), gone));
+            }
+        };
+        EXPECT_TRUE(Logger::initialize(Pathname(cfg), Pathname()));
+        ASSERT_FALSE(lookups.empty());
+        EXPECT_EQ("X+", lookups[0]);
+    });
+    EXPECT_EQ(0, run.status);
 }
 
 TEST(LoggerBindingTest, LaterLoggersAreBoundAtOnce) {

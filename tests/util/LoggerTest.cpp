@@ -14,25 +14,11 @@
 
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
-#include "support/ScriptedCalls.h"
+#include "support/ScriptedLibc.h"
 #include "support/StderrCapture.h"
 #include "util/LogFormat.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Timeval.h"
-
-extern "C" {
-int __real_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
-    return scriptedCall("vsnprintf", [&] { return __real_vsnprintf(buf, size, fmt, ap); });
-}
-int __real_gettimeofday(struct timeval* now, void* zone);
-int __wrap_gettimeofday(struct timeval* now, void* zone) {
-    return scriptedCall("gettimeofday", [&] { return __real_gettimeofday(now, zone); });
-}
-}
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
