@@ -11,6 +11,7 @@
 
 #include "support/FileAppender.h"
 #include "support/NumberedLines.h"
+#include "support/ScriptedLibc.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "support/TimeZone.h"
@@ -25,16 +26,6 @@ constexpr long long START = 1700000000;
 
 // What the clock of this process shows.
 struct timeval clockShows {};
-
-}  // namespace
-
-extern "C" int __wrap_gettimeofday(struct timeval* now, void* zone);
-extern "C" int __wrap_gettimeofday(struct timeval* now, void* /*zone*/) {
-    *now = clockShows;
-    return 0;
-}
-
-namespace {
 
 void setClock(long long seconds, long microseconds = 0) {
     clockShows.tv_sec = seconds;
@@ -55,7 +46,12 @@ std::string localTime() {
 // A logger whose lines, dated by the clock, go to a file.
 class LogClockTest : public testing::Test {
 protected:
-    LogClock() {
+    const Replacement<std::function<int(struct timeval*, void*)>> _clock{
+        replacement::gettimeofday, [](struct timeval* now, void*) {
+            *now = clockShows;
+            return 0;
+        }};
+    LogClockTest() {
         setClock(START);
         if (!logger_initialized) {
             Logger::initialize();

@@ -143,21 +143,6 @@ TEST_F(LogAppenderIdentityTest, WhatStandsInTheWayIsReportedUntilItIsGone) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentityTest, AFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
-    const TempDir dir;
-    fs::create_directory(dir.file("logs"));
-    FileAppender log(dir.file("logs/app.log"));
-    log.line("gone", 1000);
-    const StderrCapture err;
-    fs::remove_all(dir.file("logs"));
-    log.line("lost", 1010);
-    EXPECT_EQ("Error opening \"" + dir.file("logs/app.log") + "\": No such file or directory\n",
-              err.text());
-    fs::create_directory(dir.file("logs"));
-    log.line("written", 1011);
-    EXPECT_EQ("written\n", readFile(dir.file("logs/app.log")));
-}
-
 // In a child without root's rights, to which permissions mean nothing.
 TEST_F(LogAppenderIdentityTest, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen) {
     const std::string folder = _dir.file("logs");

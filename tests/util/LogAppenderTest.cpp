@@ -283,15 +283,6 @@ TEST(LogAppenderTest, SetupWithoutFileTurnsToStandardErrorAndSaysWhatItIgnores) 
     }
 }
 
-TEST(LogAppenderTest, SetupWithADescriptorButNoFileDoesNotComplainAboutIt) {
-    const StderrCapture err;
-    LogAppender appender;
-    appender._fd = FileDescriptor(STDOUT_FILENO);
-    appender.finalSetup("E");
-    EXPECT_EQ("", err.text());
-    EXPECT_EQ(STDOUT_FILENO, appender._fd._osdep);
-}
-
 TEST(LogAppenderTest, SetupIgnoresBackupsWithoutALimit) {
     const TempDir dir;
     const StderrCapture err;
@@ -306,15 +297,6 @@ TEST(LogAppenderTest, SetupCreatesTheFileAndClosesItAgain) {
     const FileAppender log(dir.file("a.log"), 10, 1);
     EXPECT_EQ("", readFile(dir.file("a.log")));
     EXPECT_FALSE(log._fd.valid());
-}
-
-TEST(LogAppenderTest, SetupKeepsItsOwnLayout) {
-    LogAppender appender;
-    ASSERT_TRUE(appender.setAttribute("layout", "SimpleLayout", NO_HOME));
-    const LogFormat* const layout = appender._fmt;
-    const StderrCapture err;
-    appender.finalSetup("E");
-    EXPECT_EQ(layout, appender._fmt);
 }
 
 TEST(LogAppenderTest, SetupReportsAPathThatCannotBeOpenedAndTriesAgainWithEachLine) {

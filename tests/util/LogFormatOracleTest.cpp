@@ -13,17 +13,16 @@
 
 #include "support/AllStrings.h"
 #include "support/LogLine.h"
+#include "support/ScriptedLibc.h"
 #include "support/SlowLayout.h"
 #include "support/TimeZone.h"
 #include "util/Logger.h"
 #include "util/internal/LogGlobals.h"
 
-// Processor time stands still, so that "%u" can be compared.
-extern "C" std::clock_t __wrap_clock() {
-    return 123456;
-}
-
 namespace {
+
+// Processor time stands still, so that "%u" can be compared.
+const Replacement clockStandsStill(replacement::clock, [] { return std::clock_t{123456}; });
 
 constexpr long long EPOCH = 981000000;
 

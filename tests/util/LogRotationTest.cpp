@@ -118,17 +118,6 @@ TEST(LogRotationTest, ALimitOfZeroIsNone) {
     EXPECT_EQ(1U, filesIn(dir).size());
 }
 
-TEST(LogRotationTest, ALimitOfOneRotatesAfterEachLineThatHasAnyText) {
-    const TempDir dir;
-    FileAppender log(dir.file("app.log"), 1, 5);
-    log.line("");
-    EXPECT_EQ((Files{{"app.log", "\n"}}), filesIn(dir));
-    log.line("");
-    EXPECT_EQ((Files{{"app.log", ""}, {"app.log.1", "\n\n"}}), filesIn(dir));
-    log.line("a");
-    EXPECT_EQ((Files{{"app.log", ""}, {"app.log.1", "a\n"}, {"app.log.2", "\n\n"}}), filesIn(dir));
-}
-
 TEST(LogRotationTest, AFileAtItsLimitExactlyIsNotRotated) {
     const TempDir dir;
     for (const long long lines : {1LL, 2LL, 7LL}) {
@@ -154,15 +143,6 @@ TEST(LogRotationTest, TheSizeOfAnExistingFileCounts) {
     log.line("");
     EXPECT_EQ(101U, readFile(dir.file("app.log.1")).size());
     EXPECT_EQ(0, log._curSize);
-}
-
-TEST(LogRotationTest, AnExistingFileBeyondTheLimitTakesOneMoreLine) {
-    const TempDir dir;
-    writeFile(dir.file("app.log"), std::string(1000, 'o'));
-    FileAppender log(dir.file("app.log"), 100, 1);
-    EXPECT_FALSE(fs::exists(dir.file("app.log.1")));
-    log.line("more");
-    EXPECT_EQ(1005U, readFile(dir.file("app.log.1")).size());
 }
 
 TEST(LogRotationTest, TheNewFileIsTheOneThatIsWatched) {

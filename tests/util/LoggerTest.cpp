@@ -158,24 +158,6 @@ TEST(LoggerTest, FormatsManyArgumentsOfEveryKind) {
     EXPECT_EQ("INFO Bound -1 -2 -3 c s 1.5 (nil) 4 ff 7 1.23e+04\n", writes.text());
 }
 
-TEST(LoggerTest, TakesATextForAFormatAndAStringForAMessage) {
-    Bound bound(DEBUG);
-    const char* const text = "100%%";
-    const std::string string = text;
-    const RecordedWrites writes;
-    for (const EntryPoint& entry : ENTRY_POINTS) {
-        (bound.logger.*entry.print)(text);
-    }
-    bound.logger.warn("50%%");
-    bound.logger.warn(string);
-    bound.logger.warn("<" + string + ">");
-    EXPECT_EQ(
-        "FATAL Bound 100%\nCRIT Bound 100%\nERROR Bound 100%\nWARN Bound 100%\n"
-        "INFO Bound 100%\nDEBUG Bound 100%\n"
-        "WARN Bound 50%\nWARN Bound 100%%\nWARN Bound <100%%>\n",
-        writes.text());
-}
-
 TEST(LoggerTest, TakesStringsAndExceptionsAsTheyStand) {
     Bound bound(DEBUG);
     const RecordedWrites writes;
@@ -268,22 +250,6 @@ TEST(LoggerTest, WhatAnAppenderThrowsEndsOnStandardError) {
                       "\nINFO - string %d\nDEBUG - exception %d\n",
                   err.text());
     }
-}
-
-TEST(LoggerTest, AnExceptionEndsTheListOfAppenders) {
-    Bound bound(DEBUG);
-    LogAppender* const failing = LogAppender::find("failing", true);
-    LogAppender* const other = LogAppender::find("other", true);
-    bound.channel._appenders = {other, failing, other};
-    const RecordedWrites writes([&](const RecordedWrites::Message& message) {
-        if (message.appender == failing) {
-            throwIt(STANDARD);
-        }
-    });
-    const StderrCapture err;
-    bound.logger.info("text");
-    EXPECT_EQ((std::vector<const LogAppender*>{other, failing}), writes.appenders());
-    EXPECT_EQ("INFO - text\n", err.text());
 }
 
 TEST(LoggerTest, AMessageThatCannotBeFormattedIsShownAsItsFormat) {
