@@ -216,7 +216,7 @@ TEST_F(LogAppenderFaultTest, ARotationClosesTheFileMovesTheBackupsAndOpensANewFi
     const std::string two = _file + ".2";
     EXPECT_EQ((Calls{"pthread_mutex_lock", "write 8", "close", "access " + _file + " 0",
                      "access " + one + " 0", "unlink " + two, "rename " + one + " " + two,
-                     "rename " + _file + " " + one, "open " + _file + " 1089 644", "fstat",
+                     "rename " + _file + " " + one, "open " + _file + " 1089 0644", "fstat",
                      "pthread_mutex_unlock"}),
               seen.calls());
 }
