@@ -20,8 +20,8 @@
 
 namespace {
 
-// Holds an appender's lock for a scope. If the lock fails, the line is written without it: a report
-// from here would come back to this appender.
+// Holds an appender's lock for a scope. If locking fails, the scope runs unlocked: losing the line
+// would be worse, and a report from here would recurse.
 class ScopedLogLock {
 public:
     explicit ScopedLogLock(Mutex& mutex) : _mutex(mutex), _locked(mutex.NOLOG_lock()) {}
@@ -48,8 +48,8 @@ const LogFormat* newLayout(const char* pattern) {
     return &created.value.emplace_back(pattern);
 }
 
-// Reads a plain decimal number: digits only, no leading zero but in "0" itself.
-// Returns: false, with `result` as it was, for anything else and for a number that does not fit.
+// Reads a plain decimal number: digits only, no leading zero except in "0" itself.
+// Returns: false, with `result` unchanged, for anything else and for a number that does not fit.
 template <typename Number>
 bool readNumber(std::string_view text, Number& result) {
     if (text.empty() || (text.front() == '0' && text.size() > 1) ||
@@ -68,7 +68,7 @@ const LogFormat& defaultFormat() {
 
 LogAppender& rootAppender() {
     static NeverDestroyed<LogAppender> root;
-    // At exit only the descriptor is closed. What is logged later finds a closed appender.
+    // At exit only the descriptor is closed. Later messages find a closed appender.
     static const struct Setup {
         Setup() {
             root.value._fd = FileDescriptor(STDERR_FILENO);
@@ -88,7 +88,7 @@ LogAppenderMap& appenders() {
 
 LogAppender::LogAppender() : _fd(-1) {}
 
-// Around a fork: the child has only the forking thread, so no other may hold a lock then.
+// Called before a fork. The child has only the forking thread, so no other may hold a lock then.
 void LogAppender::lockAll() {
     rootAppender()._mutex.NOLOG_lock();
     for (const auto& [name, appender] : appenders()) {
@@ -192,7 +192,7 @@ void LogAppender::finalSetup(const char* name) {
         _maxBackupIndex = 0;
     }
     if (!_filename.empty()) {
-        closeFd();  // open already when another appender's setup was reported through this one
+        closeFd();  // open if another appender's setup was reported through this one
         openFile();
         report(std::exchange(_failure, {}));
         closeFd();
@@ -200,7 +200,7 @@ void LogAppender::finalSetup(const char* name) {
 }
 
 void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
-    // An appender may be asked to report another one's trouble before its own setup is finished.
+    // An appender may have to report another's failure before its own setup is finished.
     const LogFormat* const layout = _fmt != nullptr ? _fmt : rootAppender()._fmt;
     std::string line;
     layout->apply(line, mdata, msg);
@@ -214,7 +214,9 @@ void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
     report(failure);
 }
 
-// Everything that `write` does under the lock.
+// Everything that `write` does under the lock. A closed file is opened first. If that fails, the
+// line is lost. If the write fails, the file is closed, so that the next line opens it again;
+// standard error stays open. Each failure is stored for the report.
 void LogAppender::writeLine(const std::string& line, time_t now) {
     if (_fd.valid() && !_filename.empty()) {
         checkIdentity(now);
@@ -222,7 +224,7 @@ void LogAppender::writeLine(const std::string& line, time_t now) {
     if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now)) {
         return;
     }
-    // Without a file and before its setup, an appender is asked to report another one's trouble.
+    // Before its setup, an appender without a file may have to report another's failure.
     const FileDescriptor out = _fd.valid() ? _fd : FileDescriptor(STDERR_FILENO);
     const ssize_t count = out.write(line);
     if (count < 0) {
@@ -238,9 +240,9 @@ void LogAppender::writeLine(const std::string& line, time_t now) {
     }
 }
 
-// Closes the file when it is not the one of that name any more: moved or deleted by someone else.
+// Closes the file if its name now refers to another file or to none.
 void LogAppender::checkIdentity(time_t now) {
-    // Unsigned, so that a clock that went back counts as a long time.
+    // Unsigned, so that a clock that was set back counts as a long time.
     const std::uint64_t elapsed =
         static_cast<std::uint64_t>(now) - static_cast<std::uint64_t>(_lastCheck);
     if (elapsed <= IDENTITY_CHECK_SECONDS) {
@@ -281,9 +283,9 @@ bool LogAppender::openAndInitFile(time_t now) {
     return true;
 }
 
-// Moves each file up to the first free number one further, or deletes the last one if no number is
-// free, and starts a new file.
-// Deliberate: a file that cannot be moved is not waited for; the next one may take its name.
+// Renames each file below the first free number to the next number, or deletes the last backup if
+// no number is free. Then starts a new file.
+// Deliberate: a failed rename is ignored; the next file may overwrite the one that stayed.
 void LogAppender::rotateFile(time_t now) {
     closeFd();
     Pathname from;
@@ -319,7 +321,7 @@ void LogAppender::closeFd() {
     _fd.close();
 }
 
-// Notes that a call failed with the present errno.
+// Stores that a call failed with the current errno.
 void LogAppender::failed(LogLevel level, const char* what) {
     _failure = {level, what, errno};
 }

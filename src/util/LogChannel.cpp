@@ -13,7 +13,8 @@ namespace {
 
 constexpr std::string_view SEPARATORS = " \t,";
 
-// Every channel ever created. Loggers still write through them after the map below is emptied.
+// Creates a channel. Channels are never destroyed: loggers still write through them after the map
+// below is emptied.
 LogChannel* newChannel() {
     static NeverDestroyed<std::list<LogChannel>> created;
     return &created.value.emplace_back(rootChannel());
@@ -73,7 +74,7 @@ bool LogChannel::setConfig(const char* value) {
     std::size_t begin = text.find_first_not_of(SEPARATORS);
     while (begin != std::string_view::npos) {
         const std::size_t end = text.find_first_of(SEPARATORS, begin);
-        // Every word takes effect, whatever became of those before it.
+        // Apply every word, even after a rejected one.
         if (!applyConfWord(std::string(text.substr(begin, end - begin)), &gotAppender)) {
             allAccepted = false;
         }

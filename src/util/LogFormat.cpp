@@ -78,7 +78,7 @@ void LogFormat::compile() {
 }
 
 // Compiles the conversion that begins at `p`.
-// Returns: the first character behind it; `end` for an incomplete one.
+// Returns: the first character after it; `end` for an incomplete one.
 const char* LogFormat::compileConversion(const char* p, const char* end) {
     QUELTA_ASSERT(*p == '%');
     ++p;
@@ -131,7 +131,7 @@ bool LogFormat::setKind(Atom& atom, char conversion, const char* arg, std::size_
     return true;
 }
 
-// Adds literal text, whose own length as both widths keeps it from being padded or cut.
+// Adds literal text. Both widths are its own length, so it is never padded or cut.
 void LogFormat::addLiteral(const char* begin, const char* end) {
     if (begin == end) {
         return;

@@ -15,15 +15,15 @@ namespace {
 
 using std::string_view;
 
-// A buffer that has grown to the larger of these and still holds nothing stops growing: the text is
-// empty, as that of "%Z" is in a zone without a name.
+// The buffer stops growing at the larger of these. If strftime still yields nothing, the text is
+// empty, as that of "%Z" in a zone without a name.
 constexpr std::size_t MIN_BUFFER_CAP = std::size_t{1} << 20;  // bytes
 constexpr std::size_t CAP_PER_CHARACTER = 256;                // bytes per character of the piece
 
 constexpr string_view MSEC_CONVERSION = "%l";
 constexpr string_view ISO8601_PATTERN = "%Y-%m-%d %H:%M:%S,%l";
 
-// Returns: the pattern that a date argument stands for, which is itself unless it is a name.
+// Returns: the pattern that a date argument selects: that of a name, or the argument itself.
 string_view datePattern(string_view arg) {
     if (arg.empty() || arg == "ISO8601") {
         return ISO8601_PATTERN;
@@ -43,8 +43,8 @@ void appendMsec(std::string& out, const Timeval& stamp) {
     out.append(padded, 1);
 }
 
-// Returns: whether strftime may yield no text for a piece, which it tells like a buffer that is too
-// small. Only "%p", in any spelling, is known to: there are languages without AM and PM.
+// Returns: whether strftime may legitimately produce no text for a piece, which it reports like a
+// buffer that is too small. Only "%p" with any flags can: some locales have no AM and PM.
 bool mayBeEmpty(const char* piece) {
     for (const char* p = piece; *p != '\0'; ++p) {
         if (*p++ != '%') {
@@ -87,7 +87,7 @@ void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsg
 
 }  // namespace
 
-// The pieces of a layout are read from a configuration: no compiler can check them.
+// The format comes from a configuration file, so the compiler cannot check it.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
 std::size_t CachedTm::ftime(char* buf, std::size_t size, const char* fmt,
@@ -117,7 +117,7 @@ LogFormattedDate::~LogFormattedDate() {
 }
 
 // Splits [fmtstr, fmtend) at every "%l".
-// Deliberate: "%l" is found wherever the two characters stand, behind another "%" too.
+// Deliberate: "%l" is recognised wherever the two characters occur, even after another "%".
 void LogFormattedDate::compile(const char* fmtstr, const char* fmtend) {
     const char* p = fmtstr;
     while (p < fmtend) {

@@ -31,7 +31,7 @@ std::string withErrorText(const char* fmt, int errnum) {
         } else if (*++p == 'm') {
             result += inserted;
         } else {
-            result += "%%";  // a pair, whose second half begins no "%m"
+            result += "%%";  // a pair, whose second half does not begin a "%m"
         }
     }
     return result;
@@ -41,7 +41,8 @@ std::string withErrorText(const char* fmt, int errnum) {
 
 Logger::Logger(const char* name)
     : _channel_name(name), _channel_name_len(std::strlen(name)), _channel(nullptr), _next(nullptr) {
-    // Whatever is complete before this constructor is destroyed after this logger.
+    // A static object whose constructor has ended before this one begins is destroyed after this
+    // logger. So the root appender's descriptor is closed after the last message of this logger.
     rootAppender();
     if (logger_initialized) {
         _channel = LogChannel::find(name, false);

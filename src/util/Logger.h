@@ -6,22 +6,23 @@
 //     static Logger logger("Pathname");                    // one per module, before main
 //     logger.error("cannot open %s: %m", path.c_str());    // anywhere, on any thread
 //
-// A logger is bound to the channel of its name. Loggers made before logging is initialized wait in
-// a list for Logger::initialize(), which binds them, newest first; later ones are bound at once.
-// Binding happens once: a channel that is made afterwards is not seen by the loggers of its name.
+// A logger is bound to the channel of its name. Loggers constructed before logging is initialized
+// wait in a list for Logger::initialize(), which binds them, newest first. Later ones are bound
+// when they are constructed. Binding happens once: a channel that is created afterwards is not seen
+// by the loggers of its name.
 //
 // Before initialization a waiting logger writes through the root channel: INFO and above go to
 // standard error as the bare message, DEBUG is dropped. A logger that is not on the list then (a
-// copy, or a static one whose constructor has not run yet) can promise nothing about levels: its
+// copy, or a static one whose constructor has not run yet) cannot be filtered by level: its
 // messages go to standard error as "LEVEL - message", whatever the level.
 //
-// This header brings the whole of logging along: channels, appenders, layouts and the paths that
-// name the configuration.
+// This header includes all of logging: channels, appenders, layouts and Pathname.
 //
 // No entry point reports an error to its caller, throws, or changes errno.
 //
-// Loggers may be used before main and in destructors at exit: what a logger needs is
-// constant-initialized, or made by the first logger's constructor and so outlives it.
+// Loggers may be used before main and in destructors at exit. What a logger needs is either
+// constant-initialized or created by the first logger's constructor. Static objects are destroyed
+// in reverse order, so it outlives every logger.
 // Configured before other threads start; safe from any thread afterwards.
 
 #include <cstdarg>
@@ -42,14 +43,14 @@ public:
     // A copy logs to the same channel under the same name, but never waits to be bound.
     Logger(const Logger& other) = default;
     Logger& operator=(const Logger& other);
-    // Takes a logger that still waits to be bound off the list.
+    // Removes the logger from the list if it still waits to be bound.
     ~Logger();
 
     // True when the channel's level is DEBUG, so that callers can skip building expensive text.
     bool isDebugEnabled() const;
 
-    // The entry points. The first form of each takes a printf format, in which "%m" stands for the
-    // text of errno; the second takes the message as it stands; the third takes e.what().
+    // The entry points. The first form of each takes a printf format, in which "%m" is replaced by
+    // the text of errno. The second takes the message unchanged, the third logs e.what().
     // Cost: one comparison when the message is below the channel's level.
     void fatal(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
     void fatal(const std::string& msg) { LogFormat::do_log(this, FATAL, msg); }
@@ -75,16 +76,15 @@ public:
     static void initialize();
 
     // The same, after setting up appenders and channels from a configuration file.
-    // Returns: false when the file could not be opened, or ends inside a comment.
+    // Returns: false if the file could not be opened, or ends inside a comment.
     static bool initialize(const Pathname& cfgFile, const Pathname& queltaHome);
 
-    // Sets the minimum level of a channel, which is made when it does not exist, even for a word
-    // that is no level; null names the root channel.
-    // Returns: false when `level` names no level.
+    // Sets the minimum level of a channel; null names the root channel. The channel is created if
+    // it does not exist, even if `level` is not a level. Returns: false if `level` is not a level.
     static bool setChannelLevel(const char* name, const std::string& level);
 
-    // printf into a string, replacing it. "%m" stands for the error text of `errnum`, or of errno
-    // in the form without one; "UNKNOWN ERROR" for a number that is no error.
+    // printf into a string, replacing it. "%m" is replaced by the error text of `errnum`, or of
+    // errno in the form without one; by "UNKNOWN ERROR" for a number that is not an error.
     // Deliberate: the error text becomes a part of the format, so that a "%" in it would be read
     // as a conversion.
     // Requires: the arguments fit the format; they may point into `out`.

@@ -1,7 +1,7 @@
 #ifndef QUELTA_UTIL_INTERNAL_LOGATOMS_H_
 #define QUELTA_UTIL_INTERNAL_LOGATOMS_H_
 
-// The growth that the two kinds of atom array have in common. Internal to the layouts.
+// The growth of the atom arrays of LogFormat and LogFormattedDate.
 // Not thread-safe; one thread at a time per object.
 
 #include <algorithm>

@@ -25,7 +25,7 @@ void cutComment(std::string& line) {
     line.erase(std::min(line.find('#'), line.size()));
 }
 
-// Takes leading characters out of `set` off the text.
+// Removes the leading characters that are in `set`.
 void skipAny(std::string_view& text, std::string_view set) {
     text.remove_prefix(std::min(text.find_first_not_of(set), text.size()));
 }
@@ -35,14 +35,15 @@ void trimBlanks(std::string& line) {
     line.erase(0, line.find_first_not_of(BLANKS));
 }
 
-// Takes the word up to the first character out of `ends` off the text.
+// Removes and returns the text before the first character that is in `ends`.
 std::string_view takeUntil(std::string_view& text, const char* ends) {
     const std::string_view word = text.substr(0, text.find_first_of(ends));
     text.remove_prefix(word.size());
     return word;
 }
 
-// Takes an equals sign with the blanks around it off the text; false when there is none.
+// Removes an equals sign and the blanks around it.
+// Returns: false if the text does not begin with one.
 bool takeEquals(std::string_view& text) {
     skipAny(text, BLANKS);
     if (!text.starts_with('=')) {
@@ -53,7 +54,7 @@ bool takeEquals(std::string_view& text) {
     return true;
 }
 
-// Tells whether a signal ended the last read, and lets reading go on then.
+// Returns: whether a signal interrupted the last read; the error is then cleared.
 bool wasInterrupted(std::FILE* file) {
     if (std::ferror(file) == 0 || errno != EINTR) {
         return false;
@@ -100,7 +101,7 @@ void ConfigReader::readLines() {
 
 // Removes "#" comments and XML comments, which may span lines. The text before and after an XML
 // comment is joined and read again as one line.
-// Returns: false, with the line of no use, if the file ends inside an XML comment.
+// Returns: false, with `line` unspecified, if the file ends inside an XML comment.
 bool ConfigReader::dropComments(std::string& line) {
     for (;;) {
         cutComment(line);
@@ -141,7 +142,8 @@ bool ConfigReader::parse(const std::string& line) {
     return key == "appender" && parseAppender(rest);
 }
 
-// "NAME = anything" or "NAME.ATTRIBUTE = value". The appender is made as soon as it has a name.
+// "NAME = anything" or "NAME.ATTRIBUTE = value". The appender is created as soon as
+// its name is known.
 bool ConfigReader::parseAppender(std::string_view rest) {
     const std::string name(takeUntil(rest, ".= \t"));
     if (name.empty()) {
@@ -186,7 +188,7 @@ bool setup_log_channel(const std::string& line) {
         return false;
     }
     std::string name = line.substr(0, equals);
-    name.erase(name.find_last_not_of(BLANKS) + 1);  // npos + 1: nothing but blanks
+    name.erase(name.find_last_not_of(BLANKS) + 1);  // npos + 1 is 0: only blanks
     return LogChannel::find(name, true)->setConfig(line.c_str() + equals + 1);
 }
 
@@ -195,15 +197,16 @@ bool read_line(std::string& result, std::FILE* ifile) {
     const std::string_view filled(buf, sizeof(buf));
     result.clear();
     while (!result.ends_with('\n')) {
-        // fgets does not return the length, and the text may hold NUL bytes. In a buffer filled
-        // with newlines, the last NUL is the one that ends the text.
+        // fgets does not return the length, and the text may contain NUL bytes. The buffer is
+        // therefore filled with newlines first. The last NUL in it is then the one that fgets
+        // appended. fgets appends none if a signal interrupts it.
         std::memset(buf, '\n', sizeof(buf));
         const char* const p = std::fgets(buf, sizeof(buf), ifile);
         if (p != nullptr) {
             QUELTA_ASSERT(p == buf);
             result += filled.substr(0, filled.rfind('\0'));
         } else if (wasInterrupted(ifile)) {
-            result += filled.substr(0, filled.find('\n'));  // what came before the signal
+            result += filled.substr(0, filled.find('\n'));  // read before the signal
         } else {
             return !result.empty();
         }

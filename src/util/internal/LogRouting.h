@@ -1,8 +1,9 @@
 #ifndef QUELTA_UTIL_INTERNAL_LOGROUTING_H_
 #define QUELTA_UTIL_INTERNAL_LOGROUTING_H_
 
-// Where messages go that no channel can take, and who must not take a report. LogRouting.cpp also
-// holds the routing functions of LogFormat: do_log, internal and check_for_unitialized_logger.
+// The routing of messages that do not simply go to a channel: the fallback to standard error, and
+// the appenders that must not get a report. LogRouting.cpp also defines the routing functions of
+// LogFormat: do_log, internal and check_for_unitialized_logger.
 // Safe from any thread.
 
 #include <string>
@@ -16,7 +17,7 @@ class LogAppender;
 void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept;
 
 // Marks an appender, for the current thread and scope, as one whose failed write is being reported.
-// It gets no report meanwhile, so appenders that all fail do not report to each other for ever.
+// It gets no report meanwhile, so appenders that all fail do not recurse.
 class ReportMark {
 public:
     explicit ReportMark(const LogAppender* appender) : _appender(appender), _outer(s_innermost) {
