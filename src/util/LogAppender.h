@@ -122,7 +122,7 @@ private:
     Mutex _mutex;                     // held around everything `write` does after formatting
     ino_t _inodeNum = 0;              // of the file when it was opened
     time_t _lastCheck = 0;            // seconds of message stamps: identity last confirmed
-    Failure _failure;
+    Failure _failure;                 // of the write under way; reported after the unlock
 };
 
 // The appender that takes every message of a channel without appenders: standard error, with the

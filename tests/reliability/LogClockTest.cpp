@@ -32,7 +32,7 @@ void setClock(long long seconds, long microseconds = 0) {
     clockShows.tv_usec = microseconds;
 }
 
-// The moment that the clock shows, as the C library has it at this moment.
+// The scripted time in the C library's current time zone.
 std::string localTime() {
     struct tm local {};
     EXPECT_NE(nullptr, ::localtime_r(&clockShows.tv_sec, &local));

@@ -20,7 +20,7 @@ namespace {
 
 constexpr unsigned LINES = 200;
 
-// The file behind each descriptor, 0 where there is none.
+// The inode of each descriptor's file; 0 if the descriptor is closed.
 using Files = std::array<ino_t, 3>;
 
 Files filesOfStandardDescriptors() {
@@ -66,7 +66,7 @@ bool nothingIsReopened(const Files& before, const std::string& log) {
 
 }  // namespace
 
-TEST(LogClosedDescriptorsTest, TheStatusIsAsEverAndEveryLineIsWhole) {
+TEST(LogClosedDescriptorsTest, TheStatusIsTheUsualOneAndEveryLineIsWhole) {
     for (unsigned closed = 0; closed < 8; ++closed) {
         const TempDir dir;
         writeFile(dir.file("log.cfg"),

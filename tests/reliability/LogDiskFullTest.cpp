@@ -20,7 +20,7 @@
 
 namespace {
 
-// Ten bytes with its line feed.
+// Ten bytes with its newline.
 const std::string LINE = "123456789";
 
 // No file of this process may grow beyond that many bytes.
@@ -65,7 +65,7 @@ TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
         for (int line = 0; line < 6; ++line) {
             logger.info(LINE);
         }
-        // Four lines fit exactly; two are lost and told.
+        // Four lines fit exactly; two are lost and reported.
         EXPECT_EQ(repeated(LINE + "\n", 4), readFile(dir.file("app.log")).substr(1001));
         const std::string report =
             "Error writing to \"" + dir.file("app.log") + "\": File too large\n";

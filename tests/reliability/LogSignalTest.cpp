@@ -111,7 +111,7 @@ TEST(LogSignalTest, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     EXPECT_EQ("", err.text());
 }
 
-// Nobody reads yet, so the open itself waits, in the middle of the storm.
+// There is no reader yet, so the open itself waits while signals arrive.
 TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     const TempDir dir;
     const StderrCapture err;
@@ -133,7 +133,7 @@ TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
         log.write(stampedAt(1010), "second");
         log.closeFd();
     }
-    // Lets a reader go to whom nobody came.
+    // Releases the reader if no writer ever opened the pipe.
     ::close(::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK));
     reader.join();
     EXPECT_EQ("first\nsecond\n", got);
@@ -168,7 +168,7 @@ TEST(LogSignalTest, AConfigurationThatComesSlowlyIsReadWhole) {
             }
         });
         EXPECT_TRUE(Logger::initialize(Pathname(dir.file("pipe")), Pathname()));
-        // A writer who found no reader must not wait for one; all that it writes fits the pipe.
+        // Do not let the writer wait if the reader has given up; the pipe holds all that it writes.
         const int reader = ::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK);
         writer.join();
         ::close(reader);

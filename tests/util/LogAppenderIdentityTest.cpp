@@ -145,22 +145,22 @@ TEST_F(LogAppenderIdentityTest, WhatStandsInTheWayIsReportedUntilItIsGone) {
 
 // In a child without root's rights, to which permissions mean nothing.
 TEST_F(LogAppenderIdentityTest, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen) {
-    const std::string folder = _dir.file("logs");
-    const std::string file = folder + "/app.log";
+    const std::string directory = _dir.file("logs");
+    const std::string file = directory + "/app.log";
     const std::string report = "Error opening \"" + file + "\": Permission denied\n";
     fs::permissions(_dir.path(), fs::perms::all);
     const ChildRun run = inChild([&] {
         if (::geteuid() == 0) {
             ASSERT_EQ(0, ::setuid(65534));
         }
-        fs::create_directory(folder);
+        fs::create_directory(directory);
         FileAppender log(file);
         log.line("first", 1000);
         fs::permissions(file, fs::perms::none);
         log.line("still open", 1010);
-        fs::permissions(folder, fs::perms::none);
+        fs::permissions(directory, fs::perms::none);
         log.line("not to be found", 1020);
-        fs::permissions(folder, fs::perms::all);
+        fs::permissions(directory, fs::perms::all);
         log.line("not to be opened", 1020);
         fs::permissions(file, fs::perms::owner_write);
         log.line("written", 1020);

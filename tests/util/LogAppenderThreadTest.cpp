@@ -27,12 +27,12 @@ namespace fs = std::filesystem;
 
 namespace {
 
-// In a child of a process with threads the leak checker has none of their stacks to search.
+// In a child forked from several threads, the leak checker cannot search their stacks.
 bool childOfThreads = false;
 
 constexpr unsigned THREADS = 8;
 
-// Runs body(0) ... body(THREADS - 1), each on a thread of its own, all at once.
+// Runs body(0) ... body(THREADS - 1), each on a thread of its own, concurrently.
 template <typename Body>
 void onAllThreads(Body body) {
     std::atomic<bool> go = false;
@@ -51,7 +51,7 @@ void onAllThreads(Body body) {
     }
 }
 
-// The lines of a text but those that are `unwanted`.
+// The lines of a text except those that are `unwanted`.
 std::string without(const std::string& unwanted, const std::string& text) {
     std::string rest;
     std::istringstream in(text);
@@ -218,7 +218,7 @@ TEST(LogAppenderThreadTest, AChildOfAForkLogsWhileOtherThreadsDo) {
         std::fflush(nullptr);
         const pid_t child = ::fork();
         if (child == 0) {
-            ::alarm(10);  // ends a child that waits for a lock that nobody will free
+            ::alarm(10);  // ends a child that waits for a lock held by no thread of its own
             writeToBoth("child " + std::to_string(number));
             childOfThreads = true;
             if (number % 10 == 0) {

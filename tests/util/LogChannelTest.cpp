@@ -19,7 +19,7 @@ namespace {
 
 using Appenders = std::vector<LogAppender*>;
 
-// The state of the root channel, put back at the end of a case.
+// The state of the root channel, restored at the end of a case.
 class RootChannel {
 public:
     RootChannel() : _saved(rootChannel()) {}
@@ -96,7 +96,7 @@ TEST_F(LogChannelTest, ChangesItsLevelByName) {
     }
 }
 
-TEST_F(LogChannelTest, KeepsItsLevelForAWordThatIsNone) {
+TEST_F(LogChannelTest, KeepsItsLevelForAWordThatIsNotALevel) {
     for (const char* const word :
          {"debug", "Debug", "", " DEBUG", "DEBUG ", "DEBU", "DEBUGS", "WARNING", "1", "???"}) {
         LogChannel channel;
@@ -210,7 +210,7 @@ TEST_F(LogChannelTest, ASettingHasAName) {
     }
 }
 
-TEST_F(LogChannelTest, ALineWithoutAnEqualsSignIsNoSetting) {
+TEST_F(LogChannelTest, ALineWithoutAnEqualsSignIsNotASetting) {
     for (const char* const line : {"no equals", "no equals WARN"}) {
         EXPECT_FALSE(setup_log_channel(line)) << line;
         EXPECT_EQ(&rootChannel(), LogChannel::find(line, false)) << line;
@@ -234,7 +234,7 @@ TEST_F(LogChannelTest, WritesToTheRootAppenderWhenItHasNone) {
     EXPECT_EQ(std::vector<const LogAppender*>{&rootAppender()}, writes.appenders());
 }
 
-TEST_F(LogChannelTest, DoesNotFilterWhatItIsToldToWrite) {
+TEST_F(LogChannelTest, WritesMessagesBelowItsLevelToo) {
     LogChannel channel;
     channel.minlevel = EMERG;
     const RecordedWrites writes;

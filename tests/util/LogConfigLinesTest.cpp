@@ -44,9 +44,9 @@ Lines linesOf(const std::string& contents) {
     return lines;
 }
 
-// The rule on the whole text: each line feed ends a line, what is behind the last is one if it is
-// not empty.
-Lines splitAtLineFeeds(const std::string& contents) {
+// The rule on the whole text: each newline ends a line; the text after the last newline is a line
+// if it is not empty.
+Lines splitAtNewlines(const std::string& contents) {
     Lines lines;
     std::size_t begin = 0;
     for (std::size_t end = 0; (end = contents.find('\n', begin)) != std::string::npos;
@@ -66,17 +66,17 @@ struct Skipped {
     std::string nextLine;
 };
 
-Skipped skip(const char* behindOpening, const std::string& contents) {
+Skipped skip(const char* afterOpening, const std::string& contents) {
     const File file = fileWith(contents);
     Skipped skipped = {false, "before ", 7, ""};
-    skipped.closed = handle_xml_comment(skipped.result, behindOpening, skipped.lineno, file.get());
+    skipped.closed = handle_xml_comment(skipped.result, afterOpening, skipped.lineno, file.get());
     read_line(skipped.nextLine, file.get());
     return skipped;
 }
 
 }  // namespace
 
-TEST(ReadLineTest, SplitsEveryShortTextAtItsLineFeeds) {
+TEST(ReadLineTest, SplitsEveryShortTextAtItsNewlines) {
     const char alphabet[] = {'a', '\0', '\n', '\r'};
     for (unsigned length = 0; length <= 6; ++length) {
         for (unsigned code = 0; code < 1U << (2 * length); ++code) {
@@ -84,7 +84,7 @@ TEST(ReadLineTest, SplitsEveryShortTextAtItsLineFeeds) {
             for (unsigned i = 0; i < length; ++i) {
                 text += alphabet[code >> (2 * i) & 3U];
             }
-            ASSERT_EQ(splitAtLineFeeds(text), linesOf(text)) << length << ' ' << code;
+            ASSERT_EQ(splitAtNewlines(text), linesOf(text)) << length << ' ' << code;
         }
     }
 }
@@ -131,7 +131,7 @@ TEST(ReadLineTest, AfterTheEndThereAreNoMoreLines) {
 
 TEST(HandleXmlCommentTest, AppendsWhatFollowsTheEnd) {
     const struct {
-        const char* behindOpening;
+        const char* afterOpening;
         const char* contents;
         const char* result;
         unsigned lineno;
@@ -148,11 +148,11 @@ TEST(HandleXmlCommentTest, AppendsWhatFollowsTheEnd) {
         {" -- >", "-- >\n->\n-->", "before ", 10, ""},
     };
     for (const auto& row : table) {
-        const Skipped skipped = skip(row.behindOpening, row.contents);
-        EXPECT_TRUE(skipped.closed) << row.behindOpening;
-        EXPECT_EQ(row.result, skipped.result) << row.behindOpening;
-        EXPECT_EQ(row.lineno, skipped.lineno) << row.behindOpening;
-        EXPECT_EQ(row.nextLine, skipped.nextLine) << row.behindOpening;
+        const Skipped skipped = skip(row.afterOpening, row.contents);
+        EXPECT_TRUE(skipped.closed) << row.afterOpening;
+        EXPECT_EQ(row.result, skipped.result) << row.afterOpening;
+        EXPECT_EQ(row.lineno, skipped.lineno) << row.afterOpening;
+        EXPECT_EQ(row.nextLine, skipped.nextLine) << row.afterOpening;
     }
 }
 

@@ -538,7 +538,8 @@ TEST_F(LogConfigTest, ABadPathIsReportedThroughAnAppenderThatIsYetToBecomeStanda
             _dir.file("missing/a.log") + "\n" + "appender.B.layout=SimpleLayout\n",
         [](bool complete) { EXPECT_TRUE(complete); });
     EXPECT_EQ(0, run.status);
-    // The second report is A's own: it fails to write that B has no file, so B's warning is lost.
+    // The second report is A's own: asked to report that B has no file, A cannot open its file. B's
+    // warning is lost.
     EXPECT_EQ("ERROR   : " + report + "ERROR   : " + report, run.err);
 }
 
@@ -571,7 +572,7 @@ TEST_F(LogConfigTest, CommentsAreRemovedAndLinesKeepTheirNumbers) {
         {"<!-- one\ntwo\nthree -->bad\nnext\n", {{3, "bad"}, {4, "next"}}},
         {"a<!-- one\ntwo\nthree -->b\nnext\n", {{3, "ab"}, {4, "next"}}},
         {"a<!--\n-->b<!--\n\n-->c\nnext\n", {{4, "abc"}, {5, "next"}}},
-        // The "#" is cut first where a comment may begin, and hides what would begin or end it.
+        // A "#" is handled before "<!--" on the same line, and so can hide it.
         {"bad # <!-- \nnext\n", {{1, "bad"}, {2, "next"}}},
         {"a<!-- # -->hidden\n-->b\n", {{2, "ab"}}},
         {"a<!--\n # -->b\n", {{2, "ab"}}},
@@ -618,7 +619,7 @@ TEST_F(LogConfigTest, AnOpenCommentIsReportedWithTheLineWhereItBegan) {
     }
 }
 
-TEST_F(LogConfigTest, TheLastLineNeedsNoLineFeed) {
+TEST_F(LogConfigTest, TheLastLineNeedsNoNewline) {
     EXPECT_EQ(parseError(2, "bad"), reportsOf("\nbad"));
     const ChildRun run = configured("rootCategory=ALERT", [](bool complete) {
         EXPECT_TRUE(complete);
@@ -637,7 +638,7 @@ TEST_F(LogConfigTest, LinesMayBeLong) {
               [&](bool) { EXPECT_EQ(DEBUG, LogChannel::find(longText, false)->minlevel); });
 }
 
-TEST_F(LogConfigTest, ACarriageReturnIsNoBlank) {
+TEST_F(LogConfigTest, ACarriageReturnIsAnOrdinaryCharacter) {
     expectRun(parseErrors({{2, "\r"},
                            {4, "appender.A.maxFileSize=5\r"},
                            {5, "appender.A.layout=SimpleLayout\r"},

@@ -146,7 +146,7 @@ std::string randomPattern(Random& random) {
     return pattern;
 }
 
-// Characters drawn without any regard to the rules, but never four digits in a row.
+// Random characters, but never four digits in a row.
 std::string randomNoise(Random& random) {
     std::string noise;
     for (std::size_t n = random.below(24); n > 0; --n) {
@@ -160,7 +160,7 @@ std::string randomNoise(Random& random) {
 }
 
 // Dates of noise may hold digits, which strftime reads as widths of its own; the compiled layout
-// and strftime must agree there too, but a piece of "%p" with a width beyond 64 is left out.
+// and strftime must agree there too, except for a piece of "%p" with a width beyond 64.
 void compareRandom(unsigned seed, int patterns, std::string (*draw)(Random&)) {
     const TimeZone berlin("CET-1CEST,M3.5.0,M10.5.0/3");
     epoch_timeval().set(EPOCH, 0);

@@ -113,7 +113,7 @@ TEST(LogFormatTest, LiteralsAreNeitherPaddedNorCut) {
                  {" a\tb\n", INFO, "", " a\tb\n"}});
 }
 
-TEST(LogFormatTest, TheLineFeedKeepsItsWidths) {
+TEST(LogFormatTest, TheNewlineKeepsItsWidths) {
     expectLines({{"a%3n", INFO, "", "a  \n"},
                  {"a%-3n", INFO, "", "a\n  "},
                  {"a%03n", INFO, "", "a00\n"},

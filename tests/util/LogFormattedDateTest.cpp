@@ -255,12 +255,12 @@ TEST(LogFormattedDateTest, ALongPieceHasACapOf256TimesItsLength) {
 }
 
 TEST(LogFormattedDateTest, AZoneWithoutANameAppendsNothing) {
-    const TempDir folder;
+    const TempDir dir;
     // One type of local time: no offset, no daylight saving, and a name without a character.
     const std::string header = "TZif" + std::string(16, '\0');
     const std::string counts("\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\1\0\0\0\1", 24);
-    writeFile(folder.file("nameless"), header + counts + std::string(7, '\0'));
-    const TimeZone nameless((":" + folder.file("nameless")).c_str());
+    writeFile(directory.file("nameless"), header + counts + std::string(7, '\0'));
+    const TimeZone nameless((":" + dir.file("nameless")).c_str());
     EXPECT_EQ("2001-02-03 04:05:06,000", dateOf("", STAMP));
     EXPECT_EQ("", dateOf("%Z", STAMP));
     EXPECT_EQ("000000", dateOf("%l%Z%l", STAMP));
@@ -269,11 +269,11 @@ TEST(LogFormattedDateTest, AZoneWithoutANameAppendsNothing) {
 }
 
 TEST(LogFormattedDateTest, ALanguageWithoutAmAndPmAppendsNothing) {
-    const TempDir folder;
+    const TempDir dir;
     const std::string command = "localedef --no-archive -c -i de_DE -f UTF-8 '" +
-                                folder.file("de_DE.UTF-8") + "' >/dev/null 2>&1";
+                                dir.file("de_DE.UTF-8") + "' >/dev/null 2>&1";
     const bool made = std::system(command.c_str()) != -1;
-    ::setenv("LOCPATH", folder.path().c_str(), 1);
+    ::setenv("LOCPATH", dir.path().c_str(), 1);
     const bool chosen = std::setlocale(LC_TIME, "de_DE.UTF-8") != nullptr;
     const std::string text = chosen ? dateOf("%l%p%l%^p%l%p%p", STAMP) : "";
     const std::string mixed = chosen ? dateOf("<%p>", STAMP) : "";

@@ -29,7 +29,7 @@ std::string nameOf(unsigned suffix) {
     return suffix == 0 ? "app.log" : "app.log." + std::to_string(suffix);
 }
 
-// The rule once more, on names alone: what a rotation makes of the files of a folder.
+// A slow model of the rule: the files of a directory after a rotation.
 Files rotated(Files files, unsigned backups) {
     unsigned slot = 0;
     while (slot < backups && files.count(nameOf(slot)) != 0) {
@@ -99,7 +99,7 @@ TEST(LogRotationTest, EveryPatternOfBackupsFollowsTheRule) {
     }
 }
 
-TEST(LogRotationTest, WithoutBackupsTheFileIsDeletedAndBegunAnew) {
+TEST(LogRotationTest, WithoutBackupsTheFileIsDeletedAndANewOneStarted) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 5, 0);
     log.line("12345");
@@ -192,7 +192,7 @@ TEST(LogRotationTest, BackupNamesAreTheFileNameAPointAndTheNumber) {
     }
 }
 
-TEST(LogRotationTest, AFolderInTheWayOfABackupLeavesTheFilesAsTheyAre) {
+TEST(LogRotationTest, ADirectoryInTheWayOfABackupLeavesTheFilesAsTheyAre) {
     const TempDir dir;
     FileAppender log(dir.file("app.log"), 1, 1);
     fs::create_directories(dir.file("app.log.1/occupied"));

@@ -45,7 +45,7 @@ LogChannel& channelNamedLogger(LogLevel minlevel, const std::vector<LogAppender*
 }
 
 TEST(LogFallbackTest, WritesLevelAndMessageWithOneCall) {
-    const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the line feed fill 1024 bytes
+    const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the newline fill 1024 bytes
     const struct {
         int level;
         std::string message, expected;

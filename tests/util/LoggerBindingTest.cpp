@@ -176,7 +176,7 @@ TEST(LoggerBindingTest, SetsTheLevelOfTheRootChannelForNull) {
     });
 }
 
-TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItMakes) {
+TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItCreates) {
     expectInChild("", [] {
         lookups.clear();
         EXPECT_TRUE(Logger::setChannelLevel("new", "FATAL"));
@@ -188,7 +188,7 @@ TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItMakes) {
     });
 }
 
-TEST(LoggerBindingTest, AWordThatIsNoLevelStillMakesTheChannel) {
+TEST(LoggerBindingTest, AWordThatIsNotALevelStillCreatesTheChannel) {
     expectInChild("", [] {
         EXPECT_FALSE(Logger::setChannelLevel("new", "loud"));
         EXPECT_NE(&rootChannel(), LogChannel::find("new", false));
@@ -285,7 +285,7 @@ TEST(LoggerBindingTest, ACopyOfAWaitingLoggerGoesUnfilteredToStandardError) {
             copy.debug(std::runtime_error("exception"));
             copy.fatal("%s", "last");
 
-            // Nobody binds it, so that it stays with the root channel.
+            // It is never bound, so it keeps the root channel.
             LogChannel::find("name", true)->minlevel = EMERG;
             Logger::initialize();
             EXPECT_EQ(nullptr, copy._channel);
@@ -345,7 +345,7 @@ TEST(LoggerBindingTest, ALoggerThatIsNotConstructedYetGoesUnfilteredToStandardEr
 }
 
 TEST(LoggerBindingTest, LoggersWorkAfterMain) {
-    // Destroyed when those made in main and all static ones are gone.
+    // Destroyed after the loggers of main and after all static ones.
     static struct AtExit {
         ~AtExit() {
             if (kept == nullptr) {

@@ -61,7 +61,7 @@ TEST_F(LoggerFormatTest, LeavesPairsOfPercentSignsAlone) {
     EXPECT_EQ(text + " 5%m%", formatted(EACCES, "%m %d%%m%%", 5));
 }
 
-TEST_F(LoggerFormatTest, NamesNumbersThatAreNoErrors) {
+TEST_F(LoggerFormatTest, NamesNumbersThatAreNotErrors) {
     EXPECT_EQ("a UNKNOWN ERROR b", formatted(99999, "a %m b"));
     EXPECT_EQ("UNKNOWN ERROR", formatted(-1, "%m"));
     EXPECT_EQ("UNKNOWN ERROR", formatted(INT_MAX, "%m"));
@@ -154,7 +154,7 @@ TEST_F(LoggerFormatTest, ReadsItsArgumentsBeforeItReplacesTheString) {
     EXPECT_EQ("<" + std::string(300, 'x') + ">", longer);
 }
 
-// Nothing but Logger.h is included here.
+// This source includes no other header of logging.
 TEST(LoggerHeaderTest, BringsTheWholeOfLoggingAlong) {
     const Logger logger("net.Http");
     std::string line;
@@ -184,7 +184,7 @@ TEST(LoggerHeaderTest, InternalFunctionsNeedNoHeader) {
     std::fclose(file);
 }
 
-TEST_F(LoggerFormatTest, KeepsCharactersBehindANul) {
+TEST_F(LoggerFormatTest, KeepsCharactersAfterANul) {
     EXPECT_EQ(std::string("a\0b", 3), formatted(0, "a%cb", 0));
 }
 

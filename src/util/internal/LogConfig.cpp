@@ -10,7 +10,6 @@
 #include "util/LogChannel.h"
 #include "util/LogFormat.h"
 #include "util/Pathname.h"
-#include "util/internal/LogConfig.h"
 #include "util/internal/LogGlobals.h"
 
 namespace {
@@ -43,7 +42,7 @@ std::string_view takeUntil(std::string_view& text, const char* ends) {
 }
 
 // Removes an equals sign and the blanks around it.
-// Returns: false if the text does not begin with one.
+// Returns: false, with only blanks removed, if there is no equals sign.
 bool takeEquals(std::string_view& text) {
     skipAny(text, BLANKS);
     if (!text.starts_with('=')) {
