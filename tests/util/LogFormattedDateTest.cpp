@@ -259,7 +259,7 @@ TEST(LogFormattedDateTest, AZoneWithoutANameAppendsNothing) {
     // One type of local time: no offset, no daylight saving, and a name without a character.
     const std::string header = "TZif" + std::string(16, '\0');
     const std::string counts("\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\1\0\0\0\1", 24);
-    writeFile(directory.file("nameless"), header + counts + std::string(7, '\0'));
+    writeFile(dir.file("nameless"), header + counts + std::string(7, '\0'));
     const TimeZone nameless((":" + dir.file("nameless")).c_str());
     EXPECT_EQ("2001-02-03 04:05:06,000", dateOf("", STAMP));
     EXPECT_EQ("", dateOf("%Z", STAMP));
