@@ -8,8 +8,7 @@ install(TARGETS Rete RUNTIME)
 install(TARGETS quelta_util quelta_loader quelta_rete quelta_xmlwrapp EXPORT queltaTargets ARCHIVE)
 install(DIRECTORY src/util src/services DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta"
   FILES_MATCHING PATTERN "*.h"
-  # What the logging sources share among themselves.
-  PATTERN "LogAtoms.h" EXCLUDE PATTERN "LogConfig.h" EXCLUDE PATTERN "LogInternal.h" EXCLUDE)
+  PATTERN "internal" EXCLUDE)
 if(QUELTA_XMLWRAPP_CHOICE STREQUAL "substitute")
   install(DIRECTORY src/xmlwrapp-substitute/xmlwrapp
     DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}/quelta" FILES_MATCHING PATTERN "*.h")

@@ -37,7 +37,7 @@ endforeach()
 quelta_test_flags(test_headers_quick FALSE)
 quelta_test_flags(test_headers_optimized TRUE)
 
-# Without quelta_sanitize; the source says why.
+# Without quelta_sanitize: see the source.
 add_library(scripted_libc OBJECT ${PROJECT_SOURCE_DIR}/tests/support/ScriptedLibc.cpp)
 set_property(TARGET scripted_libc PROPERTY POSITION_INDEPENDENT_CODE ON)
 target_include_directories(scripted_libc PRIVATE ${PROJECT_SOURCE_DIR}/tests)

@@ -7,7 +7,7 @@
 #include <stdexcept>
 
 #include "support/SlowLayout.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 
 // Processor time stands still, so that "%u" can be compared.

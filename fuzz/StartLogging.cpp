@@ -16,7 +16,7 @@
 #include "support/SlowConfig.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 
@@ -84,7 +84,7 @@ std::string reports(const SlowConfig& slow, const std::string& cfg) {
     for (const SlowConfig::Line& line : slow.errors) {
         parseError(line);
     }
-    if (slow.root.number != 0 && !readChannelSlowly(slow, slow.rootValue, INFO).accepted) {
+    if (slow.root.number != 0 && !readChannelSlowly(slow, slow.root.text, INFO).accepted) {
         parseError(slow.root);
     }
     for (const SlowConfig::Line& line : slow.categories) {
@@ -118,7 +118,7 @@ std::string textOf(const std::string& file) {
     ::dup2(usual, STDERR_FILENO);
 
     checkEqual("initialize", slow.openComment == 0, complete);
-    const SlowChannel root = readChannelSlowly(slow, slow.rootValue, INFO);
+    const SlowChannel root = readChannelSlowly(slow, slow.root.text, INFO);
     checkChannel(root, root, rootChannel());
     for (const SlowConfig::Line& line : slow.categories) {
         const std::string name = channelName(line.text);

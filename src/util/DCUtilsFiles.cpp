@@ -6,17 +6,11 @@
 #include <utility>
 
 #include "util/DCUtils.h"
-#include "util/ErrnoKeeper.h"
 #include "util/Pathname.h"
+#include "util/internal/FileCloser.h"
 
 namespace {
 
-struct FileCloser {
-    void operator()(FILE* f) const {
-        const ErrnoKeeper errnoKeeper;
-        std::fclose(f);
-    }
-};
 using OpenFile = std::unique_ptr<FILE, FileCloser>;
 
 }  // namespace

@@ -6,10 +6,9 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <memory>
 
-#include "util/ErrnoKeeper.h"
+#include "util/internal/ErrnoKeeper.h"
+#include "util/internal/FormatText.h"
 
 static_assert(sizeof(off_t) == 8, "offsets need 64 bits; build with -D_FILE_OFFSET_BITS=64");
 
@@ -55,24 +54,9 @@ ssize_t FileDescriptor::writev(const struct iovec* buffers, unsigned int count) 
 }
 
 void FileDescriptor::vformat(const char* fmt, std::va_list args) const {
-    char stack[256];
-    std::unique_ptr<char[]> heap;
-    char* text = stack;
-    std::size_t size = sizeof stack;
-    for (;;) {
-        std::va_list pass;
-        va_copy(pass, args);
-        const int length = std::vsnprintf(text, size, fmt, pass);
-        va_end(pass);
-        if (length >= 0 && static_cast<std::size_t>(length) < size) {
-            static_cast<void>(write(text, static_cast<std::size_t>(length)));
-            return;
-        }
-        size = length < 0 ? size * 2 : static_cast<std::size_t>(length) + 1;
-        heap.reset();
-        heap.reset(new char[size]);
-        text = heap.get();
-    }
+    formatText(fmt, args, [this](const char* text, std::size_t length) {
+        static_cast<void>(write(text, length));
+    });
 }
 
 void FileDescriptor::format(const char* fmt, ...) const {

@@ -4,32 +4,24 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <charconv>
-#include <limits>
-#include <memory>
-#include <new>
+#include <list>
 #include <string_view>
-#include <vector>
+#include <utility>
 
 #include "util/Assert.h"
-#include "util/ErrnoKeeper.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/LogLevel.h"
 #include "util/LogMsgMetadata.h"
-
-// What could not be done, and why.
-struct LogAppender::Failure {
-    Problem what = Problem::NONE;
-    int errnum = 0;
-};
+#include "util/internal/LogRouting.h"
+#include "util/internal/NeverDestroyed.h"
+#include "util/internal/RetryOnEintr.h"
 
 namespace {
 
-// Holds an appender's lock for a scope. A lock that cannot be had is no reason to lose the line,
-// and must not be reported from within: the scope then goes without.
+// Holds an appender's lock for a scope. If locking fails, the scope runs unlocked: losing the line
+// would be worse, and a report from here would recurse.
 class ScopedLogLock {
 public:
     explicit ScopedLogLock(Mutex& mutex) : _mutex(mutex), _locked(mutex.NOLOG_lock()) {}
@@ -49,27 +41,15 @@ private:
 const std::uint64_t IDENTITY_CHECK_SECONDS = 5;
 const std::string_view QUELTA_HOME_VARIABLE = "${QUELTA_HOME}";
 
-// Every layout ever made for an appender. A layout that an attribute line has replaced may still be
-// in use by an appender that took it over, so none is freed; the list keeps them reachable.
+// Creates a layout. None is freed: an appender may still use one that another appender has
+// replaced.
 const LogFormat* newLayout(const char* pattern) {
-    static auto* const layouts = new std::vector<std::unique_ptr<const LogFormat>>;
-    layouts->push_back(std::make_unique<const LogFormat>(pattern));
-    return layouts->back().get();
+    static NeverDestroyed<std::list<LogFormat>> created;
+    return &created.value.emplace_back(pattern);
 }
 
-// The shared layouts are never destroyed: appenders write through them until the process ends.
-const LogFormat* basicLayout() {
-    static const LogFormat* const layout = new LogFormat("%R %p %c %m%n");
-    return layout;
-}
-
-const LogFormat* simpleLayout() {
-    static const LogFormat* const layout = new LogFormat("%-8p: %m%n");
-    return layout;
-}
-
-// Reads a plain decimal number: digits only, no leading zero but in "0" itself.
-// Returns: false, with `result` as it was, for anything else and for a number that does not fit.
+// Reads a plain decimal number: digits only, no leading zero except in "0" itself.
+// Returns: false, with `result` unchanged, for anything else and for a number that does not fit.
 template <typename Number>
 bool readNumber(std::string_view text, Number& result) {
     if (text.empty() || (text.front() == '0' && text.size() > 1) ||
@@ -82,41 +62,33 @@ bool readNumber(std::string_view text, Number& result) {
 }  // namespace
 
 const LogFormat& defaultFormat() {
-    static const LogFormat* const format = new LogFormat("%m%n");
-    return *format;
+    static const NeverDestroyed<LogFormat> format("%m%n");
+    return format.value;
 }
 
 LogAppender& rootAppender() {
-    // The appender itself outlives everything; only its descriptor is closed at exit. What is
-    // logged even later finds a closed appender and not a destroyed one.
-    struct Root {
-        LogAppender* const appender = new LogAppender;
-        Root() {
-            appender->_fd = FileDescriptor(STDERR_FILENO);
-            appender->_fmt = &defaultFormat();
+    static NeverDestroyed<LogAppender> root;
+    // At exit only the descriptor is closed. Later messages find a closed appender.
+    static const struct Setup {
+        Setup() {
+            root.value._fd = FileDescriptor(STDERR_FILENO);
+            root.value._fmt = &defaultFormat();
             ::pthread_atfork(&LogAppender::lockAll, &LogAppender::unlockAll,
                              &LogAppender::unlockAll);
         }
-        ~Root() { appender->closeFd(); }
-    };
-    static const Root root;
-    return *root.appender;
+        ~Setup() { root.value.closeFd(); }
+    } setup;
+    return root.value;
 }
 
 LogAppenderMap& appenders() {
-    static Everlasting<LogAppenderMap> map;
+    static NeverDestroyed<LogAppenderMap> map;
     return map.value;
 }
 
 LogAppender::LogAppender() : _fd(-1) {}
 
-LogAppender::~LogAppender() {
-    if (!_filename.empty()) {
-        closeFd();
-    }
-}
-
-// Around a fork: the child has only the forking thread, so no other may hold a lock then.
+// Called before a fork. The child has only the forking thread, so no other may hold a lock then.
 void LogAppender::lockAll() {
     rootAppender()._mutex.NOLOG_lock();
     for (const auto& [name, appender] : appenders()) {
@@ -142,9 +114,7 @@ LogAppender* LogAppender::find(const std::string& name, bool create) {
     if (!create) {
         return nullptr;
     }
-    auto made = std::make_unique<LogAppender>();
-    appenders().emplace(name, made.get());
-    return made.release();
+    return appenders()[name] = new LogAppender;
 }
 
 bool LogAppender::setAttribute(const std::string& aname, const char* val,
@@ -180,9 +150,11 @@ void LogAppender::setFileName(std::string_view value, const Pathname& queltaHome
 
 bool LogAppender::setLayout(std::string_view name) {
     if (name == "BasicLayout") {
-        _fmt = basicLayout();
+        static const NeverDestroyed<LogFormat> layout("%R %p %c %m%n");
+        _fmt = &layout.value;
     } else if (name == "SimpleLayout") {
-        _fmt = simpleLayout();
+        static const NeverDestroyed<LogFormat> layout("%-8p: %m%n");
+        _fmt = &layout.value;
     } else if (name != "PatternLayout") {  // its pattern comes with the next key
         return false;
     }
@@ -220,89 +192,88 @@ void LogAppender::finalSetup(const char* name) {
         _maxBackupIndex = 0;
     }
     if (!_filename.empty()) {
-        closeFd();  // open already when another appender's setup was reported through this one
+        closeFd();  // open if another appender's setup was reported through this one
         openFile();
+        report(std::exchange(_failure, {}));
         closeFd();
     }
 }
 
 void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
-    const ErrnoKeeper keeper;
-    // An appender may be asked to report another one's trouble before its own setup is finished.
+    // An appender may have to report another's failure before its own setup is finished.
     const LogFormat* const layout = _fmt != nullptr ? _fmt : rootAppender()._fmt;
     std::string line;
     layout->apply(line, mdata, msg);
     Failure failure;
     {
         const ScopedLogLock lock(_mutex);
-        writeLine(line, mdata.stamp.sec(), failure);
+        writeLine(line, mdata.stamp.sec());
+        failure = std::exchange(_failure, {});
     }
+    const ReportMark mark(this);
     report(failure);
 }
 
-// Everything that `write` does under the lock.
-void LogAppender::writeLine(const std::string& line, time_t now, Failure& failure) {
+// Everything that `write` does under the lock. A closed file is opened first. If that fails, the
+// line is lost. If the write fails, the file is closed, so that the next line opens it again;
+// standard error stays open. Each failure is stored for the report.
+void LogAppender::writeLine(const std::string& line, time_t now) {
     if (_fd.valid() && !_filename.empty()) {
         checkIdentity(now);
     }
-    if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now, &failure)) {
+    if (!_fd.valid() && !_filename.empty() && !openAndInitFile(now)) {
         return;
     }
-    // Without a file and before its setup, an appender is asked to report another one's trouble.
+    // Before its setup, an appender without a file may have to report another's failure.
     const FileDescriptor out = _fd.valid() ? _fd : FileDescriptor(STDERR_FILENO);
     const ssize_t count = out.write(line);
-    if (count < 0 || (count == 0 && !line.empty())) {
-        if (count == 0) {
-            errno = ENOSPC;  // neither taken nor refused: the device is full
-        }
-        failed(Problem::WRITE, &failure);
+    if (count < 0) {
+        failed(CRIT, "writing to");
         if (!_filename.empty()) {
             closeFd();
         }
         return;
     }
-    const file_offset_t room = std::numeric_limits<file_offset_t>::max() - _curSize;
-    _curSize += std::min<file_offset_t>(count, room);
+    _curSize += count;
     if (_maxSize > 0 && _curSize > _maxSize && !_filename.empty()) {
-        rotateFile(now, &failure);
+        rotateFile(now);
     }
 }
 
-// Closes the file when it is not the one of that name any more: moved or deleted by someone else.
+// Closes the file if its name now refers to another file or to none.
 void LogAppender::checkIdentity(time_t now) {
-    // Unsigned, so that a clock that went back counts as a long time.
+    // Unsigned, so that a clock that was set back counts as a long time.
     const std::uint64_t elapsed =
         static_cast<std::uint64_t>(now) - static_cast<std::uint64_t>(_lastCheck);
     if (elapsed <= IDENTITY_CHECK_SECONDS) {
         return;
     }
     struct stat status;
-    if (uninterrupted([&] { return _filename.stat(&status); }) && status.st_ino == _inodeNum) {
+    if (_filename.stat(&status) && status.st_ino == _inodeNum) {
         _lastCheck = now;
     } else {
         closeFd();
     }
 }
 
-bool LogAppender::openFile(Failure* later) {
-    const bool opened = uninterrupted([this] {
+bool LogAppender::openFile() {
+    const bool opened = retryOnEintr([this] {
         _fd = _filename.openCreateOrAppend(Pathname::CREATE_NORMAL);
         return _fd.valid();
     });
     if (!opened) {
-        failed(Problem::OPEN, later);
-        return false;
+        failed(ERROR, "opening");
     }
-    return true;
+    return opened;
 }
 
-bool LogAppender::openAndInitFile(time_t now, Failure* later) {
-    if (!openFile(later)) {
+bool LogAppender::openAndInitFile(time_t now) {
+    if (!openFile()) {
         return false;
     }
     struct stat status;
-    if (!uninterrupted([&] { return _fd.stat(&status); })) {
-        failed(Problem::FSTAT, later);
+    if (!_fd.stat(&status)) {
+        failed(CRIT, "calling fstat on");
         closeFd();
         return false;
     }
@@ -312,20 +283,11 @@ bool LogAppender::openAndInitFile(time_t now, Failure* later) {
     return true;
 }
 
-void LogAppender::rotateFile(time_t now, Failure* later) {
+// Renames each file below the first free number to the next number, or deletes the last backup if
+// no number is free. Then starts a new file.
+// Deliberate: a failed rename is ignored; the next file may overwrite the one that stayed.
+void LogAppender::rotateFile(time_t now) {
     closeFd();
-    try {
-        shiftBackups();
-    } catch (const std::bad_alloc&) {
-        // The line that led here is written; the next one leads here again.
-    }
-    openAndInitFile(now, later);
-}
-
-// Makes the base file's name free: moves each file up to the first free number one further, or
-// deletes the last one when there is no free number.
-// Deliberate: a file that cannot be moved is not waited for; the next one may take its name.
-void LogAppender::shiftBackups() {
     Pathname from;
     Pathname to;
     unsigned suffix = 0;
@@ -333,18 +295,19 @@ void LogAppender::shiftBackups() {
         filenameWithSuffix(to, suffix);
         if (suffix >= _maxBackupIndex) {
             QUELTA_ASSERT(suffix == _maxBackupIndex);
-            uninterrupted([&] { return to.unlink(); });
+            to.unlink();
             break;
         }
-        if (!uninterrupted([&] { return to.exists(); })) {
+        if (!to.exists()) {
             break;
         }
     }
     for (; suffix > 0; --suffix) {
         filenameWithSuffix(from, suffix - 1);
-        uninterrupted([&] { return from.renameTo(to); });
+        from.renameTo(to);
         to.swap(from);
     }
+    openAndInitFile(now);
 }
 
 void LogAppender::filenameWithSuffix(Pathname& result, unsigned suffix) const {
@@ -358,30 +321,15 @@ void LogAppender::closeFd() {
     _fd.close();
 }
 
-// Notes a failure with the present errno, or reports it at once.
-void LogAppender::failed(Problem what, Failure* later) const {
-    const Failure failure{what, errno};
-    if (later != nullptr) {
-        *later = failure;
-    } else {
-        report(failure);
-    }
+// Stores that a call failed with the current errno.
+void LogAppender::failed(LogLevel level, const char* what) {
+    _failure = {level, what, errno};
 }
 
 void LogAppender::report(const Failure& failure) const {
-    const char* const name = _filename.c_str();
-    errno = failure.errnum;
-    switch (failure.what) {
-        case Problem::NONE:
-            break;
-        case Problem::OPEN:
-            LogFormat::internal(this, ERROR, "Error opening \"%s\": %m", name);
-            break;
-        case Problem::FSTAT:
-            LogFormat::internal(this, CRIT, "Error calling fstat on \"%s\": %m", name);
-            break;
-        case Problem::WRITE:
-            LogFormat::internal(this, CRIT, "Error writing to \"%s\": %m", name);
-            break;
+    if (failure.what != nullptr) {
+        errno = failure.errnum;
+        LogFormat::internal(this, failure.level, "Error %s \"%s\": %m", failure.what,
+                            _filename.c_str());
     }
 }

@@ -4,24 +4,24 @@
 // One output of the logging subsystem: a file, or standard error, with a layout, an optional size
 // limit with numbered backups, and a lock that keeps lines whole.
 //
-// Order of calls: `find` makes an appender and gives it its name, `setAttribute` fills it,
-// `finalSetup` ends the configuration, then only `write` is used. The file is opened by the first
-// write. It is closed and opened again by a rotation, after a failed write, and when somebody else
-// has moved or deleted it.
+// Order of calls: `find` creates an appender under its name, `setAttribute` sets its attributes,
+// `finalSetup` ends the configuration. After that only `write` is used. The first write opens the
+// file. A rotation closes it and opens a new one. After a failed write, or if another process has
+// moved or deleted the file, it is closed and the next write opens it again.
 //
-// Rotation: when the file has grown beyond `_maxSize`, app.log becomes app.log.1, app.log.1 becomes
-// app.log.2 and so on up to the first number that is free; app.log.N, N being `_maxBackupIndex`, is
-// deleted when no number is free.
+// Rotation: when the file is larger than `_maxSize`, app.log becomes app.log.1, app.log.1 becomes
+// app.log.2 and so on, up to the first number that is free. If no number is free, app.log.N is
+// deleted, where N is `_maxBackupIndex`.
 //
-// Failures never reach the caller. They go through LogFormat::internal to the other appenders of
-// the channel named "Logger", and they are sent after the lock is free again: appenders that report
-// to each other and all fail can neither wait for each other nor recurse.
+// Failures never reach the caller. LogFormat::internal reports them to the other appenders of the
+// channel named "Logger". Under the lock a failure is only stored; it is reported after the unlock.
+// Appenders that report to each other and all fail therefore neither deadlock nor recurse.
 //
 // Invariants: `_fd` is negative while the file is closed; `_curSize`, `_inodeNum` and `_lastCheck`
-// describe the file behind `_fd` and mean nothing while it is closed. An appender without a file
-// name writes to the descriptor that it has and is never rotated.
+// describe the file that `_fd` refers to and mean nothing while it is closed. An appender without a
+// file name writes to the descriptor that it has and is never rotated.
 //
-// A fork waits for the lines that named appenders are writing, so the child finds them unlocked and
+// A fork waits for the lines that named appenders are writing. The child finds them unlocked and
 // may log, too.
 //
 // Configured before other threads start; safe from any thread afterwards (serialised by `_mutex`).
@@ -35,6 +35,7 @@
 #include <string_view>
 
 #include "util/FileDescriptor.h"
+#include "util/LogLevel.h"
 #include "util/Mutex.h"
 #include "util/Pathname.h"
 
@@ -49,22 +50,20 @@ using LogAppenderMap = std::map<std::string, LogAppender*>;
 
 class LogAppender {
 public:
-    // Makes a closed appender without file name, size limit, backups and layout.
+    // Creates a closed appender without file name, size limit, backups and layout.
     LogAppender();
-    // Closes the file; standard error stays open.
-    ~LogAppender();
     LogAppender(const LogAppender&) = delete;
     LogAppender& operator=(const LogAppender&) = delete;
 
-    // Finds an appender by name; with `create`, makes it when it is absent. "rootAppender" always
-    // names the root appender, which is no member of appenders().
-    // Returns: the appender; null when it is absent and not to be made.
+    // Finds an appender by name; with `create`, creates it if it does not exist. "rootAppender"
+    // always names the root appender, which is not in appenders().
+    // Returns: the appender; null if it does not exist and `create` is false.
     // Owns: the appenders live until the process ends.
     static LogAppender* find(const std::string& name, bool create);
 
     // Sets one attribute: "fileName", "maxFileSize" (bytes), "maxBackupIndex", "layout"
     // ("BasicLayout", "SimpleLayout" or "PatternLayout") or "layout.ConversionPattern". A leading
-    // "${QUELTA_HOME}" of a file name stands for `queltaHome` unless that is empty.
+    // "${QUELTA_HOME}" of a file name is replaced by `queltaHome`, unless that is empty.
     // Deliberate: "fileName" appends, so the key given twice joins both values into one name.
     // Requires: `val` not null.
     // Returns: false, with nothing changed, for any other key, an unknown layout name and a number
@@ -72,25 +71,28 @@ public:
     [[nodiscard]] bool setAttribute(const std::string& aname, const char* val,
                                     const Pathname& queltaHome);
 
-    // Ends the configuration: takes the root appender's layout when there is none, turns an
-    // appender without a file to standard error, takes back settings that make no sense, and opens
-    // the file once, so that a bad path shows at start-up and not with the first message.
-    // `name` (not null) is used in the warnings.
+    // Ends the configuration. An appender without a layout takes the root appender's, and one
+    // without a file writes to standard error. Settings that make no sense are reset with a
+    // warning. The file is opened once, so that a bad path shows at start-up and not with the first
+    // message. `name` (not null) is used in the warnings.
     void finalSetup(const char* name);
 
-    // Writes one line, formatted by the layout, and rotates the file when it has grown beyond its
-    // limit. The time by which the file's identity is checked is the message's stamp.
-    // A line of which nothing could be written is reported and lost; a line cut short by a full
-    // device counts with the bytes that went out. The next line tries again. What a signal
-    // interrupts is made again at once.
-    // Errors: std::bad_alloc when the line cannot be formatted; errno is left as it was.
+    // Formats one line and writes it, then rotates the file if it is larger than its limit. Message
+    // stamps, not the clock, decide when the file's identity is checked.
+    // If nothing of a line can be written, that is reported and the line is lost. A line cut short
+    // by a full device counts with the bytes that were written. The next line tries again.
+    // Errors: std::bad_alloc when the line cannot be formatted. errno is not kept.
     // Cost: one `write`; at most one `stat` in five seconds of message time.
     void write(const LogMsgMetadata& mdata, const std::string& msg);
 
 private:
     friend LogAppender& rootAppender();
-    struct Failure;
-    enum class Problem { NONE, OPEN, FSTAT, WRITE };
+    // A failed system call, to be reported after the lock is released.
+    struct Failure {
+        LogLevel level = ERROR;
+        const char* what = nullptr;  // null: nothing failed
+        int errnum = 0;
+    };
 
     static void lockAll();
     static void unlockAll();
@@ -98,18 +100,17 @@ private:
     void setFileName(std::string_view value, const Pathname& queltaHome);
     bool setLayout(std::string_view name);
 
-    // The operations below run under the lock (but for the check at start-up). With `later` they
-    // leave a failure there, for a report after the unlock; with null they report at once.
-    bool openFile(Failure* later = nullptr);
-    bool openAndInitFile(time_t now, Failure* later = nullptr);
-    void rotateFile(time_t now, Failure* later = nullptr);
+    // The operations below run under the lock, except for the check at start-up. They store a
+    // failure in _failure, for a report after the unlock.
+    void writeLine(const std::string& line, time_t now);
+    void checkIdentity(time_t now);
+    bool openFile();
+    bool openAndInitFile(time_t now);
+    void rotateFile(time_t now);
     void filenameWithSuffix(Pathname& result, unsigned suffix) const;
     void closeFd();
 
-    void writeLine(const std::string& line, time_t now, Failure& failure);
-    void checkIdentity(time_t now);
-    void shiftBackups();
-    void failed(Problem what, Failure* later) const;
+    void failed(LogLevel level, const char* what);
     void report(const Failure& failure) const;
 
     FileDescriptor _fd;          // negative: closed
@@ -121,17 +122,18 @@ private:
     Mutex _mutex;                     // held around everything `write` does after formatting
     ino_t _inodeNum = 0;              // of the file when it was opened
     time_t _lastCheck = 0;            // seconds of message stamps: identity last confirmed
+    Failure _failure;                 // of the write under way; reported after the unlock
 };
 
 // The appender that takes every message of a channel without appenders: standard error, with the
-// default layout. Its descriptor is closed at exit. Made on first use.
+// default layout. Its descriptor is closed at exit. Created on first use.
 LogAppender& rootAppender();
 
-// The layout "%m%n". Made on first use.
+// The layout "%m%n". Created on first use.
 const LogFormat& defaultFormat();
 
-// Every named appender. Made on first use; neither the map nor an appender is ever destroyed, so
-// that loggers may write through them until the very end.
+// Every named appender. Created on first use. Neither the map nor an appender is ever destroyed, so
+// loggers may write through them until the process ends.
 LogAppenderMap& appenders();
 
 #endif  // QUELTA_UTIL_LOGAPPENDER_H_

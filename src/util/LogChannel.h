@@ -3,8 +3,8 @@
 
 // Log channels: named categories, each with a minimum level and a list of appenders.
 //
-// Loggers are bound to channels by name; the root channel stands for every name that has no
-// channel of its own. A new channel starts as a copy of the root channel as it is at that moment,
+// Loggers are bound to channels by name; a name without a channel of its own is bound to the root
+// channel. A new channel starts as a copy of the root channel as it is at that moment,
 // and later changes of the root channel do not reach it, so the root channel is set up first.
 //
 // An empty list of appenders means that the root appender (standard error) writes the messages.
@@ -21,14 +21,12 @@ class LogAppender;
 
 class LogChannel {
 public:
-    // Finds a channel by its name. For an unknown name, either makes a copy of the root channel
-    // under that name (`create`) or falls back to the root channel itself, recording nothing.
-    // Requires: `name` is not null.
+    // Finds a channel by its name. For an unknown name, either creates a copy of the root channel
+    // under that name (`create`) or returns the root channel itself, recording nothing.
     // Returns: never null.
     static LogChannel* find(const std::string& name, bool create);
-    static LogChannel* find(const char* name, bool create);
 
-    // Sets the minimum level by its name; upper case only, so "debug" is no level.
+    // Sets the minimum level by its name; upper case only, so "debug" is not a level.
     // Returns: false, with the level as it was, when `word` names no level.
     bool changeLevel(const std::string& word);
 
@@ -38,17 +36,17 @@ public:
     // Returns: false, with nothing changed, for any other word.
     bool applyConfWord(const std::string& word, bool* got_appender_p);
 
-    // Applies a configuration value: words between spaces, tabs and commas, all of them even when
-    // one is not accepted. The last level wins.
+    // Applies a configuration value: words separated by spaces, tabs and commas. All are applied,
+    // even if one is rejected. The last level wins.
     // Requires: `value` is not null.
-    // Returns: true when every word was accepted, so also when there is none.
+    // Returns: true if every word was accepted, also if there is none.
     bool setConfig(const char* value);
 
     // Hands a message to the appenders, in the order of the list; tests no level.
     void write(const LogMsgMetadata& mdata, const std::string& msg);
 
     // The same for a message about the appender `dont_touch` (null allowed), which does not get
-    // it; nor do appenders whose own failure is being reported on this thread.
+    // it; nor do appenders whose own failed write is being reported on this thread.
     // Returns: true when at least one appender got the message.
     bool write(const LogMsgMetadata& mdata, const std::string& msg, const LogAppender* dont_touch);
 

@@ -3,40 +3,30 @@
 #include <algorithm>
 #include <charconv>
 #include <ctime>
-#include <limits>
+#include <string_view>
 
 #include "util/Assert.h"
-#include "util/LogAtoms.h"
-#include "util/LogInternal.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Logger.h"
 #include "util/Thread.h"
 #include "util/Timeval.h"
+#include "util/internal/LogAtoms.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
-constexpr std::uint32_t MAX_WIDTH = std::numeric_limits<std::uint32_t>::max();
-
-// Reads a run of digits into `width`; a number beyond 32 bits reads as the largest. Without a
-// digit `width` stays as it is.
-// Returns: the first character behind the digits.
-const char* readWidth(const char* p, std::uint32_t& width) {
-    if (*p < '0' || *p > '9') {
-        return p;
-    }
-    std::uint64_t value = 0;
-    for (; *p >= '0' && *p <= '9'; ++p) {
-        value = std::min<std::uint64_t>(value * 10 + static_cast<unsigned>(*p - '0'), MAX_WIDTH);
-    }
-    width = static_cast<std::uint32_t>(value);
-    return p;
+// Reads a run of digits into `width`, which stays as it is without a digit and for a number beyond
+// 32 bits.
+// Returns: the first character after the digits.
+const char* readWidth(const char* p, const char* end, std::uint32_t& width) {
+    return std::from_chars(p, end, width).ptr;
 }
 
 // Fits the text that `out` holds from `mark` on into the widths of an atom.
 void fitWidths(std::string& out, std::size_t mark, const LogFormat::Atom& atom) {
     const std::size_t len = out.size() - mark;
     // Deliberate: a text that was cut is not padded, even when the maximum is below the minimum.
-    if (len > atom.maxw && atom.maxw != MAX_WIDTH) {
+    if (len > atom.maxw) {
         out.resize(mark + atom.maxw);
     } else if (len < atom.minw) {
         if (atom.justify == '\0') {
@@ -59,10 +49,7 @@ void appendNumber(std::string& out, long long value) {
 
 }  // namespace
 
-// Delegates, so that the destructor releases what was built when an allocation fails half way.
-LogFormat::LogFormat(const char* pattern) : LogFormat() {
-    QUELTA_ASSERT(pattern != nullptr);
-    _fmt = pattern;
+LogFormat::LogFormat(const char* pattern) : _fmt(pattern) {
     compile();
 }
 
@@ -91,7 +78,7 @@ void LogFormat::compile() {
 }
 
 // Compiles the conversion that begins at `p`.
-// Returns: the first character behind it; `end` for an incomplete one.
+// Returns: the first character after it; `end` for an incomplete one.
 const char* LogFormat::compileConversion(const char* p, const char* end) {
     QUELTA_ASSERT(*p == '%');
     ++p;
@@ -99,9 +86,9 @@ const char* LogFormat::compileConversion(const char* p, const char* end) {
     if (*p == '-' || *p == '0') {
         a->justify = *p++ == '-' ? '\0' : '0';
     }
-    p = readWidth(p, a->minw);
+    p = readWidth(p, end, a->minw);
     if (*p == '.') {
-        p = readWidth(p + 1, a->maxw);
+        p = readWidth(p + 1, end, a->maxw);
     }
     if (p == end) {
         --_atom_end;
@@ -126,46 +113,25 @@ const char* LogFormat::compileConversion(const char* p, const char* end) {
     return p;
 }
 
-// Returns: false for a character that is no conversion.
+// Returns: false for a character that is not a conversion.
 bool LogFormat::setKind(Atom& atom, char conversion, const char* arg, std::size_t arglen) {
-    switch (conversion) {
-        case 'm':
-            atom.what = Atom::MSG;
-            return true;
-        case 'n':
-            // Deliberate: keeps its widths, so "%3n" is two spaces and a line feed.
-            atom.what = Atom::STR;
-            atom.arg.str = "\n";
-            atom.slen = 1;
-            return true;
-        case 'c':
-            atom.what = Atom::CATEGORY;
-            return true;
-        case 'p':
-            atom.what = Atom::LEVEL;
-            return true;
-        case 't':
-            atom.what = Atom::THREADNAME;
-            return true;
-        case 'r':
-            atom.what = Atom::EPOCH_MSEC;
-            return true;
-        case 'R':
-            atom.what = Atom::EPOCH_SEC;
-            return true;
-        case 'u':
-            atom.what = Atom::TIME_PROC;
-            return true;
-        case 'd':
-            atom.arg.fdate = new LogFormattedDate(arg, arglen);
-            atom.what = Atom::TIME_FMT;
-            return true;
-        default:
-            return false;
+    static constexpr std::string_view CONVERSIONS = "mncptrRud";  // in the order of Atom::Kind
+    const std::size_t kind = CONVERSIONS.find(conversion);
+    if (kind == std::string_view::npos) {
+        return false;
     }
+    atom.what = static_cast<Atom::Kind>(kind);
+    if (atom.what == Atom::STR) {
+        // Deliberate: keeps its widths, so "%3n" is two spaces and a newline.
+        atom.arg.str = "\n";
+        atom.slen = 1;
+    } else if (atom.what == Atom::TIME_FMT) {
+        atom.arg.fdate = new LogFormattedDate(arg, arglen);
+    }
+    return true;
 }
 
-// Adds literal text, whose own length as both widths keeps it from being padded or cut.
+// Adds literal text. Both widths are its own length, so it is never padded or cut.
 void LogFormat::addLiteral(const char* begin, const char* end) {
     if (begin == end) {
         return;
@@ -174,8 +140,7 @@ void LogFormat::addLiteral(const char* begin, const char* end) {
     a->what = Atom::STR;
     a->arg.str = begin;
     a->slen = static_cast<std::size_t>(end - begin);
-    a->minw = static_cast<std::uint32_t>(std::min<std::size_t>(a->slen, MAX_WIDTH));
-    a->maxw = a->minw;
+    a->minw = a->maxw = static_cast<std::uint32_t>(a->slen);
     a->justify = '\0';
 }
 
@@ -191,24 +156,10 @@ LogFormat::Atom* LogFormat::new_atom() {
 }
 
 void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const {
-    const std::size_t mark = out.size();
-    try {
-        out.reserve(mark + likelyLength(mdata, msg));
-        CachedTm tm;
-        for (const Atom* a = _atoms; a != _atom_end; ++a) {
-            appendAtom(out, a, tm, mdata, msg);
-        }
-    } catch (...) {
-        out.resize(mark);
-        throw;
+    CachedTm tm;
+    for (const Atom* a = _atoms; a != _atom_end; ++a) {
+        appendAtom(out, a, tm, mdata, msg);
     }
-}
-
-// A guess that keeps most lines to one allocation: a date or a thread's name outgrows its
-// conversion by about 16 characters.
-std::size_t LogFormat::likelyLength(const LogMsgMetadata& mdata, const std::string& msg) const {
-    const auto natoms = static_cast<std::size_t>(_atom_end - _atoms);
-    return _fmt.size() + 16 * natoms + mdata.category->_channel_name_len + msg.size();
 }
 
 // Appends the text of one atom, fitted into its widths.

@@ -6,14 +6,15 @@
 // A pattern is parsed once, into an array of atoms; formatting a line walks the atoms and parses
 // nothing. A conversion is "%", an optional flag ("-" pads on the right, "0" pads with zeros), an
 // optional minimum width, an optional "." and maximum width, the conversion character and an
-// optional "{argument}", which only "d" reads. What cannot be read makes no error: an unknown
-// conversion vanishes, an incomplete one ends the pattern.
+// optional "{argument}", which only "d" uses. Malformed input is not an error: an unknown
+// conversion is dropped, an incomplete one ends the pattern.
 //
 //     LogFormat layout("%-8p: %m%n");          // once
 //     layout.apply(line, metadata, message);   // per line, appends to `line`
 //
-// A date argument is split once more, by LogFormattedDate, into strftime pieces and milliseconds.
-// The local time that the pieces share is kept in a CachedTm, which lives for one line.
+// LogFormattedDate splits a date argument once more, into strftime pieces and milliseconds. The
+// pieces of one line share their local time, which a CachedTm holds. Both are defined in
+// LogFormattedDate.cpp.
 //
 // LogFormat and LogFormattedDate: immutable after construction; safe to share.
 // CachedTm: not thread-safe; one thread at a time per object.
@@ -44,15 +45,15 @@ private:
     bool _stampSet = false;  // whether _stamp is filled
 };
 
-// A compiled conversion pattern. Also the home of the routing that every entry point of Logger
-// goes through (in LogRouting.cpp), as it needs the private parts of loggers and channels that a
-// layout needs too.
+// A compiled conversion pattern. The class also has the routing functions that every entry point of
+// Logger calls; they are defined in internal/LogRouting.cpp. They are members because, like a
+// layout, they need the private fields of loggers.
 class LogFormat {
 public:
     struct Atom {
         enum Kind : std::uint32_t {
             MSG,         // m  the message
-            STR,         // n  a line feed; also literal text
+            STR,         // n  a newline; also literal text
             CATEGORY,    // c  the logger's channel name
             LEVEL,       // p  the name of the level
             THREADNAME,  // t  the name of the current thread
@@ -75,15 +76,15 @@ public:
 
     // Compiles a pattern.
     // Requires: `pattern` is not null.
-    // Errors: std::bad_alloc; a malformed pattern is none.
+    // Errors: std::bad_alloc; a malformed pattern is not an error.
     explicit LogFormat(const char* pattern);
     ~LogFormat();
     LogFormat(const LogFormat&) = delete;
     LogFormat& operator=(const LogFormat&) = delete;
 
-    // Appends the line for one message to `out`; a final line feed comes only from "%n".
-    // Requires: `msg` and `out` are different objects.
-    // Errors: std::bad_alloc, with `out` as it was.
+    // Appends the line for one message to `out`; a final newline comes only from "%n".
+    // Requires: `msg` and `out` are different objects; only "%c" needs `mdata.category`.
+    // Errors: std::bad_alloc.
     // Threads: safe from any thread.
     // Cost: at most one conversion to local time, none without a date.
     void apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const;
@@ -99,14 +100,12 @@ public:
     static bool check_for_unitialized_logger(const Logger* logger);
 
     // Reports a failure of the logging subsystem itself, to every appender of the channel "Logger"
-    // but `failing` (null allowed), and to standard error when none takes it. errno is kept, and
-    // read by "%m".
+    // except `failing` (null allowed), and to standard error if none takes it. "%m" prints errno,
+    // which is preserved.
     static void internal(const LogAppender* failing, LogLevel level, const char* fmt, ...)
         __attribute__((format(printf, 3, 4)));
 
 private:
-    LogFormat() = default;
-
     void compile();
     const char* compileConversion(const char* p, const char* end);
     static bool setKind(Atom& atom, char conversion, const char* arg, std::size_t arglen);
@@ -114,7 +113,6 @@ private:
     Atom* new_atom();
     void appendAtom(std::string& out, const Atom* a, CachedTm& tm, const LogMsgMetadata& mdata,
                     const std::string& msg) const;
-    std::size_t likelyLength(const LogMsgMetadata& mdata, const std::string& msg) const;
 
     std::string _fmt;              // the pattern; literal atoms point into it
     Atom* _atoms = nullptr;        // array of _max_atoms, owned
@@ -122,7 +120,8 @@ private:
     std::uint32_t _max_atoms = 0;  // capacity of the array
 };
 
-// A compiled date format: strftime syntax, in which "%l" stands for three digits of milliseconds.
+// A compiled date format: strftime syntax, in which "%l" is replaced by three digits of
+// milliseconds.
 class LogFormattedDate {
 public:
     struct Atom {
@@ -136,7 +135,7 @@ public:
     };
 
     // Compiles a date format of `fmtlen` characters. Null or empty selects ISO8601; the names
-    // "DATE", "ISO8601" and "ABSOLUTE" stand for their patterns.
+    // "DATE", "ISO8601" and "ABSOLUTE" select their patterns.
     // Errors: std::bad_alloc.
     LogFormattedDate(const char* fmtstr, std::size_t fmtlen);
     ~LogFormattedDate();
@@ -155,8 +154,6 @@ private:
         char* str = nullptr;
         StringStorage* next = nullptr;
     };
-
-    LogFormattedDate() = default;
 
     void compile(const char* fmtstr, const char* fmtend);
     void addPiece(const char* begin, const char* end);

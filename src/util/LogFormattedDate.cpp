@@ -3,28 +3,27 @@
 #include <algorithm>
 #include <cstring>
 #include <ctime>
-#include <memory>
 #include <string>
 #include <string_view>
 
 #include "util/Assert.h"
-#include "util/LogAtoms.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Timeval.h"
+#include "util/internal/LogAtoms.h"
 
 namespace {
 
 using std::string_view;
 
-// A buffer that has grown to the larger of these and still holds nothing stops growing: the text is
-// empty, as that of "%Z" is in a zone without a name.
+// The buffer stops growing at the larger of these. If strftime still yields nothing, the text is
+// empty, as that of "%Z" in a zone without a name.
 constexpr std::size_t MIN_BUFFER_CAP = std::size_t{1} << 20;  // bytes
 constexpr std::size_t CAP_PER_CHARACTER = 256;                // bytes per character of the piece
 
 constexpr string_view MSEC_CONVERSION = "%l";
 constexpr string_view ISO8601_PATTERN = "%Y-%m-%d %H:%M:%S,%l";
 
-// Returns: the pattern that a date argument stands for, which is itself unless it is a name.
+// Returns: the pattern that a date argument selects: that of a name, or the argument itself.
 string_view datePattern(string_view arg) {
     if (arg.empty() || arg == "ISO8601") {
         return ISO8601_PATTERN;
@@ -40,15 +39,12 @@ string_view datePattern(string_view arg) {
 
 // Appends the milliseconds of a stamp, three digits.
 void appendMsec(std::string& out, const Timeval& stamp) {
-    const auto msec = static_cast<int>(stamp.msec() - stamp.sec() * 1000);
-    const char digits[] = {static_cast<char>('0' + msec / 100),
-                           static_cast<char>('0' + msec / 10 % 10),
-                           static_cast<char>('0' + msec % 10)};
-    out.append(digits, sizeof(digits));
+    const std::string padded = std::to_string(1000 + stamp.msec() - stamp.sec() * 1000);
+    out.append(padded, 1);
 }
 
-// Returns: whether strftime may yield no text for a piece, which it tells like a buffer that is too
-// small. Only "%p", in any spelling, is known to: there are languages without AM and PM.
+// Returns: whether strftime may legitimately produce no text for a piece, which it reports like a
+// buffer that is too small. Only "%p" with any flags can: some locales have no AM and PM.
 bool mayBeEmpty(const char* piece) {
     for (const char* p = piece; *p != '\0'; ++p) {
         if (*p++ != '%') {
@@ -70,34 +66,28 @@ bool mayBeEmpty(const char* piece) {
     return true;
 }
 
-// Appends a piece that does not fit a buffer of `size` bytes.
-void appendLongPiece(std::string& out, CachedTm& tm, const char* piece, std::size_t size,
-                     const LogMsgMetadata& mdata) {
-    const std::size_t cap = std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece));
-    while (size < cap) {
-        size = std::min(2 * size, cap);
-        const std::unique_ptr<char[]> buf(new char[size]);
-        const std::size_t len = tm.ftime(buf.get(), size, piece, mdata);
+void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsgMetadata& mdata) {
+    char first[64];
+    std::string larger;
+    char* buf = first;
+    for (std::size_t size = sizeof(first);; size *= 2) {
+        const std::size_t len = tm.ftime(buf, size, piece, mdata);
         if (len > 0 && len < size) {
-            out.append(buf.get(), len);
+            out.append(buf, len);
             return;
         }
-    }
-}
-
-void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsgMetadata& mdata) {
-    char buf[64];
-    const std::size_t len = tm.ftime(buf, sizeof(buf), piece, mdata);
-    if (len > 0 && len < sizeof(buf)) {
-        out.append(buf, len);
-    } else if (len > 0 || !mayBeEmpty(piece)) {
-        appendLongPiece(out, tm, piece, sizeof(buf), mdata);
+        if ((len == 0 && mayBeEmpty(piece)) ||
+            size >= std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece))) {
+            return;
+        }
+        larger.resize(2 * size);
+        buf = larger.data();
     }
 }
 
 }  // namespace
 
-// The pieces of a layout are read from a configuration: no compiler can check them.
+// The format comes from a configuration file, so the compiler cannot check it.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
 std::size_t CachedTm::ftime(char* buf, std::size_t size, const char* fmt,
@@ -110,8 +100,7 @@ std::size_t CachedTm::ftime(char* buf, std::size_t size, const char* fmt,
 }
 #pragma GCC diagnostic pop
 
-// Delegates, so that the destructor releases what was built when an allocation fails half way.
-LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) : LogFormattedDate() {
+LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) {
     const string_view pattern =
         datePattern(fmtstr == nullptr ? string_view() : string_view(fmtstr, fmtlen));
     compile(pattern.data(), pattern.data() + pattern.size());
@@ -119,15 +108,16 @@ LogFormattedDate::LogFormattedDate(const char* fmtstr, std::size_t fmtlen) : Log
 
 LogFormattedDate::~LogFormattedDate() {
     while (_sstor != nullptr) {
-        const std::unique_ptr<StringStorage> node(_sstor);
+        StringStorage* const node = _sstor;
         _sstor = node->next;
         delete[] node->str;
+        delete node;
     }
     delete[] _atoms;
 }
 
 // Splits [fmtstr, fmtend) at every "%l".
-// Deliberate: "%l" is found wherever the two characters stand, behind another "%" too.
+// Deliberate: "%l" is recognised wherever the two characters occur, even after another "%".
 void LogFormattedDate::compile(const char* fmtstr, const char* fmtend) {
     const char* p = fmtstr;
     while (p < fmtend) {
@@ -169,13 +159,10 @@ LogFormattedDate::Atom* LogFormattedDate::new_atom() {
 
 // Returns: a NUL-terminated copy that lives as long as this object.
 const char* LogFormattedDate::store_string(const char* str, std::size_t len) {
-    auto node = std::make_unique<StringStorage>();
-    node->str = new char[len + 1];
-    std::memcpy(node->str, str, len);
-    node->str[len] = '\0';
-    node->next = _sstor;
-    _sstor = node.release();
-    return _sstor->str;
+    char* const copy = new char[len + 1];
+    copy[std::string_view(str, len).copy(copy, len)] = '\0';
+    _sstor = new StringStorage{copy, _sstor};
+    return copy;
 }
 
 void LogFormattedDate::fmt(std::string& out, CachedTm& tm, const LogMsgMetadata& mdata) const {

@@ -9,6 +9,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <string_view>
 
 enum LogLevel : std::int32_t {
     DEBUG = 0,
@@ -22,23 +23,15 @@ enum LogLevel : std::int32_t {
     EMERG = 8
 };
 
-// The name of a level, not padded; "???" for a value that is none of them.
+// The name of a level, not padded; "???" for any other value.
 // Requires: `slenp` is not null; the length of the name is stored there.
 // Returns: a constant text.
 inline const char* loglevel2str(std::size_t* slenp, LogLevel level) {
-    struct Name {
-        const char* text;
-        std::size_t length;
-    };
-    static constexpr Name NAMES[] = {{"DEBUG", 5}, {"INFO", 4},  {"NOTICE", 6},
-                                     {"WARN", 4},  {"ERROR", 5}, {"CRIT", 4},
-                                     {"ALERT", 5}, {"FATAL", 5}, {"EMERG", 5}};
-    static constexpr Name UNKNOWN = {"???", 3};
-
-    const auto index = static_cast<std::uint32_t>(level);
-    const Name& name = index <= static_cast<std::uint32_t>(EMERG) ? NAMES[index] : UNKNOWN;
-    *slenp = name.length;
-    return name.text;
+    static constexpr std::string_view NAMES[] = {"DEBUG", "INFO",  "NOTICE", "WARN", "ERROR",
+                                                 "CRIT",  "ALERT", "FATAL",  "EMERG"};
+    const std::string_view name = level >= DEBUG && level <= EMERG ? NAMES[level] : "???";
+    *slenp = name.size();
+    return name.data();
 }
 
 #endif  // QUELTA_UTIL_LOGLEVEL_H_

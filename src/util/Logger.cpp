@@ -1,37 +1,23 @@
-// Keeps the inline bodies of the entry points out of this source, which holds their other ones.
-#define QUELTA_LOGGER_OUT_OF_LINE
-
 #include "util/Logger.h"
 
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
-#include <memory>
-#include <stdexcept>
 
 #include "util/Assert.h"
-#include "util/ErrorText.h"
 #include "util/LogAppender.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/Timeval.h"
-
-constinit bool logger_initialized = false;
-constinit Logger* uninitialized_loggers = nullptr;
-
-Timeval& epoch_timeval() {
-    static Timeval epoch = Timeval::now();
-    return epoch;
-}
+#include "util/internal/ErrnoKeeper.h"
+#include "util/internal/ErrorText.h"
+#include "util/internal/FileCloser.h"
+#include "util/internal/FormatText.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/RetryOnEintr.h"
 
 namespace {
 
-constexpr std::size_t FIRST_BUFFER_SIZE = 256;
 constexpr std::size_t ERROR_TEXT_SIZE = 1000;
-
-// A C library that does not tell the length it needs is given up at this buffer size: the format
-// is at fault then (a wide character that has no multibyte form, say), and no size would do.
-constexpr std::size_t MAX_GUESSED_SIZE = std::size_t{1024} * 1024;
 
 // The format with every "%m" replaced by the text of `errnum`.
 std::string withErrorText(const char* fmt, int errnum) {
@@ -45,42 +31,18 @@ std::string withErrorText(const char* fmt, int errnum) {
         } else if (*++p == 'm') {
             result += inserted;
         } else {
-            result += "%%";  // a pair, whose second half begins no "%m"
+            result += "%%";  // a pair, whose second half does not begin a "%m"
         }
     }
     return result;
-}
-
-__attribute__((format(printf, 2, 0))) void formatInto(std::string& out, const char* fmt,
-                                                      va_list ap) {
-    char first[FIRST_BUFFER_SIZE];
-    std::unique_ptr<char[]> larger;
-    char* buf = first;
-    std::size_t size = sizeof first;
-    for (;;) {
-        va_list attempt;
-        va_copy(attempt, ap);
-        const int length = std::vsnprintf(buf, size, fmt, attempt);
-        va_end(attempt);
-        if (length >= 0 && static_cast<std::size_t>(length) < size) {
-            out.assign(buf, static_cast<std::size_t>(length));
-            return;
-        }
-        // A text longer than an int can tell has cost seconds already; every further attempt would.
-        if (length < 0 && (errno == EOVERFLOW || size >= MAX_GUESSED_SIZE)) {
-            throw std::runtime_error("cannot format a log message");
-        }
-        size = length < 0 ? 2 * size : static_cast<std::size_t>(length) + 1;
-        larger = std::make_unique_for_overwrite<char[]>(size);
-        buf = larger.get();
-    }
 }
 
 }  // namespace
 
 Logger::Logger(const char* name)
     : _channel_name(name), _channel_name_len(std::strlen(name)), _channel(nullptr), _next(nullptr) {
-    // Whatever is complete before this constructor is destroyed after this logger.
+    // A static object whose constructor has ended before this one begins is destroyed after this
+    // logger. So the root appender's descriptor is closed after the last message of this logger.
     rootAppender();
     if (logger_initialized) {
         _channel = LogChannel::find(name, false);
@@ -90,19 +52,11 @@ Logger::Logger(const char* name)
     }
 }
 
-Logger::Logger(const Logger& other)
-    : _channel_name(other._channel_name),
-      _channel_name_len(other._channel_name_len),
-      _channel(other._channel),
-      _next(nullptr) {}
-
 // The link stays: it belongs to this logger's place in the list, if it has one.
 Logger& Logger::operator=(const Logger& other) {
-    if (this != &other) {
-        _channel_name = other._channel_name;
-        _channel_name_len = other._channel_name_len;
-        _channel = other._channel;
-    }
+    _channel_name = other._channel_name;
+    _channel_name_len = other._channel_name_len;
+    _channel = other._channel;
     return *this;
 }
 
@@ -115,8 +69,8 @@ Logger::~Logger() {
     }
 }
 
-bool Logger::rootDebugEnabled() {
-    return rootChannel().minlevel < INFO;
+bool Logger::isDebugEnabled() const {
+    return (_channel != nullptr ? *_channel : rootChannel()).minlevel < INFO;
 }
 
 void Logger::initialize() {
@@ -131,22 +85,47 @@ void Logger::initialize() {
     }
 }
 
+bool Logger::initialize(const Pathname& cfgFile, const Pathname& queltaHome) {
+    QUELTA_ASSERT(!logger_initialized);
+    epoch_timeval();
+    OpenFile file;
+    const bool opened = retryOnEintr([&] {
+        file.reset(cfgFile.fopen("r"));
+        return file != nullptr;
+    });
+    if (!opened) {
+        {
+            const ErrnoKeeper errnoKeeper;
+            initialize();
+        }
+        LogFormat::internal(nullptr, ERROR, "Couldn't open log file configuration \"%s\": %m",
+                            cfgFile.c_str());
+        return false;
+    }
+    ConfigReader reader(file.get(), queltaHome);
+    reader.readLines();
+    file.reset();
+    reader.setUpChannels();
+    initialize();
+    for (const auto& [name, appender] : appenders()) {
+        appender->finalSetup(name.c_str());
+    }
+    reader.report(cfgFile);
+    return reader.complete();
+}
+
 bool Logger::setChannelLevel(const char* name, const std::string& level) {
     LogChannel& channel = name == nullptr ? rootChannel() : *LogChannel::find(name, true);
     return channel.changeLevel(level);
 }
 
 void Logger::vformat(std::string& out, int errnum, const char* fmt, va_list ap) {
-    if (std::strstr(fmt, "%m") == nullptr) {
-        formatInto(out, fmt, ap);
-        return;
+    std::string expanded;
+    if (std::strstr(fmt, "%m") != nullptr) {
+        expanded = withErrorText(fmt, errnum);
+        fmt = expanded.c_str();
     }
-    const std::string expanded = withErrorText(fmt, errnum);
-// The compiler has checked `fmt` where the caller wrote it.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wformat-nonliteral"
-    formatInto(out, expanded.c_str(), ap);
-#pragma GCC diagnostic pop
+    formatText(fmt, ap, [&](const char* text, std::size_t length) { out.assign(text, length); });
 }
 
 void Logger::format(std::string& out, const char* fmt, ...) {
@@ -164,35 +143,44 @@ void Logger::format(std::string& out, int errnum, const char* fmt, ...) {
     va_end(ap);
 }
 
-void Logger::route(LogLevel level, const std::string& msg) {
-    LogFormat::do_log(this, level, msg);
-}
-
-void Logger::route(LogLevel level, const char* fmt, ...) {
+void Logger::fatal(const char* fmt, ...) {
     va_list ap;
     va_start(ap, fmt);
-    LogFormat::do_log(this, level, fmt, ap);
+    LogFormat::do_log(this, FATAL, fmt, ap);
     va_end(ap);
 }
 
-// The bodies of the printf-style entry points differ in the level alone, but a variadic function
-// cannot hand its arguments on before it has taken them.
-#define QUELTA_LOG_ENTRY_POINT(method, level)    \
-    void Logger::method(const char* fmt, ...) {  \
-        if (suppresses(level)) {                 \
-            return;                              \
-        }                                        \
-        va_list ap;                              \
-        va_start(ap, fmt);                       \
-        LogFormat::do_log(this, level, fmt, ap); \
-        va_end(ap);                              \
-    }
+void Logger::crit(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, CRIT, fmt, ap);
+    va_end(ap);
+}
 
-QUELTA_LOG_ENTRY_POINT(fatal, FATAL)
-QUELTA_LOG_ENTRY_POINT(crit, CRIT)
-QUELTA_LOG_ENTRY_POINT(error, ERROR)
-QUELTA_LOG_ENTRY_POINT(warn, WARN)
-QUELTA_LOG_ENTRY_POINT(info, INFO)
-QUELTA_LOG_ENTRY_POINT(debug, DEBUG)
+void Logger::error(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, ERROR, fmt, ap);
+    va_end(ap);
+}
 
-#undef QUELTA_LOG_ENTRY_POINT
+void Logger::warn(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, WARN, fmt, ap);
+    va_end(ap);
+}
+
+void Logger::info(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, INFO, fmt, ap);
+    va_end(ap);
+}
+
+void Logger::debug(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    LogFormat::do_log(this, DEBUG, fmt, ap);
+    va_end(ap);
+}

@@ -6,22 +6,23 @@
 //     static Logger logger("Pathname");                    // one per module, before main
 //     logger.error("cannot open %s: %m", path.c_str());    // anywhere, on any thread
 //
-// A logger is bound to the channel of its name. Loggers made before logging is initialized wait in
-// a list for Logger::initialize(), which binds them, newest first; later ones are bound at once.
-// Binding happens once: a channel that is made afterwards is not seen by the loggers of its name.
+// A logger is bound to the channel of its name. Loggers constructed before logging is initialized
+// wait in a list for Logger::initialize(), which binds them, newest first. Later ones are bound
+// when they are constructed. Binding happens once: a channel that is created afterwards is not seen
+// by the loggers of its name.
 //
 // Before initialization a waiting logger writes through the root channel: INFO and above go to
 // standard error as the bare message, DEBUG is dropped. A logger that is not on the list then (a
-// copy, or a static one whose constructor has not run yet) can promise nothing about levels: its
+// copy, or a static one whose constructor has not run yet) cannot be filtered by level: its
 // messages go to standard error as "LEVEL - message", whatever the level.
 //
-// This header brings the whole of logging along: channels, appenders, layouts and the paths that
-// name the configuration.
+// This header includes all of logging: channels, appenders, layouts and Pathname.
 //
 // No entry point reports an error to its caller, throws, or changes errno.
 //
-// Loggers may be used before main and in destructors at exit: what a logger needs is
-// constant-initialized, or made by the first logger's constructor and so outlives it.
+// Loggers may be used before main and in destructors at exit. What a logger needs is either
+// constant-initialized or created by the first logger's constructor. Static objects are destroyed
+// in reverse order, so it outlives every logger.
 // Configured before other threads start; safe from any thread afterwards.
 
 #include <cstdarg>
@@ -40,53 +41,50 @@ public:
     // Requires: `name` is not null and outlives the logger; the pointer is kept, not the text.
     explicit Logger(const char* name);
     // A copy logs to the same channel under the same name, but never waits to be bound.
-    Logger(const Logger& other);
+    Logger(const Logger& other) = default;
     Logger& operator=(const Logger& other);
-    // Takes a logger that still waits to be bound off the list.
+    // Removes the logger from the list if it still waits to be bound.
     ~Logger();
 
     // True when the channel's level is DEBUG, so that callers can skip building expensive text.
-    bool isDebugEnabled() const {
-        return _channel != nullptr ? _channel->minlevel < INFO : rootDebugEnabled();
-    }
+    bool isDebugEnabled() const;
 
-    // The entry points. The first form of each takes a printf format, in which "%m" stands for the
-    // text of errno; the second takes the message as it stands; the third takes e.what().
+    // The entry points. The first form of each takes a printf format, in which "%m" is replaced by
+    // the text of errno. The second takes the message unchanged, the third logs e.what().
     // Cost: one comparison when the message is below the channel's level.
     void fatal(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void fatal(const std::string& msg) { log(FATAL, msg); }
-    void fatal(const std::exception& e) { log(FATAL, e); }
+    void fatal(const std::string& msg) { LogFormat::do_log(this, FATAL, msg); }
+    void fatal(const std::exception& e) { fatal("%s", e.what()); }
     void crit(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void crit(const std::string& msg) { log(CRIT, msg); }
-    void crit(const std::exception& e) { log(CRIT, e); }
+    void crit(const std::string& msg) { LogFormat::do_log(this, CRIT, msg); }
+    void crit(const std::exception& e) { crit("%s", e.what()); }
     void error(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void error(const std::string& msg) { log(ERROR, msg); }
-    void error(const std::exception& e) { log(ERROR, e); }
+    void error(const std::string& msg) { LogFormat::do_log(this, ERROR, msg); }
+    void error(const std::exception& e) { error("%s", e.what()); }
     void warn(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void warn(const std::string& msg) { log(WARN, msg); }
-    void warn(const std::exception& e) { log(WARN, e); }
+    void warn(const std::string& msg) { LogFormat::do_log(this, WARN, msg); }
+    void warn(const std::exception& e) { warn("%s", e.what()); }
     void info(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void info(const std::string& msg) { log(INFO, msg); }
-    void info(const std::exception& e) { log(INFO, e); }
+    void info(const std::string& msg) { LogFormat::do_log(this, INFO, msg); }
+    void info(const std::exception& e) { info("%s", e.what()); }
     void debug(const char* fmt, ...) __attribute__((format(printf, 2, 3)));
-    void debug(const std::string& msg) { log(DEBUG, msg); }
-    void debug(const std::exception& e) { log(DEBUG, e); }
+    void debug(const std::string& msg) { LogFormat::do_log(this, DEBUG, msg); }
+    void debug(const std::exception& e) { debug("%s", e.what()); }
 
     // Fixes the logging epoch and binds the waiting loggers.
     // Requires: logging is not initialized yet (assertion).
     static void initialize();
 
     // The same, after setting up appenders and channels from a configuration file.
-    // Returns: false when the file could not be opened, or ends inside a comment.
+    // Returns: false if the file could not be opened, or ends inside a comment.
     static bool initialize(const Pathname& cfgFile, const Pathname& queltaHome);
 
-    // Sets the minimum level of a channel, which is made when it does not exist, even for a word
-    // that is no level; null names the root channel.
-    // Returns: false when `level` names no level.
+    // Sets the minimum level of a channel; null names the root channel. The channel is created if
+    // it does not exist, even if `level` is not a level. Returns: false if `level` is not a level.
     static bool setChannelLevel(const char* name, const std::string& level);
 
-    // printf into a string, replacing it. "%m" stands for the error text of `errnum`, or of errno
-    // in the form without one; "UNKNOWN ERROR" for a number that is no error.
+    // printf into a string, replacing it. "%m" is replaced by the error text of `errnum`, or of
+    // errno in the form without one; by "UNKNOWN ERROR" for a number that is not an error.
     // Deliberate: the error text becomes a part of the format, so that a "%" in it would be read
     // as a conversion.
     // Requires: the arguments fit the format; they may point into `out`.
@@ -102,52 +100,10 @@ public:
 private:
     friend class LogFormat;  // the layouts print the name; the routing reads the channel
 
-    // False for every message of a logger that is not bound, which needs a closer look.
-    bool suppresses(LogLevel level) const {
-        return _channel != nullptr && level < _channel->minlevel;
-    }
-    void log(LogLevel level, const std::string& msg) {
-        if (!suppresses(level)) {
-            route(level, msg);
-        }
-    }
-    void log(LogLevel level, const std::exception& e) {
-        if (!suppresses(level)) {
-            route(level, "%s", e.what());
-        }
-    }
-    void route(LogLevel level, const std::string& msg);
-    void route(LogLevel level, const char* fmt, ...) __attribute__((format(printf, 3, 4)));
-    static bool rootDebugEnabled();
-
     const char* _channel_name;      // not owned
     std::size_t _channel_name_len;  // its length, for the layouts
     LogChannel* _channel;           // not owned; null, read as the root channel, until bound
     Logger* _next;                  // the next older logger that waits to be bound
 };
-
-// g++ can hand variadic arguments on from a function that is always inlined, and so tests the level
-// where the message is written; with other compilers the test is the first thing behind the call.
-// Each body here shadows the ordinary function of that name in Logger.cpp, which is what a pointer
-// to the member points to (gnu_inline).
-#if defined(__GNUC__) && !defined(__clang__) && !defined(QUELTA_LOGGER_OUT_OF_LINE)
-#define QUELTA_LOG_ENTRY_POINT(method, level)                                          \
-    inline __attribute__((always_inline, gnu_inline, artificial)) void Logger::method( \
-        const char* fmt, ...) {                                                        \
-        if (!suppresses(level)) {                                                      \
-            route(level, fmt, __builtin_va_arg_pack());                                \
-        }                                                                              \
-    }
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wformat-nonliteral"  // checked where the message is written
-QUELTA_LOG_ENTRY_POINT(fatal, FATAL)
-QUELTA_LOG_ENTRY_POINT(crit, CRIT)
-QUELTA_LOG_ENTRY_POINT(error, ERROR)
-QUELTA_LOG_ENTRY_POINT(warn, WARN)
-QUELTA_LOG_ENTRY_POINT(info, INFO)
-QUELTA_LOG_ENTRY_POINT(debug, DEBUG)
-#pragma GCC diagnostic pop
-#undef QUELTA_LOG_ENTRY_POINT
-#endif
 
 #endif  // QUELTA_UTIL_LOGGER_H_

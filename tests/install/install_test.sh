@@ -24,9 +24,7 @@ for file in bin/Rete include/quelta/util/LoaderInfo.h include/quelta/util/Logger
     share/man/man5/log-cmdline.cfg.5 share/quelta/sample/etc/log-cmdline.cfg; do
     [ -s "$prefix/$file" ] || fail "missing: $file"
 done
-for file in LogAtoms.h LogConfig.h LogInternal.h; do
-    [ ! -e "$prefix/include/quelta/util/$file" ] || fail "internal, but installed: $file"
-done
+[ ! -e "$prefix/include/quelta/util/internal" ] || fail "internal headers are installed"
 for link in $(grep -o ']([^)]*)' "$prefix/share/doc/quelta/README.md" | tr -d ']()'); do
     [ -e "$prefix/share/doc/quelta/$link" ] || fail "the README links to $link"
 done

@@ -18,7 +18,7 @@
 #include "support/InChild.h"
 #include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"

@@ -11,12 +11,13 @@
 
 #include "support/FileAppender.h"
 #include "support/NumberedLines.h"
+#include "support/ScriptedLibc.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "support/TimeZone.h"
 #include "util/LogChannel.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
@@ -26,22 +27,12 @@ constexpr long long START = 1700000000;
 // What the clock of this process shows.
 struct timeval clockShows {};
 
-}  // namespace
-
-extern "C" int __wrap_gettimeofday(struct timeval* now, void* zone);
-extern "C" int __wrap_gettimeofday(struct timeval* now, void* /*zone*/) {
-    *now = clockShows;
-    return 0;
-}
-
-namespace {
-
 void setClock(long long seconds, long microseconds = 0) {
     clockShows.tv_sec = seconds;
     clockShows.tv_usec = microseconds;
 }
 
-// The moment that the clock shows, as the C library has it at this moment.
+// The scripted time in the C library's current time zone.
 std::string localTime() {
     struct tm local {};
     EXPECT_NE(nullptr, ::localtime_r(&clockShows.tv_sec, &local));
@@ -53,9 +44,14 @@ std::string localTime() {
 }
 
 // A logger whose lines, dated by the clock, go to a file.
-class LogClock : public testing::Test {
+class LogClockTest : public testing::Test {
 protected:
-    LogClock() {
+    const Replacement<std::function<int(struct timeval*, void*)>> _clock{
+        replacement::gettimeofday, [](struct timeval* now, void*) {
+            *now = clockShows;
+            return 0;
+        }};
+    LogClockTest() {
         setClock(START);
         if (!logger_initialized) {
             Logger::initialize();
@@ -85,7 +81,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogClock, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
+TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     _log._maxSize = 2000;
     _log._maxBackupIndex = 10000;
@@ -104,7 +100,7 @@ TEST_F(LogClock, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
 
 // A clock that was set says nothing about the time since the last check: both directions count as
 // a long one.
-TEST_F(LogClock, AStepByHoursLeadsToACheckOfTheFile) {
+TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
     for (const long long step : {HOUR, -HOUR, 12 * HOUR, -12 * HOUR, 9000 * HOUR, -9000 * HOUR}) {
         line("before", START);
         const std::string moved = _file + ".moved";
@@ -121,7 +117,7 @@ TEST_F(LogClock, AStepByHoursLeadsToACheckOfTheFile) {
 }
 
 // The C library decides when it looks at TZ; a line is stamped by the zone that it has then.
-TEST_F(LogClock, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
+TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     const TimeZone utc("UTC0");
     std::string expected = line("in Greenwich", START);
     EXPECT_EQ("2023-11-14 22:13:20,000 in Greenwich\n", expected);
@@ -142,7 +138,7 @@ TEST_F(LogClock, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogClock, InstantsUpToTheLastOnesAreWhole) {
+TEST_F(LogClockTest, InstantsUpToTheLastOnesAreWhole) {
     const struct {
         const char* zone;
         long long seconds;

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdio>
 #include <cstdlib>
 #include <string>
 
@@ -19,7 +20,7 @@ namespace {
 
 constexpr unsigned LINES = 200;
 
-// The file behind each descriptor, 0 where there is none.
+// The inode of each descriptor's file; 0 if the descriptor is closed.
 using Files = std::array<ino_t, 3>;
 
 Files filesOfStandardDescriptors() {
@@ -65,7 +66,7 @@ bool nothingIsReopened(const Files& before, const std::string& log) {
 
 }  // namespace
 
-TEST(LogClosedDescriptors, TheStatusIsAsEverAndEveryLineIsWhole) {
+TEST(LogClosedDescriptorsTest, TheStatusIsTheUsualOneAndEveryLineIsWhole) {
     for (unsigned closed = 0; closed < 8; ++closed) {
         const TempDir dir;
         writeFile(dir.file("log.cfg"),
@@ -74,6 +75,7 @@ TEST(LogClosedDescriptors, TheStatusIsAsEverAndEveryLineIsWhole) {
                   "appender.A.maxFileSize=4000\n"
                   "appender.A.maxBackupIndex=50\n"
                   "appender.A.layout.ConversionPattern=%m%n\n");
+        std::fflush(nullptr);
         const pid_t child = ::fork();
         if (child == 0) {
             runProgram(dir, closed);

@@ -105,7 +105,7 @@ void killRepeatedly(unsigned kills, std::mt19937& random) {
 
 }  // namespace
 
-TEST(LogCrash, AcknowledgedLinesAreOnDiskOnce) {
+TEST(LogCrashTest, AcknowledgedLinesAreOnDiskOnce) {
     std::mt19937 random(20240229);
     const unsigned kills = scaled("QUELTA_KILLS", 20);
     for (unsigned done = 0; done < kills; done += KILLS_PER_FOLDER) {

@@ -15,11 +15,12 @@
 #include "support/NumberedLines.h"
 #include "support/TempDir.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
-// Ten bytes with its line feed.
+// Ten bytes with its newline.
 const std::string LINE = "123456789";
 
 // No file of this process may grow beyond that many bytes.
@@ -54,7 +55,7 @@ Logger& diskLogger(const std::string& file, const std::string& reports) {
 
 }  // namespace
 
-TEST(LogDiskFull, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
+TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -64,7 +65,7 @@ TEST(LogDiskFull, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
         for (int line = 0; line < 6; ++line) {
             logger.info(LINE);
         }
-        // Four lines fit exactly; two are lost and told.
+        // Four lines fit exactly; two are lost and reported.
         EXPECT_EQ(repeated(LINE + "\n", 4), readFile(dir.file("app.log")).substr(1001));
         const std::string report =
             "Error writing to \"" + dir.file("app.log") + "\": File too large\n";
@@ -79,7 +80,7 @@ TEST(LogDiskFull, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFull, ALineCutShortCountsWithTheBytesThatWentOut) {
+TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -95,7 +96,7 @@ TEST(LogDiskFull, ALineCutShortCountsWithTheBytesThatWentOut) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFull, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
+TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         int err[2];  // a pipe, which the limit does not concern
@@ -121,7 +122,7 @@ TEST(LogDiskFull, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST(LogDiskFull, ASmallFileSystemFillsUpAndIsCleared) {
+TEST(LogDiskFullTest, ASmallFileSystemFillsUpAndIsCleared) {
     const TempDir dir;
     const ChildRun run = inChild([&dir] {
         if (::unshare(CLONE_NEWNS) != 0 ||

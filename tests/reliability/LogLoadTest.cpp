@@ -11,7 +11,8 @@
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogConfig.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
@@ -35,7 +36,7 @@ void onSixteenThreads(unsigned lines, Write write) {
 
 }  // namespace
 
-TEST(LogLoad, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
+TEST(LogLoadTest, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
     const unsigned lines = scaled("QUELTA_LOAD_LINES", 2000);
     const TempDir dir;
     const StderrCapture err;
@@ -46,7 +47,7 @@ TEST(LogLoad, EveryLineIsWholeAndInOrderAcrossAllGenerations) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogLoad, TwoAppendersOnOneChannelEachGetEveryLine) {
+TEST(LogLoadTest, TwoAppendersOnOneChannelEachGetEveryLine) {
     const unsigned lines = scaled("QUELTA_LOAD_LINES", 2000);
     const TempDir dir;
     const StderrCapture err;

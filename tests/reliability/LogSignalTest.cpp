@@ -59,7 +59,7 @@ void blockSignals() {
 
 }  // namespace
 
-TEST(LogSignal, NoLineIsLostThroughRotation) {
+TEST(LogSignalTest, NoLineIsLostThroughRotation) {
     const unsigned LINES = 20000;
     const TempDir dir;
     const StderrCapture err;
@@ -75,7 +75,7 @@ TEST(LogSignal, NoLineIsLostThroughRotation) {
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
+TEST(LogSignalTest, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     const unsigned LINES = 40;
     const TempDir dir;
     const StderrCapture err;
@@ -103,6 +103,7 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
             log.write(stampedAt(1000), line);
             expected += line + "\n";
         }
+        log.closeFd();
     }
     reader.join();
     EXPECT_GT(signals, 10U);
@@ -110,8 +111,8 @@ TEST(LogSignal, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     EXPECT_EQ("", err.text());
 }
 
-// Nobody reads yet, so the open itself waits, in the middle of the storm.
-TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
+// There is no reader yet, so the open itself waits while signals arrive.
+TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     const TempDir dir;
     const StderrCapture err;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
@@ -130,8 +131,9 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
         const SignalStorm storm;
         log.write(stampedAt(1000), "first");
         log.write(stampedAt(1010), "second");
+        log.closeFd();
     }
-    // Lets a reader go to whom nobody came.
+    // Releases the reader if no writer ever opened the pipe.
     ::close(::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK));
     reader.join();
     EXPECT_EQ("first\nsecond\n", got);
@@ -139,7 +141,7 @@ TEST(LogSignal, AnOpenThatWaitsForAReaderIsNotGivenUp) {
 }
 
 // The configuration comes through a pipe, late and in pieces, while signals interrupt the reader.
-TEST(LogSignal, AConfigurationThatComesSlowlyIsReadWhole) {
+TEST(LogSignalTest, AConfigurationThatComesSlowlyIsReadWhole) {
     const unsigned LINES = 200;
     const TempDir dir;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
@@ -166,7 +168,7 @@ TEST(LogSignal, AConfigurationThatComesSlowlyIsReadWhole) {
             }
         });
         EXPECT_TRUE(Logger::initialize(Pathname(dir.file("pipe")), Pathname()));
-        // A writer who found no reader must not wait for one; all that it writes fits the pipe.
+        // Do not let the writer wait if the reader has given up; the pipe holds all that it writes.
         const int reader = ::open(dir.file("pipe").c_str(), O_RDWR | O_NONBLOCK);
         writer.join();
         ::close(reader);

@@ -26,7 +26,7 @@ inline LogMsgMetadata stampedAt(long long seconds, LogLevel level = INFO) {
 
 class FileAppender : public LogAppender {
 public:
-    // `maxSize` in bytes, 0: no limit. The layout is the message and a line feed.
+    // `maxSize` in bytes, 0: no limit. The layout is the message and a newline.
     explicit FileAppender(const std::string& file, long long maxSize = 0, unsigned backups = 0) {
         set("fileName", file);
         set("maxFileSize", std::to_string(maxSize));
@@ -34,8 +34,11 @@ public:
         set("layout.ConversionPattern", "%m%n");
         finalSetup("Test");
     }
+    ~FileAppender() noexcept { closeFd(); }
+    FileAppender(const FileAppender&) = delete;
+    FileAppender& operator=(const FileAppender&) = delete;
 
-    // Writes one line, `text` and a line feed, at a time in seconds.
+    // Writes one line, `text` and a newline, at a time in seconds.
     void line(const std::string& text, long long seconds = 1000) {
         write(stampedAt(seconds), text);
     }

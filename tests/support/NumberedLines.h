@@ -22,13 +22,13 @@ inline unsigned scaled(const char* variable, unsigned usual) {
     return value != nullptr ? static_cast<unsigned>(std::strtoul(value, nullptr, 10)) : usual;
 }
 
-// A text, without a newline, that is determined by its numbers; at most about 110 characters.
+// Text, without a newline, that is computed from its numbers; up to some 110 characters.
 inline std::string numberedLine(unsigned series, unsigned number) {
     return std::to_string(series) + " " + std::to_string(number) + " " +
            std::string(number * 7 % 90, static_cast<char>('a' + series % 26)) + ".";
 }
 
-// The generations of a log file, oldest first; there may be gaps in the numbers.
+// The generations of a log file, oldest first; the numbers may have gaps.
 inline std::vector<std::string> generationsOf(const std::string& file) {
     const std::filesystem::path base(file);
     std::map<unsigned long, std::string, std::greater<>> found;

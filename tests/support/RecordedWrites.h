@@ -43,7 +43,7 @@ public:
         const std::lock_guard lock(_mutex);
         return _messages;
     }
-    // "LEVEL category text" and a line feed for each message.
+    // "LEVEL category text" and a newline for each message.
     std::string text() const {
         std::string result;
         for (const Message& message : messages()) {
@@ -81,7 +81,7 @@ private:
     std::vector<Message> _messages;
 };
 
-// LogAppender::write(const LogMsgMetadata&, const std::string&) as the linker names it, behind the
+// LogAppender::write(const LogMsgMetadata&, const std::string&) as the linker names it, after the
 // prefixes of the real and of the wrapped function.
 // clang-format off
 #define QUELTA_APPENDER_WRITE(prefix) \

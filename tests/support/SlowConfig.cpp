@@ -117,8 +117,7 @@ bool readLine(SlowConfig& config, const SlowConfig::Line& line, const std::strin
         if (!takeEquals(rest)) {
             return false;
         }
-        config.root = line;
-        config.rootValue = rest;
+        config.root = {line.number, rest};
         return true;
     }
     if (rest.substr(0, 1) != ".") {
@@ -132,7 +131,7 @@ bool readLine(SlowConfig& config, const SlowConfig::Line& line, const std::strin
     return key == "appender" && readAppender(config, rest, home);
 }
 
-// Removes remarks and comments from a line. `next` is the number of lines read so far.
+// Removes "#" and XML comments from a line. `next` is the number of lines read so far.
 // Returns: false when a comment has no end, its line in `config`.
 bool dropComments(SlowConfig& config, const Words& lines, std::size_t& next, std::string& line) {
     for (;;) {

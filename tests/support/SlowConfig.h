@@ -2,7 +2,7 @@
 #define QUELTA_TESTS_SUPPORT_SLOWCONFIG_H_
 
 // A reader of logging configurations kept only to compare with: it holds the whole text, joins and
-// rereads lines as the rules have it, and shares no code with the real one.
+// rereads lines as the rules say, and shares no code with the real one.
 
 #include <map>
 #include <string>
@@ -10,7 +10,7 @@
 
 struct SlowConfig {
     struct Line {
-        unsigned number = 0;  // counted from 1; 0: there is no such line
+        unsigned number = 0;  // counted from 1; 0: no such line
         std::string text;
     };
     struct Appender {
@@ -20,9 +20,8 @@ struct SlowConfig {
         std::string pattern;  // of the layout; empty: none was set
     };
 
-    unsigned openComment = 0;  // line of the comment that has no end; 0: none
-    Line root;                 // the last rootCategory line
-    std::string rootValue;
+    unsigned openComment = 0;                   // line of the unterminated comment; 0: none
+    Line root;                                  // the value of the last rootCategory line
     std::vector<Line> categories;               // without "category."
     std::vector<Line> errors;                   // found while reading
     std::map<std::string, Appender> appenders;  // "rootAppender" too, when a line names it

@@ -17,7 +17,7 @@ std::string take(std::string& rest, const char* letters, std::size_t limit = std
     return taken;
 }
 
-// Whether a piece is nothing but "%p" in any spelling.
+// Whether a piece consists of "%p" only, with any flags.
 bool isAmPm(std::string piece) {
     while (!piece.empty()) {
         const bool conversion = !take(piece, "%", 1).empty();
@@ -34,7 +34,8 @@ bool isAmPm(std::string piece) {
 // The patterns are made at run time: no compiler can check them.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
-// strftime with room enough; the sentinel in front tells an empty text from one that does not fit.
+// strftime with enough room. The sentinel before the text distinguishes an empty text from one that
+// does not fit.
 std::string strftimeOf(const std::string& piece, const struct tm& local) {
     std::vector<char> buf(65536);
     const std::size_t len = std::strftime(buf.data(), buf.size(), ("x" + piece).c_str(), &local);
@@ -108,12 +109,10 @@ Widths takeWidths(std::string& rest) {
     return widths;
 }
 
-// Widths stay small enough here that a number of more than nine digits can only mean "no limit".
+// Widths stay small enough here that a number of more than nine digits can only mean one that does
+// not fit 32 bits, and is ignored.
 std::size_t widthOf(const std::string& digits, std::size_t none) {
-    if (digits.empty()) {
-        return none;
-    }
-    return digits.size() > 9 ? std::string::npos : std::stoul(digits);
+    return digits.empty() || digits.size() > 9 ? none : std::stoul(digits);
 }
 
 std::string fitted(const std::string& text, const Widths& widths) {

@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_SLOWLAYOUT_H_
 #define QUELTA_TESTS_SUPPORT_SLOWLAYOUT_H_
 
-// A renderer of log layouts kept only to compare with: it reads the pattern anew for each line, one
-// character at a time, and shares no code with the compiled layouts.
+// A renderer of log layouts kept only to compare with: it reads the pattern again for each line,
+// one character at a time, and shares no code with the compiled layouts.
 
 #include <ctime>
 #include <string>

@@ -19,9 +19,9 @@ namespace fs = std::filesystem;
 namespace {
 
 // An appender that has written "first" at second 1000.
-class LogAppenderIdentity : public testing::Test {
+class LogAppenderIdentityTest : public testing::Test {
 protected:
-    LogAppenderIdentity() { _log.line("first", 1000); }
+    LogAppenderIdentityTest() { _log.line("first", 1000); }
 
     TempDir _dir;
     const std::string _file = _dir.file("app.log");
@@ -31,7 +31,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogAppenderIdentity, AMoveIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentityTest, AMoveIsNoticedAfterSixSecondsNotAfterFive) {
     fs::rename(_file, _moved);
     _log.line("at 1005", 1005);
     EXPECT_FALSE(fs::exists(_file));
@@ -40,7 +40,7 @@ TEST_F(LogAppenderIdentity, AMoveIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, OnlyTheWholeSecondsOfAStampCount) {
+TEST_F(LogAppenderIdentityTest, OnlyTheWholeSecondsOfAStampCount) {
     fs::rename(_file, _moved);
     LogMsgMetadata mdata = stampedAt(1005);
     mdata.stamp.set(1005, 999999);
@@ -49,7 +49,7 @@ TEST_F(LogAppenderIdentity, OnlyTheWholeSecondsOfAStampCount) {
     EXPECT_EQ("first\nat 1005.999999\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, ADeletionIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentityTest, ADeletionIsNoticedAfterSixSecondsNotAfterFive) {
     fs::remove(_file);
     _log.line("at 1005", 1005);
     EXPECT_FALSE(fs::exists(_file));
@@ -57,7 +57,7 @@ TEST_F(LogAppenderIdentity, ADeletionIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, AReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
+TEST_F(LogAppenderIdentityTest, AReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
     fs::rename(_file, _moved);
     writeFile(_file, "someone else's\n");
     _log.line("at 1005", 1005);
@@ -67,14 +67,14 @@ TEST_F(LogAppenderIdentity, AReplacedFileIsNoticedAfterSixSecondsNotAfterFive) {
     EXPECT_EQ("first\nat 1005\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, AClockThatStepsBackLeadsToACheckAtOnce) {
+TEST_F(LogAppenderIdentityTest, AClockThatStepsBackLeadsToACheckAtOnce) {
     fs::rename(_file, _moved);
     _log.line("at 999", 999);
     EXPECT_EQ("at 999\n", readFile(_file));
     EXPECT_EQ("first\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, AfterTheClockSteppedBackTheSecondsCountFromThere) {
+TEST_F(LogAppenderIdentityTest, AfterTheClockSteppedBackTheSecondsCountFromThere) {
     _log.line("at 500", 500);
     fs::rename(_file, _moved);
     _log.line("at 505", 505);
@@ -84,7 +84,7 @@ TEST_F(LogAppenderIdentity, AfterTheClockSteppedBackTheSecondsCountFromThere) {
     EXPECT_EQ("first\nat 500\nat 505\n", readFile(_moved));
 }
 
-TEST_F(LogAppenderIdentity, AConfirmedFileIsTrustedForAnotherFiveSeconds) {
+TEST_F(LogAppenderIdentityTest, AConfirmedFileIsTrustedForAnotherFiveSeconds) {
     _log.line("at 1006", 1006);
     fs::rename(_file, _moved);
     _log.line("at 1011", 1011);
@@ -94,7 +94,7 @@ TEST_F(LogAppenderIdentity, AConfirmedFileIsTrustedForAnotherFiveSeconds) {
     EXPECT_EQ("at 1012\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, LinesInBetweenDoNotPutTheCheckOff) {
+TEST_F(LogAppenderIdentityTest, LinesInBetweenDoNotPutTheCheckOff) {
     fs::rename(_file, _moved);
     for (long long second = 1001; second <= 1005; ++second) {
         _log.line("between", second);
@@ -103,7 +103,7 @@ TEST_F(LogAppenderIdentity, LinesInBetweenDoNotPutTheCheckOff) {
     EXPECT_EQ("at 1006\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, ATruncatedFileIsStillTheSameFile) {
+TEST_F(LogAppenderIdentityTest, ATruncatedFileIsStillTheSameFile) {
     ASSERT_EQ(0, ::truncate(_file.c_str(), 0));
     _log.line("next", 1010);
     EXPECT_EQ("next\n", readFile(_file));
@@ -111,7 +111,7 @@ TEST_F(LogAppenderIdentity, ATruncatedFileIsStillTheSameFile) {
     EXPECT_EQ(11, _log._curSize);
 }
 
-TEST_F(LogAppenderIdentity, ALinkToTheMovedFileIsTheSameFile) {
+TEST_F(LogAppenderIdentityTest, ALinkToTheMovedFileIsTheSameFile) {
     fs::rename(_file, _moved);
     fs::create_symlink(_moved, _file);
     _log.line("next", 1010);
@@ -119,14 +119,14 @@ TEST_F(LogAppenderIdentity, ALinkToTheMovedFileIsTheSameFile) {
     EXPECT_TRUE(fs::is_symlink(_file));
 }
 
-TEST_F(LogAppenderIdentity, TheSizeCountsAnewInTheNewFile) {
+TEST_F(LogAppenderIdentityTest, TheSizeCountsAnewInTheNewFile) {
     fs::rename(_file, _moved);
     writeFile(_file, "0123456789");
     _log.line("next", 1010);
     EXPECT_EQ(15, _log._curSize);
 }
 
-TEST_F(LogAppenderIdentity, WhatStandsInTheWayIsReportedUntilItIsGone) {
+TEST_F(LogAppenderIdentityTest, WhatStandsInTheWayIsReportedUntilItIsGone) {
     const std::string prefix = "Error opening \"" + _file + "\": ";
     const StderrCapture err;
     fs::rename(_file, _moved);
@@ -143,39 +143,24 @@ TEST_F(LogAppenderIdentity, WhatStandsInTheWayIsReportedUntilItIsGone) {
     EXPECT_EQ("written\n", readFile(_file));
 }
 
-TEST_F(LogAppenderIdentity, AFolderThatIsRemovedAndMadeAgainTakesTheNextLine) {
-    const TempDir dir;
-    fs::create_directory(dir.file("logs"));
-    FileAppender log(dir.file("logs/app.log"));
-    log.line("gone", 1000);
-    const StderrCapture err;
-    fs::remove_all(dir.file("logs"));
-    log.line("lost", 1010);
-    EXPECT_EQ("Error opening \"" + dir.file("logs/app.log") + "\": No such file or directory\n",
-              err.text());
-    fs::create_directory(dir.file("logs"));
-    log.line("written", 1011);
-    EXPECT_EQ("written\n", readFile(dir.file("logs/app.log")));
-}
-
 // In a child without root's rights, to which permissions mean nothing.
-TEST_F(LogAppenderIdentity, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen) {
-    const std::string folder = _dir.file("logs");
-    const std::string file = folder + "/app.log";
+TEST_F(LogAppenderIdentityTest, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen) {
+    const std::string directory = _dir.file("logs");
+    const std::string file = directory + "/app.log";
     const std::string report = "Error opening \"" + file + "\": Permission denied\n";
     fs::permissions(_dir.path(), fs::perms::all);
     const ChildRun run = inChild([&] {
         if (::geteuid() == 0) {
             ASSERT_EQ(0, ::setuid(65534));
         }
-        fs::create_directory(folder);
+        fs::create_directory(directory);
         FileAppender log(file);
         log.line("first", 1000);
         fs::permissions(file, fs::perms::none);
         log.line("still open", 1010);
-        fs::permissions(folder, fs::perms::none);
+        fs::permissions(directory, fs::perms::none);
         log.line("not to be found", 1020);
-        fs::permissions(folder, fs::perms::all);
+        fs::permissions(directory, fs::perms::all);
         log.line("not to be opened", 1020);
         fs::permissions(file, fs::perms::owner_write);
         log.line("written", 1020);
@@ -186,7 +171,7 @@ TEST_F(LogAppenderIdentity, AFileThatMayNotBeOpenedTakesLinesForAsLongAsItIsOpen
     EXPECT_EQ("first\nstill open\nwritten\n", readFile(file));
 }
 
-TEST_F(LogAppenderIdentity, TheFarthestStampsAreNoTrouble) {
+TEST_F(LogAppenderIdentityTest, TheFarthestStampsAreNoTrouble) {
     const StderrCapture err;
     const long long stamps[] = {2147483647, 0, -2147483648LL, 2147483647, 1000};
     std::string expected = "first\n";

@@ -17,21 +17,22 @@
 #include <vector>
 
 #include "support/FileAppender.h"
+#include "support/NumberedLines.h"
 #include "support/StderrCapture.h"
 #include "support/TempDir.h"
 #include "util/LogChannel.h"
-#include "util/LogInternal.h"
+#include "util/internal/LogGlobals.h"
 
 namespace fs = std::filesystem;
 
 namespace {
 
-// In a child of a process with threads the leak checker has none of their stacks to search.
+// In a child forked from several threads, the leak checker cannot search their stacks.
 bool childOfThreads = false;
 
 constexpr unsigned THREADS = 8;
 
-// Runs body(0) ... body(THREADS - 1), each on a thread of its own, all at once.
+// Runs body(0) ... body(THREADS - 1), each on a thread of its own, concurrently.
 template <typename Body>
 void onAllThreads(Body body) {
     std::atomic<bool> go = false;
@@ -50,41 +51,7 @@ void onAllThreads(Body body) {
     }
 }
 
-// A line that shows when it is torn: its text follows from its numbers.
-std::string numberedLine(unsigned thread, unsigned number) {
-    return std::to_string(thread) + " " + std::to_string(number) + " " +
-           std::string(number * 7 % 90, static_cast<char>('a' + thread)) + ".";
-}
-
-// The generations of a file, oldest first, in one text.
-std::string allGenerations(const std::string& file) {
-    unsigned oldest = 0;
-    while (fs::exists(file + "." + std::to_string(oldest + 1))) {
-        ++oldest;
-    }
-    std::string all;
-    for (; oldest > 0; --oldest) {
-        all += readFile(file + "." + std::to_string(oldest));
-    }
-    return all + readFile(file);
-}
-
-// Each thread's lines, whole, in its own order, none missing and none twice.
-void expectAllLines(const std::string& text, unsigned perThread) {
-    std::vector<unsigned> next(THREADS, 0);
-    std::istringstream in(text);
-    std::string line;
-    while (std::getline(in, line)) {
-        unsigned thread = THREADS;
-        ASSERT_EQ(1, std::sscanf(line.c_str(), "%u", &thread)) << line;
-        ASSERT_LT(thread, THREADS) << line;
-        ASSERT_EQ(numberedLine(thread, next[thread]), line);
-        ++next[thread];
-    }
-    EXPECT_EQ(std::vector<unsigned>(THREADS, perThread), next);
-}
-
-// The lines of a text but those that are `unwanted`.
+// The lines of a text except those that are `unwanted`.
 std::string without(const std::string& unwanted, const std::string& text) {
     std::string rest;
     std::istringstream in(text);
@@ -107,25 +74,7 @@ LogChannel& channelOfReports() {
 
 }  // namespace
 
-TEST(LogAppenderThreads, NoLineIsLostOrTornThroughRotation) {
-    const unsigned LINES = 4000;
-    const TempDir dir;
-    const StderrCapture err;
-    FileAppender log(dir.file("app.log"), 20000, 1000);
-    onAllThreads([&](unsigned thread) {
-        for (unsigned number = 0; number < LINES; ++number) {
-            log.line(numberedLine(thread, number), 1000);
-        }
-    });
-    EXPECT_TRUE(fs::exists(dir.file("app.log.50")));
-    expectAllLines(allGenerations(dir.file("app.log")), LINES);
-    for (const auto& entry : fs::directory_iterator(dir.path())) {
-        EXPECT_LE(entry.file_size(), 20000U + 200U) << entry.path();
-    }
-    EXPECT_EQ("", err.text());
-}
-
-TEST(LogAppenderThreads, NoLineIsLostWhileTheFileIsMovedAway) {
+TEST(LogAppenderThreadTest, NoLineIsLostWhileTheFileIsMovedAway) {
     const unsigned LINES = 2000;
     const TempDir dir;
     const std::string file = dir.file("app.log");
@@ -153,28 +102,12 @@ TEST(LogAppenderThreads, NoLineIsLostWhileTheFileIsMovedAway) {
     for (unsigned move = 0; move < moves; ++move) {
         all += readFile(file + ".moved" + std::to_string(move));
     }
-    expectAllLines(all + (fs::exists(file) ? readFile(file) : ""), LINES);
+    expectEveryLine(all + (fs::exists(file) ? readFile(file) : ""), THREADS, LINES);
     EXPECT_GT(moves, 0U);
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppenderThreads, TwoAppendersOnOneChannelEachGetEveryLine) {
-    const unsigned LINES = 2000;
-    const TempDir dir;
-    FileAppender a(dir.file("a.log"), 20000, 1000);
-    FileAppender b(dir.file("b.log"));
-    LogChannel channel;
-    channel._appenders = {&a, &b};
-    onAllThreads([&](unsigned thread) {
-        for (unsigned number = 0; number < LINES; ++number) {
-            channel.write(stampedAt(1000), numberedLine(thread, number));
-        }
-    });
-    expectAllLines(allGenerations(dir.file("a.log")), LINES);
-    expectAllLines(allGenerations(dir.file("b.log")), LINES);
-}
-
-TEST(LogAppenderThreads, AppendersThatAllFailNeitherDeadlockNorRecurse) {
+TEST(LogAppenderThreadTest, AppendersThatAllFailNeitherDeadlockNorRecurse) {
     const unsigned LINES = 50;
     const TempDir dir;
     StderrCapture err;
@@ -208,7 +141,7 @@ TEST(LogAppenderThreads, AppendersThatAllFailNeitherDeadlockNorRecurse) {
     b._mutex.NOLOG_unlock();
 }
 
-TEST(LogAppenderThreads, AFailingAppenderReportsThroughOneThatOthersAreWritingTo) {
+TEST(LogAppenderThreadTest, AFailingAppenderReportsThroughOneThatOthersAreWritingTo) {
     const unsigned LINES = 500;
     const TempDir dir;
     const StderrCapture err;
@@ -225,7 +158,7 @@ TEST(LogAppenderThreads, AFailingAppenderReportsThroughOneThatOthersAreWritingTo
 
     const std::string report = "Error writing to \"/dev/full\": No space left on device";
     std::map<std::string, unsigned> counts;
-    std::istringstream in(allGenerations(dir.file("working.log")));
+    std::istringstream in(textOfGenerations(dir.file("working.log")));
     std::string line;
     while (std::getline(in, line)) {
         ++counts[line];
@@ -236,7 +169,7 @@ TEST(LogAppenderThreads, AFailingAppenderReportsThroughOneThatOthersAreWritingTo
     EXPECT_EQ("", err.text());
 }
 
-TEST(LogAppenderThreads, TheReportTakesNoLockOfTheFailingAppender) {
+TEST(LogAppenderThreadTest, TheReportTakesNoLockOfTheFailingAppender) {
     // Two threads whose failing appenders are each other's only listeners.
     const TempDir dir;
     const StderrCapture err;
@@ -260,7 +193,7 @@ extern "C" int __lsan_is_turned_off() {
     return childOfThreads ? 1 : 0;
 }
 
-TEST(LogAppenderThreads, AChildOfAForkLogsWhileOtherThreadsDo) {
+TEST(LogAppenderThreadTest, AChildOfAForkLogsWhileOtherThreadsDo) {
     const unsigned FORKS = 60;
     const TempDir dir;
     const StderrCapture err;
@@ -285,7 +218,7 @@ TEST(LogAppenderThreads, AChildOfAForkLogsWhileOtherThreadsDo) {
         std::fflush(nullptr);
         const pid_t child = ::fork();
         if (child == 0) {
-            ::alarm(10);  // ends a child that waits for a lock that nobody will free
+            ::alarm(10);  // ends a child that waits for a lock held by no thread of its own
             writeToBoth("child " + std::to_string(number));
             childOfThreads = true;
             if (number % 10 == 0) {

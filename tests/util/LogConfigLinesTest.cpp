@@ -7,7 +7,19 @@
 #include <string>
 #include <vector>
 
-#include "util/LogConfig.h"
+#include "util/internal/LogConfig.h"
+
+namespace {
+std::vector<int> pieceSizes;  // of the calls of fgets
+}
+
+extern "C" {
+char* __real_fgets(char* buf, int size, std::FILE* file);
+char* __wrap_fgets(char* buf, int size, std::FILE* file) {
+    pieceSizes.push_back(size);
+    return __real_fgets(buf, size, file);
+}
+}
 
 namespace {
 
@@ -32,9 +44,9 @@ Lines linesOf(const std::string& contents) {
     return lines;
 }
 
-// The rule on the whole text: each line feed ends a line, what is behind the last is one if it is
-// not empty.
-Lines splitAtLineFeeds(const std::string& contents) {
+// The rule on the whole text: each newline ends a line; the text after the last newline is a line
+// if it is not empty.
+Lines splitAtNewlines(const std::string& contents) {
     Lines lines;
     std::size_t begin = 0;
     for (std::size_t end = 0; (end = contents.find('\n', begin)) != std::string::npos;
@@ -54,17 +66,17 @@ struct Skipped {
     std::string nextLine;
 };
 
-Skipped skip(const char* behindOpening, const std::string& contents) {
+Skipped skip(const char* afterOpening, const std::string& contents) {
     const File file = fileWith(contents);
     Skipped skipped = {false, "before ", 7, ""};
-    skipped.closed = handle_xml_comment(skipped.result, behindOpening, skipped.lineno, file.get());
+    skipped.closed = handle_xml_comment(skipped.result, afterOpening, skipped.lineno, file.get());
     read_line(skipped.nextLine, file.get());
     return skipped;
 }
 
 }  // namespace
 
-TEST(ReadLine, SplitsEveryShortTextAtItsLineFeeds) {
+TEST(ReadLineTest, SplitsEveryShortTextAtItsNewlines) {
     const char alphabet[] = {'a', '\0', '\n', '\r'};
     for (unsigned length = 0; length <= 6; ++length) {
         for (unsigned code = 0; code < 1U << (2 * length); ++code) {
@@ -72,12 +84,12 @@ TEST(ReadLine, SplitsEveryShortTextAtItsLineFeeds) {
             for (unsigned i = 0; i < length; ++i) {
                 text += alphabet[code >> (2 * i) & 3U];
             }
-            ASSERT_EQ(splitAtLineFeeds(text), linesOf(text)) << length << ' ' << code;
+            ASSERT_EQ(splitAtNewlines(text), linesOf(text)) << length << ' ' << code;
         }
     }
 }
 
-TEST(ReadLine, JoinsThePiecesOfLongLines) {
+TEST(ReadLineTest, JoinsThePiecesOfLongLines) {
     for (const std::size_t middle : {127U, 254U, 381U, 1270U, 10000U}) {
         for (std::size_t length = middle - 3; length <= middle + 3; ++length) {
             const std::string line(length, 'x');
@@ -91,7 +103,15 @@ TEST(ReadLine, JoinsThePiecesOfLongLines) {
     }
 }
 
-TEST(ReadLine, KeepsEveryByteButTheLineFeed) {
+TEST(ReadLineTest, ReadsPiecesOf127Characters) {
+    const File file = fileWith(std::string(300, 'x') + "\n");
+    pieceSizes.clear();
+    std::string line;
+    EXPECT_TRUE(read_line(line, file.get()));
+    EXPECT_EQ((std::vector<int>{128, 128, 128}), pieceSizes);  // each with room for a NUL
+}
+
+TEST(ReadLineTest, KeepsEveryByteExceptTheNewline) {
     std::string line;
     for (int byte = 0; byte < 256; ++byte) {
         if (byte != '\n') {
@@ -101,7 +121,7 @@ TEST(ReadLine, KeepsEveryByteButTheLineFeed) {
     EXPECT_EQ((Lines{line, line}), linesOf(line + "\n" + line));
 }
 
-TEST(ReadLine, AfterTheEndThereAreNoMoreLines) {
+TEST(ReadLineTest, AfterTheEndThereAreNoMoreLines) {
     const File file = fileWith("only");
     std::string line;
     EXPECT_TRUE(read_line(line, file.get()));
@@ -109,9 +129,9 @@ TEST(ReadLine, AfterTheEndThereAreNoMoreLines) {
     EXPECT_FALSE(read_line(line, file.get()));
 }
 
-TEST(HandleXmlComment, AppendsWhatFollowsTheEnd) {
+TEST(HandleXmlCommentTest, AppendsWhatFollowsTheEnd) {
     const struct {
-        const char* behindOpening;
+        const char* afterOpening;
         const char* contents;
         const char* result;
         unsigned lineno;
@@ -128,15 +148,15 @@ TEST(HandleXmlComment, AppendsWhatFollowsTheEnd) {
         {" -- >", "-- >\n->\n-->", "before ", 10, ""},
     };
     for (const auto& row : table) {
-        const Skipped skipped = skip(row.behindOpening, row.contents);
-        EXPECT_TRUE(skipped.closed) << row.behindOpening;
-        EXPECT_EQ(row.result, skipped.result) << row.behindOpening;
-        EXPECT_EQ(row.lineno, skipped.lineno) << row.behindOpening;
-        EXPECT_EQ(row.nextLine, skipped.nextLine) << row.behindOpening;
+        const Skipped skipped = skip(row.afterOpening, row.contents);
+        EXPECT_TRUE(skipped.closed) << row.afterOpening;
+        EXPECT_EQ(row.result, skipped.result) << row.afterOpening;
+        EXPECT_EQ(row.lineno, skipped.lineno) << row.afterOpening;
+        EXPECT_EQ(row.nextLine, skipped.nextLine) << row.afterOpening;
     }
 }
 
-TEST(HandleXmlComment, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
+TEST(HandleXmlCommentTest, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
     for (const char* const contents : {"", "one\ntwo\n", "->", "--\n>"}) {
         const Skipped skipped = skip(" open", contents);
         EXPECT_FALSE(skipped.closed) << contents;
@@ -145,7 +165,7 @@ TEST(HandleXmlComment, FailsAtTheEndOfTheFileWithTheResultAsItWas) {
     }
 }
 
-TEST(HandleXmlComment, NulBytesDoNotHideTheEnd) {
+TEST(HandleXmlCommentTest, NulBytesDoNotHideTheEnd) {
     using namespace std::string_literals;
     const Skipped skipped = skip("", "a\0b\0-->x\0y\nnext\n"s);
     EXPECT_TRUE(skipped.closed);

@@ -34,7 +34,7 @@ struct LogsAtExit {
 
 }  // namespace
 
-TEST(LogExit, StandardErrorIsClosedAfterTheLastMessage) {
+TEST(LogExitTest, StandardErrorIsClosedAfterTheLastMessage) {
     const TempDir dir;
     const ChildRun run = inChild([&] {
         static const LogsAtExit logsAtExit;
@@ -47,7 +47,7 @@ TEST(LogExit, StandardErrorIsClosedAfterTheLastMessage) {
     EXPECT_EQ("closed", readFile(dir.file("verdict")));
 }
 
-TEST(LogExit, AppendersAndTheirLayoutsServeDestructors) {
+TEST(LogExitTest, AppendersAndTheirLayoutsServeDestructors) {
     const struct {
         const char* layout;
         const char* expected;

@@ -13,17 +13,16 @@
 
 #include "support/AllStrings.h"
 #include "support/LogLine.h"
+#include "support/ScriptedLibc.h"
 #include "support/SlowLayout.h"
 #include "support/TimeZone.h"
-#include "util/LogInternal.h"
 #include "util/Logger.h"
-
-// Processor time stands still, so that "%u" can be compared.
-extern "C" std::clock_t __wrap_clock() {
-    return 123456;
-}
+#include "util/internal/LogGlobals.h"
 
 namespace {
+
+// Processor time stands still, so that "%u" can be compared.
+const Replacement clockStandsStill(replacement::clock, [] { return std::clock_t{123456}; });
 
 constexpr long long EPOCH = 981000000;
 
@@ -147,7 +146,7 @@ std::string randomPattern(Random& random) {
     return pattern;
 }
 
-// Characters drawn without any regard to the rules, but never four digits in a row.
+// Random characters, but never four digits in a row.
 std::string randomNoise(Random& random) {
     std::string noise;
     for (std::size_t n = random.below(24); n > 0; --n) {
@@ -161,7 +160,7 @@ std::string randomNoise(Random& random) {
 }
 
 // Dates of noise may hold digits, which strftime reads as widths of its own; the compiled layout
-// and strftime must agree there too, but a piece of "%p" with a width beyond 64 is left out.
+// and strftime must agree there too, except for a piece of "%p" with a width beyond 64.
 void compareRandom(unsigned seed, int patterns, std::string (*draw)(Random&)) {
     const TimeZone berlin("CET-1CEST,M3.5.0,M10.5.0/3");
     epoch_timeval().set(EPOCH, 0);
@@ -175,7 +174,7 @@ void compareRandom(unsigned seed, int patterns, std::string (*draw)(Random&)) {
 
 }  // namespace
 
-TEST(LogFormatOracle, EveryShortPatternOfASmallAlphabet) {
+TEST(LogFormatOracleTest, EveryShortPatternOfASmallAlphabet) {
     const TimeZone utc("UTC0");
     epoch_timeval().set(EPOCH, 0);
     const Message& message = messages()[0];
@@ -188,15 +187,15 @@ TEST(LogFormatOracle, EveryShortPatternOfASmallAlphabet) {
     EXPECT_EQ(66430u, patterns);
 }
 
-TEST(LogFormatOracle, RandomPatterns) {
+TEST(LogFormatOracleTest, RandomPatterns) {
     compareRandom(20010203, 20000, randomPattern);
 }
 
-TEST(LogFormatOracle, RandomNoise) {
+TEST(LogFormatOracleTest, RandomNoise) {
     compareRandom(20010204, 20000, randomNoise);
 }
 
-TEST(LogFormatOracle, ThePatternsReachEveryConversion) {
+TEST(LogFormatOracleTest, ThePatternsReachEveryConversion) {
     Random random(20010203);
     std::string kinds;
     for (int i = 0; i < 1000; ++i) {

@@ -13,9 +13,9 @@
 
 #include "support/LogLine.h"
 #include "support/TimeZone.h"
-#include "util/LogInternal.h"
 #include "util/Logger.h"
 #include "util/Thread.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
@@ -47,7 +47,7 @@ public:
 
 }  // namespace
 
-TEST(LogFormat, BuiltInLayouts) {
+TEST(LogFormatTest, BuiltInLayouts) {
     epoch_timeval().set(STAMP - 65, 0);
     expectLines({{"%m%n", INFO, "x", "x\n"},
                  {"%m%n", INFO, "", "\n"},
@@ -56,7 +56,7 @@ TEST(LogFormat, BuiltInLayouts) {
                  {"%R %p %c %m%n", WARN, "hello", "65 WARN net.Http hello\n"}});
 }
 
-TEST(LogFormat, LevelsAreNamed) {
+TEST(LogFormatTest, LevelsAreNamed) {
     expectLines({{"%p", DEBUG, "", "DEBUG"},
                  {"%p", INFO, "", "INFO"},
                  {"%p", NOTICE, "", "NOTICE"},
@@ -70,7 +70,7 @@ TEST(LogFormat, LevelsAreNamed) {
                  {"%5p", static_cast<LogLevel>(-1), "", "  ???"}});
 }
 
-TEST(LogFormat, ShortTextsArePadded) {
+TEST(LogFormatTest, ShortTextsArePadded) {
     expectLines({{"[%8p]", INFO, "", "[    INFO]"},
                  {"[%08p]", INFO, "", "[0000INFO]"},
                  {"[%-8p]", INFO, "", "[INFO    ]"},
@@ -85,7 +85,7 @@ TEST(LogFormat, ShortTextsArePadded) {
                  {"[%-10c]", INFO, "", "[net.Http  ]"}});
 }
 
-TEST(LogFormat, LongTextsLoseTheirEnd) {
+TEST(LogFormatTest, LongTextsLoseTheirEnd) {
     expectLines({{"[%.3p]", ERROR, "", "[ERR]"},
                  {"[%.5p]", ERROR, "", "[ERROR]"},
                  {"[%.4p]", ERROR, "", "[ERRO]"},
@@ -98,14 +98,14 @@ TEST(LogFormat, LongTextsLoseTheirEnd) {
                  {"[%3.5m]", INFO, "abcdefg", "[abcde]"}});
 }
 
-TEST(LogFormat, ACutTextIsNotPadded) {
+TEST(LogFormatTest, ACutTextIsNotPadded) {
     expectLines({{"[%5.3m]", INFO, "abcd", "[abc]"},
                  {"[%-5.3m]", INFO, "abcd", "[abc]"},
                  {"[%05.0m]", INFO, "a", "[]"},
                  {"[%5.0m]", INFO, "", "[     ]"}});
 }
 
-TEST(LogFormat, LiteralsAreNeitherPaddedNorCut) {
+TEST(LogFormatTest, LiteralsAreNeitherPaddedNorCut) {
     expectLines({{"%%", INFO, "", "%"},
                  {"100%% of %m", INFO, "it", "100% of it"},
                  {"%%m", INFO, "x", "%m"},
@@ -113,20 +113,20 @@ TEST(LogFormat, LiteralsAreNeitherPaddedNorCut) {
                  {" a\tb\n", INFO, "", " a\tb\n"}});
 }
 
-TEST(LogFormat, TheLineFeedKeepsItsWidths) {
+TEST(LogFormatTest, TheNewlineKeepsItsWidths) {
     expectLines({{"a%3n", INFO, "", "a  \n"},
                  {"a%-3n", INFO, "", "a\n  "},
                  {"a%03n", INFO, "", "a00\n"},
                  {"a%.0n", INFO, "", "a"}});
 }
 
-TEST(LogFormat, ArgumentsOfOtherConversionsAreIgnored) {
+TEST(LogFormatTest, ArgumentsOfOtherConversionsAreIgnored) {
     expectLines({{"%c{2}", INFO, "", "net.Http"},
                  {"%c{2", INFO, "", ""},
                  {"%p{x}%m{}%n{n}|", WARN, "msg", "WARNmsg\n|"}});
 }
 
-TEST(LogFormat, UnknownConversionsVanish) {
+TEST(LogFormatTest, UnknownConversionsVanish) {
     expectLines({{"a%qb", INFO, "", "ab"},
                  {"a%-12.30qb", INFO, "", "ab"},
                  {"a%Mb%Cc%Pd", INFO, "msg", "abcd"},
@@ -134,13 +134,13 @@ TEST(LogFormat, UnknownConversionsVanish) {
                  {"a% mb", INFO, "msg", "amb"}});
 }
 
-TEST(LogFormat, AnIncompleteConversionEndsThePattern) {
+TEST(LogFormatTest, AnIncompleteConversionEndsThePattern) {
     expectLines({{"%m%", INFO, "msg", "msg"},
                  {"%m%-08.3", INFO, "msg", "msg"},
                  {"%m%d{%H %p %n", INFO, "msg", "msg"}});
 }
 
-TEST(LogFormat, AppendsToWhatIsThere) {
+TEST(LogFormatTest, AppendsToWhatIsThere) {
     std::string out = "before ";
     const LogFormat layout("%5m|");
     layout.apply(out, stampedAt(net, INFO, STAMP), "x");
@@ -148,28 +148,28 @@ TEST(LogFormat, AppendsToWhatIsThere) {
     EXPECT_EQ("before     x|    y|", out);
 }
 
-TEST(LogFormat, WidthsReachOnlyTheTextOfTheirOwnConversion) {
+TEST(LogFormatTest, WidthsReachOnlyTheTextOfTheirOwnConversion) {
     std::string out = "0123456789";
     LogFormat("%.2d{%Y}%3m").apply(out, stampedAt(net, INFO, STAMP), "x");
     EXPECT_EQ("012345678920  x", out);
 }
 
-TEST(LogFormat, NulBytesInAMessageAreKept) {
+TEST(LogFormatTest, NulBytesInAMessageAreKept) {
     const std::string message("a\0b\0", 4);
     EXPECT_EQ(std::string("[  a\0b\0]", 8), lineOf("[%6m]", stampedAt(net, INFO, STAMP), message));
     EXPECT_EQ(std::string("a\0", 2), lineOf("%.2m", stampedAt(net, INFO, STAMP), message));
 }
 
-TEST(LogFormat, ConversionsInAMessageHaveNoMeaning) {
+TEST(LogFormatTest, ConversionsInAMessageHaveNoMeaning) {
     EXPECT_EQ("100%n %m %s\n", lineOf("%m%n", stampedAt(net, INFO, STAMP), "100%n %m %s"));
 }
 
-TEST(LogFormat, LongMessagesAreComplete) {
+TEST(LogFormatTest, LongMessagesAreComplete) {
     const std::string message(100000, 'x');
     EXPECT_EQ("INFO " + message + "\n", lineOf("%p %m%n", stampedAt(net, INFO, STAMP), message));
 }
 
-TEST(LogFormat, TheCategoryIsTheNameOfTheLoggerThatWrote) {
+TEST(LogFormatTest, TheCategoryIsTheNameOfTheLoggerThatWrote) {
     const Logger unnamed("");
     EXPECT_EQ("[]", lineOf("[%c]", stampedAt(unnamed, INFO, STAMP), ""));
     EXPECT_EQ("[   ]", lineOf("[%3c]", stampedAt(unnamed, INFO, STAMP), ""));
@@ -179,7 +179,7 @@ TEST(LogFormat, TheCategoryIsTheNameOfTheLoggerThatWrote) {
         << "of the length that the logger knows";
 }
 
-TEST(LogFormat, ThreadsAreNamed) {
+TEST(LogFormatTest, ThreadsAreNamed) {
     EXPECT_EQ("[Main Thread]", lineOf("[%t]", stampedAt(net, INFO, STAMP), ""));
     EXPECT_EQ("[Main]", lineOf("[%.4t]", stampedAt(net, INFO, STAMP), ""));
     Thread mainThread;
@@ -189,7 +189,7 @@ TEST(LogFormat, ThreadsAreNamed) {
     EXPECT_EQ("[Rotator]", worker.line);
 }
 
-TEST(LogFormat, TimeSinceTheEpochOfLogging) {
+TEST(LogFormatTest, TimeSinceTheEpochOfLogging) {
     epoch_timeval().set(1000, 500000);
     struct Instant {
         long long sec;
@@ -205,7 +205,7 @@ TEST(LogFormat, TimeSinceTheEpochOfLogging) {
     }
 }
 
-TEST(LogFormat, TimeBeforeTheEpochPrintsUnsigned) {
+TEST(LogFormatTest, TimeBeforeTheEpochPrintsUnsigned) {
     epoch_timeval().set(1000, 500000);
     struct Instant {
         long long sec;
@@ -221,7 +221,7 @@ TEST(LogFormat, TimeBeforeTheEpochPrintsUnsigned) {
     }
 }
 
-TEST(LogFormat, NumbersAreFittedIntoWidths) {
+TEST(LogFormatTest, NumbersAreFittedIntoWidths) {
     epoch_timeval().set(STAMP - 12, 0);
     expectLines({{"[%8r]", INFO, "", "[   12000]"},
                  {"[%08r]", INFO, "", "[00012000]"},
@@ -232,7 +232,7 @@ TEST(LogFormat, NumbersAreFittedIntoWidths) {
     expectLines({{"[%22r]", INFO, "", "[  18446744073709550616]"}});
 }
 
-TEST(LogFormat, ProcessorTimeIsThatOfTheProcess) {
+TEST(LogFormatTest, ProcessorTimeIsThatOfTheProcess) {
     const std::clock_t before = std::clock();
     const std::string line = lineOf("%u", stampedAt(net, INFO, STAMP), "");
     const std::clock_t after = std::clock();
@@ -243,7 +243,7 @@ TEST(LogFormat, ProcessorTimeIsThatOfTheProcess) {
     EXPECT_GE(after, std::stoll(line));
 }
 
-TEST(LogFormat, DatesAreFittedIntoWidths) {
+TEST(LogFormatTest, DatesAreFittedIntoWidths) {
     const TimeZone utc("UTC0");
     expectLines({{"[%12d{ABSOLUTE}]", INFO, "", "[04:05:06,000]"},
                  {"[%14d{ABSOLUTE}]", INFO, "", "[  04:05:06,000]"},
@@ -253,14 +253,14 @@ TEST(LogFormat, DatesAreFittedIntoWidths) {
                  {"[%.10d]", INFO, "", "[2001-02-03]"}});
 }
 
-TEST(LogFormat, AWholeLine) {
+TEST(LogFormatTest, AWholeLine) {
     const TimeZone utc("UTC0");
     EXPECT_EQ("02-03-2001 04:05:06.007 INFO  net.Http - hello\n",
               lineOf("%d{%m-%d-%Y %H:%M:%S.%l} %-5p %c - %m%n", stampedAt(net, INFO, STAMP, 7500),
                      "hello"));
 }
 
-TEST(LogFormat, OneLayoutServesManyThreads) {
+TEST(LogFormatTest, OneLayoutServesManyThreads) {
     const TimeZone utc("UTC0");
     const LogFormat layout("%d %-5p %c [%t] %06.3m%n");
     const std::string expected = "2001-02-03 04:05:06,007 WARN  net.Http [Main Thread] 0000ab\n";

@@ -8,32 +8,18 @@
 #include <new>
 #include <stdexcept>
 #include <string>
-#include <thread>
 #include <vector>
 
-#include "support/AllocationProbe.h"
+#include "support/FileAppender.h"
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
-#include "support/ScriptedCalls.h"
+#include "support/ScriptedLibc.h"
 #include "support/StderrCapture.h"
+#include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/Logger.h"
-
-extern "C" {
-ssize_t __real_write(int fd, const void* buf, std::size_t size);
-ssize_t __wrap_write(int fd, const void* buf, std::size_t size) {
-    return scriptedCall("write", size,
-                        [&](std::size_t limit) { return __real_write(fd, buf, limit); });
-}
-int __real_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap)
-    __attribute__((format(printf, 3, 0)));
-int __wrap_vsnprintf(char* buf, std::size_t size, const char* fmt, va_list ap) {
-    return scriptedCall("vsnprintf", [&] { return __real_vsnprintf(buf, size, fmt, ap); });
-}
-}
+#include "util/internal/LogGlobals.h"
+#include "util/internal/LogRouting.h"
 
 namespace {
 
@@ -58,8 +44,8 @@ LogChannel& channelNamedLogger(LogLevel minlevel, const std::vector<LogAppender*
     return channel;
 }
 
-TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
-    const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the line feed fill 1024 bytes
+TEST(LogFallbackTest, WritesLevelAndMessageWithOneCall) {
+    const std::string nearlyLong(1024 - 9, 'x');  // "DEBUG - " and the newline fill 1024 bytes
     const struct {
         int level;
         std::string message, expected;
@@ -84,22 +70,7 @@ TEST(FallbackTest, WritesLevelAndMessageWithOneCall) {
     }
 }
 
-TEST(FallbackTest, ALineOfAKibibyteNeedsNoMemory) {
-    REQUIRE_ALLOCATION_PROBE();
-    const std::string prefix = "INFO - ";
-    const std::string text(1024 - prefix.size() - 1, 'x');
-    const std::string longer = text + 'x';
-    const StderrCapture err;
-    AllocationProbe allocations;
-    fallback_to_stderr(INFO, text);
-    const std::size_t count = allocations.count();
-    fallback_to_stderr(INFO, longer);
-    allocations.stop();
-    EXPECT_EQ(0u, count);
-    EXPECT_EQ(prefix + text + '\n' + prefix + longer + '\n', err.text());
-}
-
-TEST(FallbackTest, IgnoresTheResultOfTheCall) {
+TEST(LogFallbackTest, IgnoresTheResultOfTheCall) {
     ScriptedCalls writes("write");
     writes.fail(EIO).limit(3).fail(EINTR);
     const StderrCapture err;
@@ -110,7 +81,7 @@ TEST(FallbackTest, IgnoresTheResultOfTheCall) {
     EXPECT_EQ(3u, writes.calls());
 }
 
-TEST(FallbackTest, KeepsErrnoForTheCallerOfALogger) {
+TEST(LogFallbackTest, KeepsErrnoForTheCallerOfALogger) {
     const Logger logger("name");
     Logger copy(logger);  // goes to the fallback
     ScriptedCalls writes("write");
@@ -122,7 +93,7 @@ TEST(FallbackTest, KeepsErrnoForTheCallerOfALogger) {
     EXPECT_EQ(2u, writes.calls());
 }
 
-TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted) {
+TEST(LogFallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted) {
     const Logger logger("name");
     Logger copy(logger);
     ScriptedCalls formats("vsnprintf");
@@ -132,56 +103,14 @@ TEST(FallbackTest, ShowsTheFormatOfAnUnknownLoggersMessageThatCannotBeFormatted)
     EXPECT_EQ("DEBUG - %s %d\n", err.text());
 }
 
-// Every allocation of a call fails once; whatever it is for, the message or its format comes out,
-// except when the fallback itself has no room.
-TEST(FallbackTest, ExhaustedMemoryLosesAMessageAtMost) {
-    REQUIRE_ALLOCATION_PROBE();
-    Logger logger("name");
-    Logger copy(logger);
-    const std::string text(500, 'x');
-    const std::string longText(2000, 'y');
-    for (Logger* const each : {&logger, &copy}) {
-        std::size_t failing = 1;
-        bool failed = true;
-        for (; failed; ++failing) {
-            const StderrCapture err;
-            AllocationProbe allocations(failing);
-            errno = ENOENT;
-            each->error("%s", text.c_str());
-            EXPECT_EQ(ENOENT, errno);
-            failed = allocations.count() >= failing;
-            allocations.stop();
-            const std::string expected = each == &logger && !failed ? text : "ERROR - " + text;
-            EXPECT_TRUE(err.text() == expected + '\n' || err.text() == "ERROR - %s\n")
-                << failing << ": " << err.text();
-        }
-        EXPECT_LT(2u, failing);
-    }
-}
-
-TEST(FallbackTest, AMessageThatItHasNoRoomForIsLost) {
-    REQUIRE_ALLOCATION_PROBE();
-    const Logger logger("name");
-    Logger copy(logger);
-    const std::string longText(2000, 'y');
-    const StderrCapture err;
-    AllocationProbe allocations(1);
-    EXPECT_THROW(fallback_to_stderr(ERROR, longText), std::bad_alloc);
-    AllocationProbe again(1);
-    copy.error(longText);
-    EXPECT_EQ(1u, again.count());
-    again.stop();
-    EXPECT_EQ("", err.text());
-}
-
-TEST(InternalReportTest, ReachesTheRootAppenderBeforeInitialization) {
+TEST(LogReportTest, ReachesTheRootAppenderBeforeInitialization) {
     expectInChild("report 1\n", [] {
         LogFormat::internal(nullptr, WARN, "report %d", 1);
         LogFormat::internal(nullptr, DEBUG, "suppressed %d", 1);
     });
 }
 
-TEST(InternalReportTest, IgnoresTheRootChannelBeforeInitialization) {
+TEST(LogReportTest, IgnoresTheRootChannelBeforeInitialization) {
     expectInChild("report\n", [] {
         rootChannel().minlevel = EMERG;
         rootChannel()._appenders = {appender("A1")};
@@ -191,12 +120,12 @@ TEST(InternalReportTest, IgnoresTheRootChannelBeforeInitialization) {
     });
 }
 
-TEST(InternalReportTest, FallsBackWhenTheRootAppenderItselfFails) {
+TEST(LogReportTest, FallsBackWhenTheRootAppenderItselfFails) {
     expectInChild("CRIT - report\n",
                   [] { LogFormat::internal(&rootAppender(), CRIT, "%s", "report"); });
 }
 
-TEST(InternalReportTest, WaitsForItsChannelLikeAnyLogger) {
+TEST(LogReportTest, WaitsForItsChannelLikeAnyLogger) {
     expectInChild("", [] {
         const RecordedWrites writes;
         LogFormat::internal(nullptr, WARN, "before");
@@ -209,7 +138,7 @@ TEST(InternalReportTest, WaitsForItsChannelLikeAnyLogger) {
     });
 }
 
-TEST(InternalReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
+TEST(LogReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
     expectInChild("", [] {
         channelNamedLogger(DEBUG, {appender("A1")});
         const RecordedWrites writes;
@@ -219,7 +148,7 @@ TEST(InternalReportTest, IsBoundAtOnceWhenItsFirstReportComesLater) {
     });
 }
 
-TEST(InternalReportTest, SparesTheAppenderThatFailed) {
+TEST(LogReportTest, SparesTheAppenderThatFailed) {
     expectInChild("WARN - nobody left\n", [] {
         LogChannel& channel = channelNamedLogger(INFO, {appender("A1"), appender("A2")});
         const RecordedWrites writes;
@@ -231,7 +160,7 @@ TEST(InternalReportTest, SparesTheAppenderThatFailed) {
     });
 }
 
-TEST(InternalReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
+TEST(LogReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
     expectInChild("", [] {
         const RecordedWrites writes([](const RecordedWrites::Message&) { errno = EIO; });
         errno = ENOSPC;
@@ -245,7 +174,7 @@ TEST(InternalReportTest, PutsTheTextOfErrnoForPercentMAndKeepsIt) {
     });
 }
 
-TEST(InternalReportTest, DoesNotFormatWhatItSuppresses) {
+TEST(LogReportTest, DoesNotFormatWhatItSuppresses) {
     expectInChild("", [] {
         const ScriptedCalls formats("vsnprintf");
         LogFormat::internal(nullptr, DEBUG, "%d", 1);
@@ -253,18 +182,17 @@ TEST(InternalReportTest, DoesNotFormatWhatItSuppresses) {
     });
 }
 
-TEST(InternalReportTest, FallsBackWhenAnAppenderThrows) {
+TEST(LogReportTest, FallsBackWhenAnAppenderThrows) {
     expectInChild("ERROR - report 1\n", [] {
         const RecordedWrites writes(
             [](const RecordedWrites::Message&) { throw std::runtime_error("thrown"); });
         errno = ENOSPC;
         LogFormat::internal(nullptr, ERROR, "report %d", 1);
         EXPECT_EQ(ENOSPC, errno);
-        EXPECT_FALSE(report_in_progress(nullptr));
     });
 }
 
-TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
+TEST(LogReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
     expectInChild("ERROR - report %d\n", [] {
         ScriptedCalls formats("vsnprintf");
         formats.give(-1, 20);
@@ -272,71 +200,54 @@ TEST(InternalReportTest, ShowsTheFormatWhenItCannotBeFormatted) {
     });
 }
 
-TEST(InternalReportTest, AppendersThatReportEachOthersFailuresEndOnStandardError) {
-    // A1 fails; its report goes to A2, which fails, too; the report of that goes nowhere else.
-    expectInChild("ERROR - A2 failed\n", [] {
-        channelNamedLogger(INFO, {appender("A1"), appender("A2")});
-        const RecordedWrites writes([](const RecordedWrites::Message& message) {
-            EXPECT_TRUE(report_in_progress(appender("A1")));
-            EXPECT_EQ(appender("A2"), message.appender);
-            EXPECT_FALSE(report_in_progress(appender("A2")));
-            LogFormat::internal(appender("A2"), ERROR, "A2 failed");
-        });
-        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
-        EXPECT_EQ("ERROR Logger A1 failed\n", writes.text());
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-        EXPECT_FALSE(report_in_progress(appender("A2")));
-    });
-}
-
-TEST(InternalReportTest, AThirdAppenderHearsOfBothFailures) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A1"), appender("A2"), appender("A3")});
-        const RecordedWrites writes([](const RecordedWrites::Message& message) {
-            if (message.appender == appender("A2")) {
-                LogFormat::internal(appender("A2"), ERROR, "A2 failed");
-                EXPECT_TRUE(report_in_progress(appender("A1")));
+// The first report goes to the second appender, which fails in turn, and to the third.
+TEST(LogReportTest, EachOfTwoFailingAppendersIsReportedToTheRest) {
+    for (const bool third : {true, false}) {
+        const TempDir dir;
+        const std::string missing = dir.file("missing/b.log");
+        const std::string secondReport =
+            "Error opening \"" + missing + "\": No such file or directory\n";
+        const ChildRun run = inChild([&] {
+            LogAppender full;
+            LogAppender unopened;
+            FileAppender good(dir.file("good.log"));
+            ASSERT_TRUE(full.setAttribute("fileName", "/dev/full", Pathname()));
+            ASSERT_TRUE(unopened.setAttribute("fileName", missing.c_str(), Pathname()));
+            LogChannel& channel = channelNamedLogger(INFO, {&full, &unopened});
+            if (third) {
+                channel._appenders.push_back(&good);
             }
+            full.write(stampedAt(1000), "lost");
         });
-        LogFormat::internal(appender("A1"), ERROR, "A1 failed");
-        EXPECT_EQ("ERROR Logger A1 failed\nERROR Logger A2 failed\nERROR Logger A1 failed\n",
-                  writes.text());
-        EXPECT_EQ((Written{appender("A2"), appender("A3"), appender("A3")}), writes.appenders());
-    });
+        EXPECT_EQ(0, run.status);
+        EXPECT_EQ(third ? "" : "ERROR - " + secondReport, run.err);
+        EXPECT_EQ(
+            third ? secondReport + "Error writing to \"/dev/full\": No space left on device\n" : "",
+            readFile(dir.file("good.log")));
+    }
 }
 
-TEST(InternalReportTest, IsInProgressOnItsOwnThreadOnly) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A2")});
-        bool here = false;
-        bool elsewhere = true;
-        const RecordedWrites writes([&](const RecordedWrites::Message&) {
-            here = report_in_progress(appender("A1"));
-            std::thread([&] { elsewhere = report_in_progress(appender("A1")); }).join();
+TEST(LogReportTest, WarningsOfAnAppendersSetupGoToTheOthersOnly) {
+    const struct {
+        const char* file;
+        const char* limit;
+        const char* backups;
+        std::size_t warnings;
+    } rows[] = {{"", "0", "0", 1}, {"", "0", "1", 2},          {"", "5", "0", 2},
+                {"", "5", "1", 3}, {"/dev/null", "0", "1", 1}, {"/no/such/file", "0", "0", 1}};
+    for (const auto& row : rows) {
+        const ChildRun run = inChild([&] {
+            LogAppender& a1 = *appender("A1");
+            ASSERT_TRUE(a1.setAttribute("fileName", row.file, Pathname()));
+            ASSERT_TRUE(a1.setAttribute("maxFileSize", row.limit, Pathname()));
+            ASSERT_TRUE(a1.setAttribute("maxBackupIndex", row.backups, Pathname()));
+            channelNamedLogger(INFO, {&a1, appender("A2")});
+            const RecordedWrites writes;
+            a1.finalSetup("A1");
+            EXPECT_EQ(Written(row.warnings, appender("A2")), writes.appenders());
         });
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-        LogFormat::internal(appender("A1"), ERROR, "report");
-        EXPECT_TRUE(here);
-        EXPECT_FALSE(elsewhere);
-        EXPECT_FALSE(report_in_progress(appender("A1")));
-    });
-}
-
-TEST(InternalReportTest, OrdinaryMessagesStillReachAnAppenderWhoseReportIsInProgress) {
-    expectInChild("", [] {
-        channelNamedLogger(INFO, {appender("A2")});
-        LogChannel ordinary;
-        ordinary._appenders = {appender("A1")};
-        Logger logger("name");
-        logger._channel = &ordinary;
-        const RecordedWrites writes([&](const RecordedWrites::Message& message) {
-            if (message.appender == appender("A2")) {
-                logger.info("%s", "ordinary");
-            }
-        });
-        LogFormat::internal(appender("A1"), ERROR, "report");
-        EXPECT_EQ((Written{appender("A2"), appender("A1")}), writes.appenders());
-    });
+        EXPECT_EQ(0, run.status) << row.file << ' ' << row.limit << ' ' << row.backups;
+    }
 }
 
 }  // namespace

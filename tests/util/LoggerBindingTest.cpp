@@ -1,6 +1,8 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <filesystem>
+#include <functional>
 #include <memory>
 #include <string>
 #include <utility>
@@ -9,21 +11,30 @@
 #include "support/InChild.h"
 #include "support/RecordedWrites.h"
 #include "support/StderrCapture.h"
+#include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/LogInternal.h"
 #include "util/Logger.h"
 #include "util/Timeval.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
-std::vector<std::string> lookups;  // the names; "+" marks a lookup with creation
-}
+std::vector<std::string> lookups;    // the names; "+" marks a lookup with creation
+std::function<void()> duringLookup;  // called by each
+}  // namespace
 
-// LogChannel::find(const char*, bool)
+// LogChannel::find
+// clang-format off
+#define CHANNEL_FIND(prefix) \
+    prefix##__ZN10LogChannel4findERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEb
+// clang-format on
 extern "C" {
-LogChannel* __real__ZN10LogChannel4findEPKcb(const char* name, bool create);
-LogChannel* __wrap__ZN10LogChannel4findEPKcb(const char* name, bool create) {
-    lookups.push_back(std::string(name) + (create ? "+" : ""));
-    return __real__ZN10LogChannel4findEPKcb(name, create);
+LogChannel* CHANNEL_FIND(__real)(const std::string& name, bool create);
+LogChannel* CHANNEL_FIND(__wrap)(const std::string& name, bool create) {
+    lookups.push_back(name + (create ? "+" : ""));
+    if (duringLookup) {
+        duringLookup();
+    }
+    return CHANNEL_FIND(__real)(name, create);
 }
 }
 
@@ -41,10 +52,11 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
         const Logger oldest("oldest");
         const Logger middle("middle");
         const Logger newest("newest");
-        LogChannel* const channel = LogChannel::find(std::string("middle"), true);
+        LogChannel* const channel = LogChannel::find("middle", true);
         lookups.clear();
+        EXPECT_FALSE(logger_initialized);
+        duringLookup = [] { EXPECT_TRUE(logger_initialized); };
         Logger::initialize();
-        EXPECT_TRUE(logger_initialized);
         ASSERT_LE(3u, lookups.size());
         EXPECT_EQ("newest", lookups[0]);
         EXPECT_EQ("middle", lookups[1]);
@@ -57,9 +69,28 @@ TEST(LoggerBindingTest, InitializationBindsWaitingLoggersNewestFirst) {
     });
 }
 
+TEST(LoggerBindingTest, TheConfigurationFileIsClosedBeforeChannelsAreSetUp) {
+    const TempDir dir;
+    const std::string cfg = dir.file("log.cfg");
+    writeFile(cfg, "category.X=DEBUG\n");
+    const ChildRun run = inChild([&] {
+        lookups.clear();
+        duringLookup = [&] {
+            for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+                std::error_code gone;  // the iterator's own descriptor
+                EXPECT_NE(cfg, std::filesystem::read_symlink(entry.path(), gone));
+            }
+        };
+        EXPECT_TRUE(Logger::initialize(Pathname(cfg), Pathname()));
+        ASSERT_FALSE(lookups.empty());
+        EXPECT_EQ("X+", lookups[0]);
+    });
+    EXPECT_EQ(0, run.status);
+}
+
 TEST(LoggerBindingTest, LaterLoggersAreBoundAtOnce) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("known"), true);
+        LogChannel* const channel = LogChannel::find("known", true);
         Logger::initialize();
         lookups.clear();
         const Logger known("known");
@@ -81,7 +112,7 @@ TEST(LoggerBindingTest, BindingHappensOnce) {
         const Logger late("name");
         EXPECT_EQ(&rootChannel(), waiting._channel);
         EXPECT_EQ(&rootChannel(), early._channel);
-        EXPECT_EQ(LogChannel::find(std::string("name"), false), late._channel);
+        EXPECT_EQ(LogChannel::find("name", false), late._channel);
         EXPECT_FALSE(waiting.isDebugEnabled());
         EXPECT_TRUE(late.isDebugEnabled());
     });
@@ -145,23 +176,23 @@ TEST(LoggerBindingTest, SetsTheLevelOfTheRootChannelForNull) {
     });
 }
 
-TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItMakes) {
+TEST(LoggerBindingTest, SetsTheLevelOfAChannelThatItCreates) {
     expectInChild("", [] {
         lookups.clear();
         EXPECT_TRUE(Logger::setChannelLevel("new", "FATAL"));
         EXPECT_EQ(std::vector<std::string>{"new+"}, lookups);
-        EXPECT_EQ(FATAL, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_EQ(FATAL, LogChannel::find("new", false)->minlevel);
         EXPECT_TRUE(Logger::setChannelLevel("new", "NOTICE"));
-        EXPECT_EQ(NOTICE, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_EQ(NOTICE, LogChannel::find("new", false)->minlevel);
         EXPECT_EQ(INFO, rootChannel().minlevel);
     });
 }
 
-TEST(LoggerBindingTest, AWordThatIsNoLevelStillMakesTheChannel) {
+TEST(LoggerBindingTest, AWordThatIsNotALevelStillCreatesTheChannel) {
     expectInChild("", [] {
         EXPECT_FALSE(Logger::setChannelLevel("new", "loud"));
-        EXPECT_NE(&rootChannel(), LogChannel::find(std::string("new"), false));
-        EXPECT_EQ(INFO, LogChannel::find(std::string("new"), false)->minlevel);
+        EXPECT_NE(&rootChannel(), LogChannel::find("new", false));
+        EXPECT_EQ(INFO, LogChannel::find("new", false)->minlevel);
     });
 }
 
@@ -209,7 +240,7 @@ TEST(LoggerBindingTest, TheRootChannelDecidesBeforeInitialization) {
 
 TEST(LoggerBindingTest, MessagesGoToTheBoundChannelAfterInitialization) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("name"), true);
+        LogChannel* const channel = LogChannel::find("name", true);
         LogAppender* const appender = LogAppender::find("A1", true);
         channel->minlevel = WARN;
         channel->_appenders = {appender};
@@ -254,8 +285,8 @@ TEST(LoggerBindingTest, ACopyOfAWaitingLoggerGoesUnfilteredToStandardError) {
             copy.debug(std::runtime_error("exception"));
             copy.fatal("%s", "last");
 
-            // Nobody binds it, so that it stays with the root channel.
-            LogChannel::find(std::string("name"), true)->minlevel = EMERG;
+            // It is never bound, so it keeps the root channel.
+            LogChannel::find("name", true)->minlevel = EMERG;
             Logger::initialize();
             EXPECT_EQ(nullptr, copy._channel);
             copy.debug("%s", "suppressed");
@@ -265,7 +296,7 @@ TEST(LoggerBindingTest, ACopyOfAWaitingLoggerGoesUnfilteredToStandardError) {
 
 TEST(LoggerBindingTest, ACopyOfABoundLoggerIsBound) {
     expectInChild("", [] {
-        LogChannel* const channel = LogChannel::find(std::string("name"), true);
+        LogChannel* const channel = LogChannel::find("name", true);
         Logger::initialize();
         const Logger logger("name");
         const Logger copy(logger);
@@ -314,7 +345,7 @@ TEST(LoggerBindingTest, ALoggerThatIsNotConstructedYetGoesUnfilteredToStandardEr
 }
 
 TEST(LoggerBindingTest, LoggersWorkAfterMain) {
-    // Destroyed when those made in main and all static ones are gone.
+    // Destroyed after the loggers of main and after all static ones.
     static struct AtExit {
         ~AtExit() {
             if (kept == nullptr) {

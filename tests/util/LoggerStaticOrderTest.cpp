@@ -78,7 +78,7 @@ TEST(LoggerStaticOrderTest, UnitsLogThroughLoggersThatAreNotMadeYetOrGone) {
 }
 
 // Standard error must not close before the loggers that were made before the first message.
-TEST(LoggerStaticOrderTest, DestructorsLogWhenNobodyLoggedBeforeMain) {
+TEST(LoggerStaticOrderTest, DestructorsLogIfNothingWasLoggedBeforeMain) {
     const struct {
         const char *program, *expected;
     } rows[] = {

@@ -1,4 +1,4 @@
-// Calls of the printf-like members, compiled but never run. Nothing may be complained about, except
+// Calls of the printf-like members, compiled but never run. The compiler must accept all, except
 // with WRONG_ARGUMENTS, where the compiler must complain about each of them.
 
 #include <string>

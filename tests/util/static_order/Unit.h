@@ -2,7 +2,8 @@
 #define QUELTA_TESTS_UTIL_STATIC_ORDER_UNIT_H_
 
 // The two units of a program whose static objects log while they are made and destroyed. Linked in
-// either order, so that each has to live with the other's logger not being made yet, or being gone.
+// either order, so that each runs while the other's logger is not constructed yet, or already
+// destroyed.
 
 #include <cstdlib>
 

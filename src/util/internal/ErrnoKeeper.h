@@ -1,7 +1,7 @@
-#ifndef QUELTA_UTIL_ERRNOKEEPER_H_
-#define QUELTA_UTIL_ERRNOKEEPER_H_
+#ifndef QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_
+#define QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_
 
-// Puts errno back at the end of a scope to what it was at its beginning.
+// Restores errno at the end of a scope.
 // Not thread-safe; one thread at a time per object.
 
 #include <cerrno>
@@ -13,11 +13,11 @@ public:
     ErrnoKeeper(const ErrnoKeeper&) = delete;
     ErrnoKeeper& operator=(const ErrnoKeeper&) = delete;
 
-    // The value that will be put back.
+    // The value that will be restored.
     int saved() const { return _saved; }
 
 private:
     const int _saved = errno;
 };
 
-#endif  // QUELTA_UTIL_ERRNOKEEPER_H_
+#endif  // QUELTA_UTIL_INTERNAL_ERRNOKEEPER_H_

@@ -1,0 +1,43 @@
+#ifndef QUELTA_UTIL_INTERNAL_FORMATTEXT_H_
+#define QUELTA_UTIL_INTERNAL_FORMATTEXT_H_
+
+// printf into a buffer that grows until the text fits.
+// Safe from any thread.
+
+#include <cstdarg>
+#include <cstddef>
+#include <cstdio>
+#include <memory>
+#include <stdexcept>
+
+// Formats the arguments and calls `use(text, length)` with the text, which is valid during the
+// call. Errors: std::bad_alloc; std::runtime_error if the C library cannot format the arguments,
+// for example a wide character without a multibyte form. Cost: allocates only for texts of 256
+// characters and more.
+template <typename Use>
+__attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_list ap, Use use) {
+    constexpr std::size_t MAX_GUESSED_SIZE = std::size_t{1} << 20;  // bytes
+    char first[256];
+    std::unique_ptr<char[]> larger;
+    char* buf = first;
+    std::size_t size = sizeof first;
+    for (;;) {
+        std::va_list pass;
+        va_copy(pass, ap);
+        const int length = std::vsnprintf(buf, size, fmt, pass);
+        va_end(pass);
+        if (length >= 0 && static_cast<std::size_t>(length) < size) {
+            use(buf, static_cast<std::size_t>(length));
+            return;
+        }
+        // A negative length may mean that the buffer is too small, up to a point.
+        if (length < 0 && size >= MAX_GUESSED_SIZE) {
+            throw std::runtime_error("cannot format a text");
+        }
+        size = length < 0 ? 2 * size : static_cast<std::size_t>(length) + 1;
+        larger.reset(new char[size]);
+        buf = larger.get();
+    }
+}
+
+#endif  // QUELTA_UTIL_INTERNAL_FORMATTEXT_H_

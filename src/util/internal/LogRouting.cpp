@@ -1,0 +1,94 @@
+#include "util/internal/LogRouting.h"
+
+#include <unistd.h>
+
+#include <string>
+
+#include "util/LogFormat.h"
+#include "util/Logger.h"
+#include "util/internal/ErrnoKeeper.h"
+#include "util/internal/LogGlobals.h"
+#include "util/internal/NeverDestroyed.h"
+
+constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
+
+void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept try {
+    std::size_t length = 0;
+    const std::string line = loglevel2str(&length, level) + (" - " + msg + '\n');
+    // One write, so that lines of several threads or processes do not mix.
+    [[maybe_unused]] const ssize_t ignored = ::write(STDERR_FILENO, line.data(), line.size());
+} catch (...) {
+    // There is nowhere left to report to.
+}
+
+bool LogFormat::check_for_unitialized_logger(const Logger* logger) {
+    if (logger_initialized) {
+        return false;
+    }
+    const Logger* waiting = uninitialized_loggers;
+    while (waiting != nullptr && waiting != logger) {
+        waiting = waiting->_next;
+    }
+    return waiting == nullptr;
+}
+
+void LogFormat::do_log(Logger* logger, LogLevel level, const std::string& msg) {
+    const ErrnoKeeper errnoKeeper;
+    if (check_for_unitialized_logger(logger)) {
+        fallback_to_stderr(level, msg);
+        return;
+    }
+    LogChannel& channel = logger->_channel != nullptr ? *logger->_channel : rootChannel();
+    if (level < channel.minlevel) {
+        return;
+    }
+    try {
+        channel.write(LogMsgMetadata(logger, level), msg);
+    } catch (...) {
+        fallback_to_stderr(level, msg);
+    }
+}
+
+void LogFormat::do_log(Logger* logger, LogLevel level, const char* fmt, va_list ap) {
+    const ErrnoKeeper errnoKeeper;
+    const LogChannel& channel = logger->_channel != nullptr ? *logger->_channel : rootChannel();
+    if (level < channel.minlevel && !check_for_unitialized_logger(logger)) {
+        return;
+    }
+    std::string msg;
+    try {
+        msg = fmt;  // written if it cannot be formatted
+        Logger::vformat(msg, errnoKeeper.saved(), fmt, ap);
+    } catch (...) {
+        fallback_to_stderr(level, msg);
+        return;
+    }
+    do_log(logger, level, msg);
+}
+
+void LogFormat::internal(const LogAppender* failing, LogLevel level, const char* fmt, ...) {
+    static NeverDestroyed<Logger> logger("Logger");
+    static constinit NeverDestroyed<LogChannel> empty_channel;
+
+    const ErrnoKeeper errnoKeeper;
+    LogChannel& channel =
+        logger.value._channel != nullptr ? *logger.value._channel : empty_channel.value;
+    if (level < channel.minlevel) {
+        return;
+    }
+    std::string msg;
+    bool written = false;
+    va_list ap;
+    va_start(ap, fmt);
+    try {
+        msg = fmt;  // written if it cannot be formatted
+        Logger::vformat(msg, errnoKeeper.saved(), fmt, ap);
+        written = channel.write(LogMsgMetadata(&logger.value, level), msg, failing);
+    } catch (...) {
+        // Not written: falls back.
+    }
+    va_end(ap);
+    if (!written) {
+        fallback_to_stderr(level, msg);
+    }
+}
