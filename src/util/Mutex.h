@@ -84,7 +84,8 @@ public:
 private:
     friend class ConditionBaseClass;
 
-    pthread_mutex_t _pthread_mutex;
+    // Valid even if pthread_mutex_init fails and errors are ignored.
+    pthread_mutex_t _pthread_mutex = PTHREAD_MUTEX_INITIALIZER;
 };
 
 // A lock that its owner can take again. It is released by as many calls of unlock() as of lock().
@@ -142,7 +143,8 @@ public:
     void verify_mem() const {}
 
 private:
-    pthread_cond_t _pthread_cond;
+    // Valid even if pthread_cond_init fails and errors are ignored.
+    pthread_cond_t _pthread_cond = PTHREAD_COND_INITIALIZER;
 };
 
 // A condition that wakes every waiter.
