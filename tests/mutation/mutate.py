@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
 """Breaks one operator, constant or comparison of a source at a time and checks that a test fails.
 
-Works on copies of the project below BUILD_DIR, one for each job. tests/units.txt lists the tests of
-each source. equivalents.txt explains the mutants that no test can tell from the original. Prints
-each survivor as path:line: before -> after. Exits with 1 if a mutant survives without explanation,
-or if an explained one does not survive or does not exist.
+Works on copies of the project below build/mutation, one for each job. tests/units.txt lists the
+tests of each source. equivalents.txt explains the mutants that no test can tell from the original.
+Prints each survivor as path:line: before -> after, and the fields to list it with. Exits with 1 if
+a mutant survives without explanation, or an explained one does not survive or does not exist.
 """
 import argparse
 import bisect
@@ -258,7 +258,7 @@ def run(chosen, options, explained):
     trees = queue.SimpleQueue()
     jobs = min(options.jobs, len(chosen))
     for job in range(jobs):
-        trees.put(Tree(options.build_dir.resolve() / str(job), max(1, os.cpu_count() // jobs)))
+        trees.put(Tree(options.build.resolve() / str(job), max(1, os.cpu_count() // jobs)))
 
     def test(pair):
         tree = trees.get()
@@ -285,19 +285,22 @@ def run(chosen, options, explained):
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__.split('\n')[0])
-    parser.add_argument('build_dir', type=pathlib.Path, nargs='?', default='build/mutation')
     parser.add_argument('sources', nargs='*', help='names of files of src/ (all)')
     parser.add_argument('--check', action='store_true', help='only check equivalents.txt')
     parser.add_argument('--since', metavar='REV', help='only lines that differ from that revision')
     parser.add_argument('--sample', type=int, default=0, help='mutants per source (all)')
     parser.add_argument('--seed', type=int, default=1, help='of the sample')
     parser.add_argument('--jobs', type=int, default=os.cpu_count(), help='copies at work at once')
-    options = parser.parse_intermixed_args()
+    parser.add_argument('--build', type=pathlib.Path, default=ROOT / 'build' / 'mutation',
+                        metavar='DIR', help='for the copies')
+    options = parser.parse_args()
 
     listed = units.Units(HERE.parent / 'units.txt')
     programs = units.test_programs(HERE.parent)
     files = [path.relative_to(ROOT) for path in units.sources(ROOT / 'src')]
     by_file = {path: list(mutants(path)) for path in files}
+    for name in set(options.sources) - {path.name for path in files}:
+        parser.error(f'no such source: {name}')
     explained = explained_mutants()
     problems = check_explained(explained, {m.key for ms in by_file.values() for m in ms})
     print(f'{sum(map(len, by_file.values()))} mutants in {sum(map(bool, by_file.values()))} files, '
