@@ -140,8 +140,8 @@ TEST(XmlNodeTest, RenamesTheElementAndKeepsItsContent) {
 
 TEST(XmlNodeTest, RefusesWhatIsNoNameAndStaysAsItWas) {
     xml::node node = makeNode("kept", "text");
-    for (const char* bad :
-         {static_cast<const char*>(nullptr), "", " ", "1st", "two words", "a<b", "\xff\xfe"}) {
+    for (const char* bad : {static_cast<const char*>(nullptr), "", " ", " a", "1st", "two words",
+                            "a<b", "\xff\xfe"}) {
         EXPECT_THROW(xml::node{bad}, std::invalid_argument);
         EXPECT_THROW(node.set_name(bad), std::invalid_argument);
     }
