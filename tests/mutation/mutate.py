@@ -3,8 +3,8 @@
 
 Works on copies of the project below build/mutation, one for each job. tests/units.txt lists the
 tests of each source. equivalents.txt explains the mutants that no test can tell from the original.
-Prints each survivor as path:line: before -> after, and the fields to list it with. Exits with 1 if a
-mutant survives without explanation, or if an explained one does not survive or does not exist.
+Prints each survivor as path:line: before -> after, and the fields to list it with. Exits with 1 if
+a mutant survives without explanation, or an explained one does not survive or does not exist.
 """
 import argparse
 import bisect

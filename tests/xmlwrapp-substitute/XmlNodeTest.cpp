@@ -39,8 +39,8 @@ TEST(XmlNodeTest, KeepsContentAsGivenIncludingMarkup) {
 }
 
 TEST(XmlNodeTest, RefusesWhatIsNotANameOrNotUtf8) {
-    for (const char* bad :
-         {static_cast<const char*>(nullptr), "", " ", "1st", "two words", "a<b", "\xff\xfe"}) {
+    for (const char* bad : {static_cast<const char*>(nullptr), "", " ", " a", "1st", "two words",
+                            "a<b", "\xff\xfe"}) {
         EXPECT_THROW(xml::node{bad}, std::invalid_argument);
     }
     xml::node node = makeNode("n", "old");
