@@ -98,7 +98,7 @@ TEST_F(FileDescriptorTest, OperationsWithoutAFileFailWithEbadf) {
     const FileDescriptor stale(closed);
     ASSERT_TRUE(closed.close());
     for (const FileDescriptor& none : {FileDescriptor(-1), stale}) {
-        char buf[4];
+        char buf[4] = {};
         struct stat info;
         long long size = 7;
         const struct iovec buffer = {buf, sizeof buf};
@@ -228,7 +228,7 @@ bool isCancelledIn(std::function<void()> body) {
 }
 
 TEST_F(FileDescriptorTest, AThreadCanBeCancelledInCallsThatBlock) {
-    char byte;
+    char byte = 0;
     const struct iovec buffer = {&byte, 1};
     EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_file.read(&byte, 1)); }));
     EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_file.write("x")); }));
