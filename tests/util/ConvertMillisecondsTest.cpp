@@ -2,11 +2,11 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <string>
 
 #include "support/AllStrings.h"
 #include "support/Examples.h"
+#include "support/SlowMilliseconds.h"
 
 namespace {
 
@@ -63,33 +63,6 @@ TEST(ConvertMillisecondsTest, TheCountMayBeNull) {
     EXPECT_EQ(3000u, msecs);
     EXPECT_FALSE(convert_string_to_milliseconds("x", &msecs, nullptr));
     EXPECT_EQ(0u, msecs);
-}
-
-// The same from the digits as text: tenths of milliseconds by padding, rounding and comparing.
-std::string convertSlowly(const std::string& text) {
-    const std::string digits = "0123456789";
-    const std::size_t start = std::min(text.find_first_not_of(" \t"), text.size());
-    const std::size_t wholeEnd = std::min(text.find_first_not_of(digits, start), text.size());
-    std::size_t end = wholeEnd;
-    std::string fraction;
-    if (wholeEnd < text.size() && text[wholeEnd] == '.') {
-        const std::size_t fractionEnd =
-            std::min(text.find_first_not_of(digits, wholeEnd + 1), text.size());
-        fraction = text.substr(wholeEnd + 1, fractionEnd - wholeEnd - 1);
-        if (!fraction.empty() || wholeEnd + 1 == text.size()) {
-            end = fractionEnd;
-        }
-    }
-    if (end == start) {
-        return "none";
-    }
-    const std::string tenths =
-        '0' + text.substr(start, wholeEnd - start) + (fraction + "0000").substr(0, 4);
-    unsigned long long msecs = (std::stoull(tenths) + 5) / 10;
-    if (msecs == 0 && fraction.find_first_not_of('0') != std::string::npos) {
-        msecs = 1;
-    }
-    return std::to_string(msecs) + ' ' + std::to_string(end);
 }
 
 TEST(ConvertMillisecondsTest, AgreesWithTheSlowVersionOnEveryShortText) {
