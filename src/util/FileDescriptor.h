@@ -9,7 +9,8 @@
 // result (-1, 0 or false) with errno as the system call left it; nothing is logged, and only the
 // allocation of a long formatted text can throw.
 // Not thread-safe; one thread at a time per object. Several threads may use one open file as far as
-// the operating system allows.
+// the operating system allows. A thread can be cancelled in every call that can block, except the
+// close in a destructor.
 
 #include <sys/stat.h>
 #include <sys/types.h>

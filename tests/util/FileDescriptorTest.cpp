@@ -2,12 +2,14 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <pthread.h>
 #include <sys/stat.h>
 #include <sys/uio.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdarg>
+#include <functional>
 #include <string>
 #include <thread>
 #include <type_traits>
@@ -96,7 +98,7 @@ TEST_F(FileDescriptorTest, OperationsWithoutAFileFailWithEbadf) {
     const FileDescriptor stale(closed);
     ASSERT_TRUE(closed.close());
     for (const FileDescriptor& none : {FileDescriptor(-1), stale}) {
-        char buf[4];
+        char buf[4] = {};
         struct stat info;
         long long size = 7;
         const struct iovec buffer = {buf, sizeof buf};
@@ -193,21 +195,48 @@ TEST_F(FileDescriptorTest, SaferOpenDoesNotHangOnAFifo) {
 }
 
 TEST_F(FileDescriptorTest, SeeksAndMeasuresPastFourGigabytes) {
-    constexpr long long offset = 5LL << 30;
+    constexpr long long OFFSET = 5LL << 30;
     EXPECT_EQ(0, _file.curPos());
-    EXPECT_TRUE(_file.seek_set(offset));
-    EXPECT_EQ(offset, _file.curPos());
+    EXPECT_TRUE(_file.seek_set(OFFSET));
+    EXPECT_EQ(OFFSET, _file.curPos());
     EXPECT_FALSE(_file.seek_set(-1));
     EXPECT_EQ(EINVAL, errno);
     EXPECT_EQ(1, _file.write("x"));
     EXPECT_TRUE(_file.seek_set(2));
-    EXPECT_EQ(offset + 1, _file.seekEof());
-    EXPECT_EQ(offset + 1, _file.curPos());
+    EXPECT_EQ(OFFSET + 1, _file.seekEof());
+    EXPECT_EQ(OFFSET + 1, _file.curPos());
     long long size = 0;
     struct stat info;
     EXPECT_TRUE(_file.getSize(&size) && _file.stat(&info));
-    EXPECT_EQ(offset + 1, size);
-    EXPECT_EQ(offset + 1, info.st_size);
+    EXPECT_EQ(OFFSET + 1, size);
+    EXPECT_EQ(OFFSET + 1, info.st_size);
+}
+
+// Runs `body`, which must reach a call that can block, in a thread that is cancelled.
+// Returns: whether the cancellation ended the thread.
+bool isCancelledIn(std::function<void()> body) {
+    const auto start = [](void* argument) -> void* {
+        ::pthread_cancel(::pthread_self());
+        (*static_cast<std::function<void()>*>(argument))();
+        return nullptr;
+    };
+    pthread_t thread;
+    void* result = nullptr;
+    EXPECT_EQ(0, ::pthread_create(&thread, nullptr, start, &body));
+    EXPECT_EQ(0, ::pthread_join(thread, &result));
+    return result == PTHREAD_CANCELED;
+}
+
+TEST_F(FileDescriptorTest, AThreadCanBeCancelledInCallsThatBlock) {
+    char byte = 0;
+    const struct iovec buffer = {&byte, 1};
+    EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_file.read(&byte, 1)); }));
+    EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_file.write("x")); }));
+    EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_file.writev(&buffer, 1)); }));
+    EXPECT_TRUE(isCancelledIn([&] { _file.sync(); }));
+    EXPECT_TRUE(isCancelledIn([&] { _file.copyTo(_file); }));
+    EXPECT_TRUE(isCancelledIn([&] { static_cast<void>(_path.openReadOnly()); }));
+    EXPECT_EQ("", readFile(_path));
 }
 
 // As a wrapper of the caller's own would use it; writes the text twice.
