@@ -1,5 +1,6 @@
 #include "util/LogChannel.h"
 
+#include <functional>
 #include <list>
 #include <map>
 #include <string_view>
@@ -20,10 +21,13 @@ LogChannel* newChannel() {
     return &created.value.emplace_back(rootChannel());
 }
 
-// Channels by name, emptied at exit. The map itself is never destroyed: a logger that is created
-// even later looks its name up and finds the root channel.
-std::map<std::string, LogChannel*>& channels() {
-    static NeverDestroyed<std::map<std::string, LogChannel*>> map;
+// Channels by name, found without a copy of the name.
+using ChannelMap = std::map<std::string, LogChannel*, std::less<>>;
+
+// Emptied at exit. The map itself is never destroyed: a logger that is created even later looks its
+// name up and finds the root channel.
+ChannelMap& channels() {
+    static NeverDestroyed<ChannelMap> map;
     static const struct Emptier {
         ~Emptier() { map.value.clear(); }
     } emptier;
@@ -32,12 +36,12 @@ std::map<std::string, LogChannel*>& channels() {
 
 }  // namespace
 
-LogChannel* LogChannel::find(const std::string& name, bool create) {
+LogChannel* LogChannel::find(std::string_view name, bool create) {
     const auto found = channels().find(name);
     if (found != channels().end()) {
         return found->second;
     }
-    return create ? channels()[name] = newChannel() : &rootChannel();
+    return create ? channels()[std::string(name)] = newChannel() : &rootChannel();
 }
 
 bool LogChannel::changeLevel(const std::string& word) {

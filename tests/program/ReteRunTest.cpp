@@ -139,7 +139,7 @@ TEST_F(ReteRunTest, ReportsEachBadLineOfTheConfiguration) {
                   at + "6: Unterminated XML comment started\n" +                //
                   at + "4: Parse error at \"no key\"\n" +                       //
                   at + "5: Parse error at \"appender.A.maxFileSize=10MB\"\n" +  //
-                  at + "1: Parse error at \"INFO,nowhere\"\n" +    //
+                  at + "1: Parse error at \"INFO,nowhere\"\n" +                 //
                   at + "2: Parse error at \"X=loud\"\n");
 }
 

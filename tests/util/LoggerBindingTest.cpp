@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -25,12 +26,12 @@ std::function<void()> duringLookup;  // called by each
 // LogChannel::find
 // clang-format off
 #define CHANNEL_FIND(prefix) \
-    prefix##__ZN10LogChannel4findERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEb
+    prefix##__ZN10LogChannel4findESt17basic_string_viewIcSt11char_traitsIcEEb
 // clang-format on
 extern "C" {
-LogChannel* CHANNEL_FIND(__real)(const std::string& name, bool create);
-LogChannel* CHANNEL_FIND(__wrap)(const std::string& name, bool create) {
-    lookups.push_back(name + (create ? "+" : ""));
+LogChannel* CHANNEL_FIND(__real)(std::string_view name, bool create);
+LogChannel* CHANNEL_FIND(__wrap)(std::string_view name, bool create) {
+    lookups.push_back(std::string(name) + (create ? "+" : ""));
     if (duringLookup) {
         duringLookup();
     }
