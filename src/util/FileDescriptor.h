@@ -86,7 +86,8 @@ public:
     // Errors: false with errno; ENOSPC if a write of the destination returns 0.
     // Cost: 8192 bytes of stack, no heap.
     bool copyTo(FileDescriptor dest) const;
-    // The same into a file that is created with this one's permission bits, or emptied first.
+    // Copies in the same way to a file that is created with this one's permission bits, or emptied
+    // first.
     // Requires: it is not the file that is read.
     bool copyTo(const Pathname& dest) const;
 

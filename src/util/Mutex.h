@@ -166,7 +166,8 @@ public:
     // Requires: the caller holds `mutex`.
     void wait(Mutex& mutex);
 
-    // The same for at most `timeoutSecs` seconds from the call, unaffected by changes of the clock.
+    // Waits in the same way for at most `timeoutSecs` seconds from the call, unaffected by changes
+    // of the clock.
     // Returns: true when woken, false on timeout. After mainThreadDying() a failure also returns
     // false.
     bool wait(Mutex& mutex, unsigned int timeoutSecs);

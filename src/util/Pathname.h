@@ -183,7 +183,8 @@ public:
     [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const;
     // Opens the file for writing; creates it, or empties an existing one.
     [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const;
-    // The same, creating it with the permission bits of the file `model`; fails if fstat does.
+    // Opens in the same way, but creates with the permission bits of the file `model`; fails if
+    // fstat does.
     [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const;
     // Opens the file for writing, or creates it; each write goes to the end.
     [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const;

@@ -48,7 +48,7 @@ public:
     // Errors: std::bad_alloc, and what copying `data` throws; no value is stored then.
     void addData(const std::string& key, const T& data) { reach(key)._dataList.push_back(data); }
 
-    // The same, moving `data`.
+    // Moves `data` to the values under `key`.
     void addData(const std::string& key, T&& data) {
         reach(key)._dataList.push_back(std::move(data));
     }

@@ -60,8 +60,8 @@ public:
     // new segments are placed after the old count, and the earlier pattern copies stay allocated
     // for the life of the process. An object that had segments therefore matches nothing any more,
     // since a null entry never matches. Self-assignment is a no-op.
-    // Errors: std::length_error when the segments together exceed MAX_SUBSTRINGS, std::bad_alloc;
-    // the object is unchanged then.
+    // Errors: std::length_error if the segments together exceed MAX_SUBSTRINGS; the object is
+    // unchanged then. std::bad_alloc; it matches as before then.
     WildcardMatcher& operator=(const WildcardMatcher& other);
 
     // Frees the pattern.
@@ -74,7 +74,7 @@ public:
     // Cost: no allocation.
     bool isMatch(const char* haystack) const;
 
-    // Returns: the same for a text whose length in bytes, up to its NUL, is known.
+    // Returns: whether the whole of a text matches whose length in bytes, up to its NUL, is known.
     bool isMatch(const char* haystack, std::size_t length) const;
 
     // Prefetches what isMatch reads of the object, for callers that try many matchers in a row.
