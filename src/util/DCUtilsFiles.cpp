@@ -48,18 +48,18 @@ char* readText(const Pathname& filename) {
     if (file == nullptr || !filename.getSize(&size)) {
         return nullptr;
     }
-    auto capacity = static_cast<std::size_t>(size);  // bytes without the NUL
-    std::unique_ptr<char[]> text(new (std::nothrow) char[capacity + 1]);
+    std::size_t capacity = static_cast<std::size_t>(size) + 1;  // bytes, with the NUL
+    std::unique_ptr<char[]> text(new (std::nothrow) char[capacity]);
     if (text == nullptr) {
         std::printf("Unable to alloc %lld for reading file %s\n", size, filename.c_str());
         return nullptr;
     }
     std::size_t used = 0;
     for (int c = std::getc(file.get()); c != EOF; c = std::getc(file.get())) {
-        if (used == capacity) {
+        if (used + 1 == capacity) {
             // Files in /proc, pipes and growing files are longer than their size.
-            capacity = 2 * capacity + 1;
-            std::unique_ptr<char[]> larger(new char[capacity + 1]);
+            capacity *= 2;
+            std::unique_ptr<char[]> larger(new char[capacity]);
             std::copy_n(text.get(), used, larger.get());
             text = std::move(larger);
         }

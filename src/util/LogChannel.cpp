@@ -34,14 +34,22 @@ ChannelMap& channels() {
     return map.value;
 }
 
-}  // namespace
-
-LogChannel* LogChannel::find(std::string_view name, bool create) {
+LogChannel* findChannel(std::string_view name, bool create) {
     const auto found = channels().find(name);
     if (found != channels().end()) {
         return found->second;
     }
     return create ? channels()[std::string(name)] = newChannel() : &rootChannel();
+}
+
+}  // namespace
+
+LogChannel* LogChannel::find(const std::string& name, bool create) {
+    return findChannel(name, create);
+}
+
+LogChannel* LogChannel::find(const char* name, bool create) {
+    return findChannel(name, create);
 }
 
 bool LogChannel::changeLevel(const std::string& word) {

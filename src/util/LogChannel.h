@@ -19,7 +19,6 @@
 // Configured before other threads start; safe from any thread afterwards.
 
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "util/LogLevel.h"
@@ -32,8 +31,10 @@ class LogChannel {
 public:
     // Finds a channel by its name. For an unknown name, either creates a copy of the root channel
     // under that name (`create`) or returns the root channel itself, recording nothing.
+    // Requires: `name` is not null.
     // Returns: never null.
-    static LogChannel* find(std::string_view name, bool create);
+    static LogChannel* find(const std::string& name, bool create);
+    static LogChannel* find(const char* name, bool create);
 
     // Sets the minimum level by its name; upper case only, so "debug" is not a level.
     // Returns: false, with the level as it was, if `word` does not name a level.

@@ -5,7 +5,6 @@
 #include <functional>
 #include <memory>
 #include <string>
-#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -23,19 +22,29 @@ std::vector<std::string> lookups;    // the names; "+" marks a lookup with creat
 std::function<void()> duringLookup;  // called by each
 }  // namespace
 
-// LogChannel::find
-// clang-format off
-#define CHANNEL_FIND(prefix) \
-    prefix##__ZN10LogChannel4findESt17basic_string_viewIcSt11char_traitsIcEEb
-// clang-format on
-extern "C" {
-LogChannel* CHANNEL_FIND(__real)(std::string_view name, bool create);
-LogChannel* CHANNEL_FIND(__wrap)(std::string_view name, bool create) {
-    lookups.push_back(std::string(name) + (create ? "+" : ""));
+static void recordLookup(const std::string& name, bool create) {
+    lookups.push_back(name + (create ? "+" : ""));
     if (duringLookup) {
         duringLookup();
     }
-    return CHANNEL_FIND(__real)(name, create);
+}
+
+// The two forms of LogChannel::find.
+// clang-format off
+#define FIND_TEXT(prefix) prefix##__ZN10LogChannel4findEPKcb
+#define FIND_STRING(prefix) \
+    prefix##__ZN10LogChannel4findERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEb
+// clang-format on
+extern "C" {
+LogChannel* FIND_TEXT(__real)(const char* name, bool create);
+LogChannel* FIND_TEXT(__wrap)(const char* name, bool create) {
+    recordLookup(name, create);
+    return FIND_TEXT(__real)(name, create);
+}
+LogChannel* FIND_STRING(__real)(const std::string& name, bool create);
+LogChannel* FIND_STRING(__wrap)(const std::string& name, bool create) {
+    recordLookup(name, create);
+    return FIND_STRING(__real)(name, create);
 }
 }
 
