@@ -54,6 +54,9 @@ install(FILES README.md CHANGELOG.md CONTRIBUTING.md DESTINATION "${CMAKE_INSTAL
 install(DIRECTORY docs examples DESTINATION "${CMAKE_INSTALL_DOCDIR}"
   FILES_MATCHING REGEX "\\.(md|svg|cpp|cfg|txt)$" PATTERN "CMakeLists.txt" EXCLUDE)
 
+# The API reference, if `script/check docs` has built it.
+install(DIRECTORY build/docs/html/ DESTINATION "${CMAKE_INSTALL_DOCDIR}/api" OPTIONAL)
+
 set(CPACK_GENERATOR DEB)
 set(CPACK_PACKAGE_CONTACT "The Quelta developers <quelta@localhost>")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)

@@ -3,6 +3,13 @@
 
 // Free functions for NUL-terminated strings, strings, numbers and whole small text files.
 //
+//     std::string line = strip(std::string(" Port = 8080 \n"));
+//     if (startsCaseWith(line.c_str(), "port")) {
+//         bool successful = false;
+//         const long port = getLong(line.substr(line.find('=') + 1), successful);
+//         std::printf("%ld %s\n", port, bool2str(successful));  // "8080 True"
+//     }
+//
 // A function that returns `char*` returns a new array that the caller releases with delete[],
 // except my_strcasestr and ltoa, which return a pointer into their argument. Pointers must not be
 // null unless the comment of the function describes null. Characters are bytes: case and white
@@ -24,7 +31,7 @@ class Pathname;
 // either is null.
 [[nodiscard]] bool startsWith(const char* str, const char* prefix);
 [[nodiscard]] bool startsWith(const std::string& keyword, const std::string& prefix);
-// The same ignoring case; neither may be null.
+// Returns: whether `str` starts with `prefix`, ignoring case; neither may be null.
 [[nodiscard]] bool startsCaseWith(const char* str, const char* prefix);
 // Returns: whether `text` ends with `suffix`; every text ends with the empty one.
 [[nodiscard]] bool endsWith(const std::string& text, const std::string& suffix);
@@ -41,8 +48,9 @@ class Pathname;
 [[nodiscard]] char* strip(const char* inString);
 [[nodiscard]] std::string strip(const std::string& str);
 
-// Copies a text in lower case (null for null), or lowers a string in place, embedded NULs included.
+// Copies a text in lower case; null for null.
 [[nodiscard]] char* lowercase(const char* inString);
+// Changes a string to lower case in place, embedded NULs included.
 void lowercase(std::string& str);
 
 // Replaces every `findStr`, from left to right; replaced text is not searched again. An empty
@@ -98,9 +106,10 @@ std::string& ltoa(long val, std::string& out);
 long getLong(const std::string& str, bool& successful);
 
 // Reads the same numbers as strtod, if the text starts with '-' or a digit and ends with the
-// number. Returns: -9.99e99 for any other text, and for a number that is too large or too small.
-// errno is 0 after each conversion, whatever it was before. Deliberate: "+1", ".5" and " 1" fail,
-// while "0x10" is 16 and "-inf" is minus infinity.
+// number. errno is 0 after each conversion, whatever it was before.
+// Returns: the number; -9.99e99 for any other text, and for a number that is too large or too
+// small.
+// Deliberate: "+1", ".5" and " 1" fail, while "0x10" is 16 and "-inf" is minus infinity.
 [[nodiscard]] double getDouble(const std::string& str);
 
 // --- Text files ------------------------------------------------------------------------------

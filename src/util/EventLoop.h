@@ -1,15 +1,23 @@
 #ifndef QUELTA_UTIL_EVENTLOOP_H_
 #define QUELTA_UTIL_EVENTLOOP_H_
 
-// InThreadActor: a unit of work that another thread's event loop runs on this thread's behalf.
-// The event loop is not part of this library. The fields belong to it: the list of pending actors,
-// and what wakes a thread that waits until an actor has run.
+// A unit of work that another thread's event loop runs on this thread's behalf.
+//
+//     class Reload : public InThreadActor {
+//     public:
+//         void callback() override { std::puts("reloading"); }
+//     };
+//
+// The event loop is not part of this library. The fields of an actor belong to it: the list of
+// pending actors, and what wakes a thread that waits until an actor has run.
 // Not thread-safe; one thread at a time per object.
 
 #include "util/Mutex.h"
 
+// Base of the units of work.
 class InThreadActor {
 public:
+    // An actor that is not pending.
     InThreadActor() = default;
     virtual ~InThreadActor() = default;
     InThreadActor(const InThreadActor&) = delete;

@@ -1,6 +1,26 @@
 #ifndef QUELTA_UTIL_LOADERINFO_H_
 #define QUELTA_UTIL_LOADERINFO_H_
 
+// How this process was started: the installation and database directories, names, port, flags, and
+// the values given on the command line. Every program begins with common_main_setup(), and a
+// program that takes options goes on like this:
+//
+//     LoaderInfo::common_main_setup(argc, argv, envp);  // the arguments of main
+//     LoaderInfo* const info = LoaderInfo::getInstance();
+//     info->populateFromCommandLine();
+//     const int code = info->validate();
+//     if (info->isError() || code != 0) {
+//         std::fprintf(stderr, "%s\n", LoaderInfo::getErrorMessage(code));
+//         std::exit(1);
+//     }
+//
+// Options are parsed by popt. init() copies the master table into the record and points each entry
+// at the field that takes its value, so the record must keep its address between init() and
+// populateFromCommandLine(). popt's context and value strings are never freed. Options are not
+// copied: a copy's context and value pointers are null.
+//
+// Configured before other threads start; safe to read from any thread afterwards.
+
 #include <popt.h>
 #include <sys/types.h>
 
@@ -10,19 +30,7 @@
 
 #include "util/Pathname.h"
 
-// How this process was started: the installation and database directories, names, port, flags, and
-// the values given on the command line. Every program begins with common_main_setup(), which
-// includes init() and populateFromEnvironment(). A program that takes options then calls, on
-// getInstance(),
-//     populateFromCommandLine()   once; isError() returns whether an option was unknown
-//     validate()                  getErrorMessage() returns the text of a negative result
-//
-// Options are parsed by popt. init() copies the master table into the record and points each entry
-// at the field that takes its value, so the record must keep its address between init() and
-// populateFromCommandLine(). popt's context and value strings are never freed. Options are not
-// copied: a copy's context and value pointers are null.
-//
-// Configured before other threads start; safe to read from any thread afterwards.
+// The record of how a process was started.
 class LoaderInfo {
 public:
     // An empty record: empty texts, numbers 0, flags false, no options.
@@ -32,6 +40,7 @@ public:
     // Deliberate: the copy of a record with a database directory compares unequal to it.
     LoaderInfo(const LoaderInfo& other);
 
+    // Copies the fields of another record.
     // Deliberate: the database directory, the start-up mode and the option-parsing state of the
     // target stay as they were.
     LoaderInfo& operator=(const LoaderInfo& other);
@@ -42,9 +51,9 @@ public:
     // The record of this process, constructed on the first call and never deleted.
     static LoaderInfo* getInstance();
 
-    // The start-up of every program: fills the record from defaults and the environment, prints the
-    // path of the logging configuration and initializes logging from it. Parses no options; `envp`
-    // is not used.
+    // Starts the program: init() and populateFromEnvironment() of the record of this process, then
+    // prints the path of the logging configuration and initializes logging from it. Parses no
+    // options; `envp` is not used.
     // Errors: prints a line on standard output and calls exit(-1) if there is no installation
     // directory.
     static void common_main_setup(int argc, const char* const* argv, const char* const* envp);
@@ -78,25 +87,40 @@ public:
     // Returns: whether parsing met an unknown option.
     bool isError() const { return _optionsError; }
 
+    // Returns: the installation directory, from QUELTA_HOME.
     Pathname getQueltaHome() const { return _queltaHome; }
+    // Returns: the database directory, from QUELTA_DB.
     Pathname getQueltaDb() const { return _queltaDb; }
+    // Returns: the name of the component; "queltad" unless option -n is given.
     std::string getComponentName() const { return _componentName; }
+    // Returns: the name of the configuration subdirectory; "myinstall" unless -i is given.
     std::string getInstallName() const { return _installName; }
+    // Returns: the host name of option -h; empty if it is not given.
     std::string getHost() const { return _host; }
+    // Returns: the mode of option --mode; empty if it is not given.
     std::string getStartupMode() const { return _startupMode; }
 
-    // The configuration directory of the installation, and its subdirectory for this install name.
+    // Returns: the configuration directory of the installation.
     Pathname getCommonConfigPath() const { return _queltaHome / _commonConfigPath; }
+    // Returns: the subdirectory of the configuration directory for this install name.
     Pathname getInstallConfigPath() const { return getCommonConfigPath() / _installName; }
 
+    // Returns: the port of option -p; 8089 if it is not given.
     int getPort() const { return _rpcPort; }
+    // Returns: the process number, as of init().
     pid_t getPid() const { return _pid; }
+    // Returns: the time of init(), in seconds since the epoch.
     time_t getStartupTime() const { return _startupTime; }
 
+    // Returns: the debug flag; see populateFromCommandLine.
     bool getDebug() const { return _isDebug; }
+    // Returns: whether option --debug is given.
     bool getUseDebugLog() const { return _useDebugLog; }
+    // Returns: true unless option --nodaemon is given.
     bool getDaemon() const { return _isDaemon; }
 
+    // Returns: the XML element of the component, empty until it is set; valid as long as the
+    // record.
     const xml::node& getCommonComponentNode() const { return _commonComponentNode; }
     // Stores a deep copy of the node.
     void setCommonComponentNode(xml::node& n) { _commonComponentNode = n; }

@@ -4,6 +4,13 @@
 // One output of the logging subsystem: a file, or standard error, with a layout, an optional size
 // limit with numbered backups, and a lock that keeps lines whole.
 //
+//     LogAppender* const appender = LogAppender::find("queueFile", true);
+//     const Pathname home("/opt/quelta");
+//     if (appender->setAttribute("fileName", "${QUELTA_HOME}/var/log/queue.log", home) &&
+//         appender->setAttribute("maxFileSize", "1000000", home)) {
+//         appender->finalSetup("queueFile");
+//     }
+//
 // Order of calls: `find` creates an appender under its name, `setAttribute` sets its attributes,
 // `finalSetup` ends the configuration. After that only `write` is used. The first write opens the
 // file. A rotation closes it and opens a new one. After a failed write, or if another process has
@@ -43,11 +50,13 @@ class LogAppender;
 class LogFormat;
 struct LogMsgMetadata;
 
+// A size of a file, in bytes.
 using file_offset_t = std::int64_t;
 
 // Appender by name, in name order; not owning.
 using LogAppenderMap = std::map<std::string, LogAppender*>;
 
+// An output of messages.
 class LogAppender {
 public:
     // Creates a closed appender without file name, size limit, backups and layout.

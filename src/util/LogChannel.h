@@ -3,6 +3,13 @@
 
 // Log channels: named categories, each with a minimum level and a list of appenders.
 //
+//     #include "util/LogAppender.h"
+//     LogChannel* const channel = LogChannel::find("Queue", true);
+//     LogAppender::find("queueFile", true);
+//     if (!channel->setConfig("WARN, queueFile")) {
+//         std::puts("neither a level nor an appender");
+//     }
+//
 // Loggers are bound to channels by name; a name without a channel of its own is bound to the root
 // channel. A new channel starts as a copy of the root channel as it is at that moment,
 // and later changes of the root channel do not reach it, so the root channel is set up first.
@@ -19,6 +26,7 @@
 
 class LogAppender;
 
+// A channel.
 class LogChannel {
 public:
     // Finds a channel by its name. For an unknown name, either creates a copy of the root channel
@@ -29,11 +37,12 @@ public:
     static LogChannel* find(const char* name, bool create);
 
     // Sets the minimum level by its name; upper case only, so "debug" is not a level.
-    // Returns: false, with the level as it was, when `word` names no level.
+    // Returns: false, with the level as it was, if `word` does not name a level.
     bool changeLevel(const std::string& word);
 
-    // Applies one word of a configuration value: a level, or the name of an existing appender.
-    // The first appender of a value replaces the list; `*got_appender_p` remembers that it did.
+    // Applies one word of a configuration value: a level, or the name of an existing appender. The
+    // first appender of a value replaces the list, as long as *got_appender_p (not null) is false;
+    // it is replaced by true then.
     // An appender that is named twice receives each message twice.
     // Returns: false, with nothing changed, for any other word.
     bool applyConfWord(const std::string& word, bool* got_appender_p);
@@ -44,12 +53,13 @@ public:
     // Returns: true if every word was accepted, also if there is none.
     bool setConfig(const char* value);
 
-    // Hands a message to the appenders, in the order of the list; tests no level.
+    // Writes a message to the appenders, in the order of the list; does not test the level.
+    // Errors: std::bad_alloc if the line cannot be formatted.
     void write(const LogMsgMetadata& mdata, const std::string& msg);
 
-    // The same for a message about the appender `dont_touch` (null allowed), which does not get
-    // it; nor do appenders whose own failed write is being reported on this thread.
-    // Returns: true when at least one appender got the message.
+    // Writes a message about the appender `dont_touch` (null allowed), which does not get it; nor
+    // do appenders whose own failed write is being reported on this thread.
+    // Returns: true if at least one appender got the message.
     bool write(const LogMsgMetadata& mdata, const std::string& msg, const LogAppender* dont_touch);
 
     LogLevel minlevel = INFO;  // messages below it are discarded

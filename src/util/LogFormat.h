@@ -3,14 +3,18 @@
 
 // Layouts: a conversion pattern such as "%d %-5p %c - %m%n" turns one message into one line.
 //
+//     #include "util/Logger.h"
+//     const LogFormat layout("%-8p: %m%n");  // once
+//     static const Logger logger("Queue");
+//     std::string line;
+//     layout.apply(line, LogMsgMetadata(&logger, WARN), "full");  // for each message
+//     std::fputs(line.c_str(), stdout);                           // "WARN    : full"
+//
 // A pattern is parsed once, into an array of atoms; formatting a line walks the atoms and parses
 // nothing. A conversion is "%", an optional flag ("-" pads on the right, "0" pads with zeros), an
 // optional minimum width, an optional "." and maximum width, the conversion character and an
 // optional "{argument}", which only "d" uses. Malformed input is not an error: an unknown
 // conversion is dropped, an incomplete one ends the pattern.
-//
-//     LogFormat layout("%-8p: %m%n");          // once
-//     layout.apply(line, metadata, message);   // per line, appends to `line`
 //
 // LogFormattedDate splits a date argument once more, into strftime pieces and milliseconds. The
 // pieces of one line share their local time, which a CachedTm holds. Both are defined in
@@ -35,9 +39,9 @@ class Logger;
 // The local time of one message, converted when the first date of the line asks for it.
 class CachedTm {
 public:
-    // strftime of the message's stamp.
+    // Formats the message's stamp by strftime.
     // Requires: the same stamp in every call on one object; `buf` has room for `size` bytes.
-    // Returns: the length of the text; 0 when it does not fit or is empty.
+    // Returns: the length of the text; 0 if it does not fit or is empty.
     std::size_t ftime(char* buf, std::size_t size, const char* fmt, const LogMsgMetadata& mdata);
 
 private:
@@ -50,7 +54,9 @@ private:
 // layout, they need the private fields of loggers.
 class LogFormat {
 public:
+    // One conversion of a pattern, or the literal text between two.
     struct Atom {
+        // What an atom prints. The letter is that of the conversion.
         enum Kind : std::uint32_t {
             MSG,         // m  the message
             STR,         // n  a newline; also literal text
@@ -63,7 +69,8 @@ public:
             TIME_FMT     // d  the local time of the message
         };
 
-        Kind what = MSG;
+        Kind what = MSG;  // selects the member of `arg`
+        // The text or the date format of the atom.
         union {
             const char* str = nullptr;  // STR: into LogFormat::_fmt, or a constant
             LogFormattedDate* fdate;    // TIME_FMT: owned by the LogFormat
@@ -78,6 +85,7 @@ public:
     // Requires: `pattern` is not null.
     // Errors: std::bad_alloc; a malformed pattern is not an error.
     explicit LogFormat(const char* pattern);
+    // Frees the atoms and their date formats.
     ~LogFormat();
     LogFormat(const LogFormat&) = delete;
     LogFormat& operator=(const LogFormat&) = delete;
@@ -89,7 +97,7 @@ public:
     // Cost: at most one conversion to local time, none without a date.
     void apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const;
 
-    // The common path of Logger's entry points: tests the level, formats, writes to the channel.
+    // Tests the level, formats and writes to the channel: the common path of Logger's entry points.
     // Never throws; errno is kept.
     static void do_log(Logger* logger, LogLevel level, const std::string& msg);
     static void do_log(Logger* logger, LogLevel level, const char* fmt, va_list ap)
@@ -124,13 +132,15 @@ private:
 // milliseconds.
 class LogFormattedDate {
 public:
+    // A piece of a date format.
     struct Atom {
+        // What an atom prints.
         enum Kind : std::uint32_t {
             STRFTIME,  // a piece for strftime
             MSEC       // the milliseconds of the stamp
         };
 
-        Kind what = STRFTIME;
+        Kind what = STRFTIME;       // selects what is printed
         const char* str = nullptr;  // STRFTIME: the NUL-terminated piece, in _sstor
     };
 
@@ -138,6 +148,7 @@ public:
     // "DATE", "ISO8601" and "ABSOLUTE" select their patterns.
     // Errors: std::bad_alloc.
     LogFormattedDate(const char* fmtstr, std::size_t fmtlen);
+    // Frees the atoms and the copies of their texts.
     ~LogFormattedDate();
     LogFormattedDate(const LogFormattedDate&) = delete;
     LogFormattedDate& operator=(const LogFormattedDate&) = delete;

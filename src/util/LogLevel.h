@@ -3,6 +3,9 @@
 
 // The severities of log messages, in ascending order, and their names.
 //
+//     std::size_t length = 0;
+//     std::puts(loglevel2str(&length, WARN));  // "WARN"; length is 4
+//
 // The enumerators are global names. No build of this project defines a macro DEBUG, which would
 // replace the first of them.
 // Safe from any thread.
@@ -11,6 +14,8 @@
 #include <cstdint>
 #include <string_view>
 
+// The severity of a message. Logger has no entry points for NOTICE, ALERT and EMERG; these are
+// useful as minimum levels.
 enum LogLevel : std::int32_t {
     DEBUG = 0,
     INFO = 1,
@@ -23,9 +28,9 @@ enum LogLevel : std::int32_t {
     EMERG = 8
 };
 
-// The name of a level, not padded; "???" for any other value.
-// Requires: `slenp` is not null; the length of the name is stored there.
-// Returns: a constant text.
+// Returns: the name of a level, not padded; "???" for any other value. The text is a constant. Its
+// length in bytes replaces *slenp.
+// Requires: `slenp` is not null.
 inline const char* loglevel2str(std::size_t* slenp, LogLevel level) {
     static constexpr std::string_view NAMES[] = {"DEBUG", "INFO",  "NOTICE", "WARN", "ERROR",
                                                  "CRIT",  "ALERT", "FATAL",  "EMERG"};

@@ -4,6 +4,11 @@
 // A file-system path: a string of bytes with '/' between its elements, ordered and compared as the
 // string it is.
 //
+//     const Pathname log = Pathname("/var") / "log" / "app.log";
+//     if (!log.toParent().isDir() && !log.toParent().mkdir(Pathname::MKDIR_WORLD_READ)) {
+//         std::perror(log.toParent().c_str());
+//     }
+//
 // Three groups of operations: editing, which works on the text and never on a file system; thin
 // wrappers around one system call each, which pass the text unchanged; and quoting for the shell.
 // Wrappers neither throw nor log: they return true if the call returned 0, and leave errno as the
@@ -21,25 +26,31 @@
 
 class FileDescriptor;
 
+// A path. Every operation of std::string works on its text.
 class Pathname : public std::string {
 public:
-    static constexpr char sep = '/';
-    static const Pathname root;    // "/"
-    static const Pathname cur;     // "."
-    static const Pathname parent;  // ".."
+    static constexpr char sep = '/';  // the separator of elements
+    static const Pathname root;       // "/"
+    static const Pathname cur;        // "."
+    static const Pathname parent;     // ".."
 
-    // Permission bits of a new file, before the umask: 0644, 0600, 0440.
-    enum CreateMode : int { CREATE_NORMAL = 0, CREATE_PRIVATE = 1, CREATE_READABLE_NONPUBLIC = 2 };
-    // Permission bits of a new directory, before the umask: 0700, 0770, 0777, 0755.
+    // Permission bits of a new file, before the umask.
+    enum CreateMode : int {
+        CREATE_NORMAL = 0,             // 0644
+        CREATE_PRIVATE = 1,            // 0600
+        CREATE_READABLE_NONPUBLIC = 2  // 0440
+    };
+    // Permission bits of a new directory, before the umask.
     enum MkdirMode : int {
-        MKDIR_PRIVATE = 0,
-        MKDIR_GROUP_RW = 1,
-        MKDIR_PUBLIC = 2,
-        MKDIR_WORLD_READ = 3
+        MKDIR_PRIVATE = 0,    // 0700
+        MKDIR_GROUP_RW = 1,   // 0770
+        MKDIR_PUBLIC = 2,     // 0777
+        MKDIR_WORLD_READ = 3  // 0755
     };
 
-    // Implicit, because a path is a string; `path` must not be null.
+    // The empty path.
     Pathname() = default;
+    // Takes the text as it is. Implicit, because a path is a string; `path` must not be null.
     Pathname(const char* path) : std::string(path) {}
     Pathname(std::string path) noexcept : std::string(std::move(path)) {}
     Pathname(const char* path, unsigned long length) : std::string(path, length) {}
@@ -57,6 +68,7 @@ public:
     // callers start from a base that is not empty.
     Pathname& operator/=(const std::string& elem);
     Pathname& operator/=(const char* elem);
+    // Returns: a copy to which the element is appended, as by /=.
     [[nodiscard]] Pathname operator/(const std::string& elem) const;
     [[nodiscard]] Pathname operator/(const char* elem) const;
 
@@ -65,7 +77,8 @@ public:
     // Removes every trailing '/' except the path's first character.
     void removeTrailingSeps();
     // Removes the last element with the '/' around it: "/a/b/" becomes "/a", "/a" becomes "/", "/"
-    // stays. Deliberate: "a" becomes the empty path, not ".".
+    // stays.
+    // Deliberate: "a" becomes the empty path, not ".".
     void stripElement();
     // Returns: what stripElement leaves.
     [[nodiscard]] Pathname toParent() const;
@@ -80,8 +93,9 @@ public:
     // basenameWithoutExt does not cut there.
     [[nodiscard]] std::string ext() const;
     // Returns: the last element without its last '.' and what follows; empty if the path ends in
-    // '/'. Deliberate: a dot that is the element's first character stays (".bashrc"), and a dot at
-    // the end is removed ("file." gives "file"), unlike in ext.
+    // '/'.
+    // Deliberate: a dot that is the element's first character stays (".bashrc"), and a dot at the
+    // end is removed ("file." gives "file"), unlike in ext.
     [[nodiscard]] std::string basenameWithoutExt() const;
 
     // Deletes every ".." element, so that the path cannot climb out of a directory.
@@ -115,25 +129,37 @@ public:
 
     // Fills *result by stat, which follows links.
     bool stat(struct stat* result) const;
-    // Returns: whether it exists and is a directory (a regular file).
+    // Returns: whether the path exists and is a directory.
     [[nodiscard]] bool isDir() const;
+    // Returns: whether the path exists and is a regular file.
     [[nodiscard]] bool isReg() const;
-    // Replaces *mtime by the time of the last change, in seconds since the epoch, and *size by the
-    // size in bytes. Errors: false, and the argument is unchanged.
+    // Replaces *mtime by the time of the last change, in seconds since the epoch.
+    // Errors: false, and *mtime is unchanged.
     bool getMtime(long* mtime) const;
+    // Replaces *size by the size in bytes.
+    // Errors: false, and *size is unchanged.
     bool getSize(long long* size) const;
-    // Returns: whether the path exists, or the real user may read it, write it, do both.
+    // Returns: whether the path exists.
     [[nodiscard]] bool exists() const;
+    // Returns: whether the real user may read it.
     [[nodiscard]] bool r_ok() const;
+    // Returns: whether the real user may write it.
     [[nodiscard]] bool w_ok() const;
+    // Returns: whether the real user may read and write it.
     [[nodiscard]] bool rw_ok() const;
 
-    // Returns: a new stream, or null. Owns: the caller closes it with std::fclose.
+    // Opens a stream, in a mode of std::fopen.
+    // Returns: the stream, or null.
+    // Owns: the caller closes it with std::fclose.
     [[nodiscard]] std::FILE* fopen(const char* mode) const;
+    // Creates the directory; its parent must exist.
     // Requires: one of the four modes; asserted.
     bool mkdir(MkdirMode mode) const;
+    // Removes the directory, which must be empty.
     bool rmdir() const;
+    // Removes the file, but no directory.
     bool unlink() const;
+    // Removes the file or the empty directory.
     bool remove() const;
     // Cuts or extends the file to a length in bytes.
     bool truncate(long long length) const;
@@ -143,22 +169,27 @@ public:
     bool readlink(char* buf, unsigned long size) const;
     // Creates `link`, whose text is this path.
     bool symlinkTo(const Pathname& link) const;
+    // Renames the file or directory; an existing file `dest` is replaced.
     bool renameTo(const Pathname& dest) const;
 
-    // Each opens the file with one call. Returns: the descriptor, -1 with errno on failure.
+    // Opens the file for reading.
+    // Returns: the descriptor, -1 with errno on failure, as do the other open operations.
     // Owns: the caller closes it.
     [[nodiscard]] FileDescriptor openReadOnly() const;
-    // Does not block, neither now (on a FIFO or device) nor in later reads.
+    // Opens the file for reading. Does not block, neither now (on a FIFO or device) nor in later
+    // reads.
     [[nodiscard]] FileDescriptor openReadOnlySafer() const;
-    // For writing; fails if the file exists.
+    // Creates the file for writing; fails if it exists.
     [[nodiscard]] FileDescriptor openCreateOnly(CreateMode mode) const;
-    // For writing; empties an existing file.
+    // Opens the file for writing; creates it, or empties an existing one.
     [[nodiscard]] FileDescriptor openCreateOrReplace(CreateMode mode) const;
-    // The same with the permission bits of the file `model`; fails if fstat does.
+    // Opens in the same way, but creates with the permission bits of the file `model`; fails if
+    // fstat does.
     [[nodiscard]] FileDescriptor openCreateOrReplace(FileDescriptor model) const;
-    // For writing; each write goes to the end.
+    // Opens the file for writing, or creates it; each write goes to the end.
     [[nodiscard]] FileDescriptor openCreateOrAppend(CreateMode mode) const;
-    // For reading and writing. Deliberate: empties an existing file, despite the name.
+    // Opens the file for reading and writing, or creates it.
+    // Deliberate: empties an existing file, despite the name.
     [[nodiscard]] FileDescriptor openReadWriteOrCreate(CreateMode mode) const;
 
     // Copies the contents and permission bits to another file, replacing it.
@@ -170,11 +201,11 @@ public:
 [[nodiscard]] mode_t createmode_to_perm(Pathname::CreateMode mode) noexcept;
 
 // Paths in the order of insertion; duplicates allowed.
-// Not thread-safe; one thread at a time per object.
 class PathList : public std::vector<Pathname> {
 public:
     static constexpr char listSep = ':';  // the default separator
 
+    // No paths.
     PathList() = default;
     // The elements of a separated list; see push_back_separated.
     PathList(const char* list, char separator);

@@ -1,21 +1,29 @@
 #ifndef QUELTA_UTIL_THREADOBJ_H_
 #define QUELTA_UTIL_THREADOBJ_H_
 
-// Thread: one operating-system thread. A program that uses workers first constructs one Thread()
-// for its main thread. A worker is a subclass with its own main(). The constructor creates the
-// thread, which waits for go() and then runs main(). It must be joined before the object is
-// destroyed:
-//     Thread mainThread;
-//     Worker worker("Worker");
+// Threads of the operating system. A worker is a subclass of Thread with its own main().
+//
+//     class Worker : public Thread {
+//     public:
+//         Worker() : Thread("Worker") {}
+//         void main() override { std::puts(Thread::currentName()); }
+//     };
+//     Thread mainThread;  // first, and on the main thread
+//     Worker worker;
 //     worker.go();
 //     worker.join();
-// go() and join() are allowed once each; the main thread counts as running and joined.
+//
+// A program that uses workers first constructs one Thread() for its main thread. The constructor of
+// a worker creates the thread, which waits for go() and then runs main(). It must be joined before
+// the object is destroyed. go() and join() are allowed once each; the main thread counts as running
+// and joined.
 //
 // The two locks of the library are static objects, destroyed at exit. So create threads only after
 // main has begun, and join all of them, or call mainThreadDying(), before exit.
 //
 // Invariant: `_ready_to_run` and `_start` are guarded by one lock, which all threads share. Until a
 // worker has passed its wait for go(), it reads no field that its creator still writes.
+//
 // Not thread-safe; one thread at a time per object. The static members are safe from any thread.
 
 #include <cstddef>
@@ -23,13 +31,16 @@
 #include "util/EventLoop.h"
 #include "util/Mutex.h"
 
+// One thread, the main thread or a worker.
 class Thread : private PthreadObject {
 public:
     // Joins and deletes its thread. Runs on the thread of an event loop.
     class JoinHelper : public InThreadActor {
     public:
+        // The helper of `thr`, not null.
         explicit JoinHelper(Thread* thr) : _thr(thr) {}
 
+        // Joins and deletes the thread.
         // Requires: the Thread was allocated by new. This deletes the helper too, as it is part of
         // the Thread.
         void callback() override;
@@ -45,25 +56,31 @@ public:
     // construction failed.
     Thread();
 
-    // Creates a thread that waits for go().
-    // `thrname`: not null; the pointer is kept, so the text must outlive the object.
+    // Creates a thread that waits for go(). `thrname` is not null; the pointer is kept, so the text
+    // must outlive the object.
     // Errors: PthreadException "Thread created before main thread!", or that of pthread_create. No
     // thread is created then.
     explicit Thread(const char* thrname);
 
+    // Frees the object; the thread must have ended.
     // Requires: joined (asserted), unless mainThreadDying() was called.
-    // Deliberate: a worker that has not started then never runs. The destructor waits until its
-    // thread has left the start.
+    // Deliberate: after mainThreadDying() a worker that has not started never runs. The destructor
+    // waits until its thread has left the start.
     virtual ~Thread();
     Thread(const Thread&) = delete;
     Thread& operator=(const Thread&) = delete;
 
-    // The body of a worker. Not called for the main thread.
+    // The body of a worker; does nothing unless it is overridden. Not called for the main thread.
+    // An exception that leaves it terminates the program.
     virtual void main() {}
 
+    // Returns: whether the calling thread is this one.
     bool isCurrent() const { return _token == PthreadToken::self(); }
+    // Returns: whether both objects represent the same thread.
     bool operator==(const Thread& other) const { return _token == other._token; }
+    // Returns: whether the objects represent different threads.
     bool operator!=(const Thread& other) const { return _token != other._token; }
+    // Returns: the name given to the constructor, or "Main Thread".
     const char* name() const { return _name; }
 
     // Lets main() start, even if the thread is not waiting yet.
@@ -76,6 +93,7 @@ public:
     // destroyed.
     void join();
 
+    // Returns: the actor that joins and deletes this thread.
     // Owns: the helper is a part of this object.
     JoinHelper* joinHelper() { return &_jhelp; }
 
@@ -89,8 +107,9 @@ public:
     // Threads: takes no lock. Reads nothing shared on a thread not created by Thread.
     static const char* currentName();
 
-    // From now on failed pthread calls are ignored and unjoined objects may be destroyed. Meant for
-    // the end of the process, when other threads may be left running.
+    // Turns error checks off: from now on failed pthread calls are ignored and unjoined objects may
+    // be destroyed. Meant for the end of the process, when other threads may be left running.
+    // Threads: safe from any thread.
     static void mainThreadDying();
 
     // The start routine of pthread_create; `arg` is the Thread.

@@ -3,6 +3,12 @@
 
 // An instant of wall-clock time: seconds and microseconds since the epoch.
 //
+//     const Timeval start = Timeval::now();
+//     Timeval deadline = start;
+//     deadline.addMsec(1500);
+//     std::printf("%lld ms left\n", Timeval::msecDifference(deadline, Timeval::now()));
+//     std::printf("%s gone\n", start.describeSince().c_str());
+//
 // Additions saturate at one largest instant, 2147483647 s and 999999 us, so that it does not depend
 // on the width of time_t. After every operation 0 <= _tv.tv_usec <= 999999.
 // Not thread-safe; one thread at a time per object.
@@ -12,6 +18,7 @@
 #include <ctime>
 #include <string>
 
+// An instant of wall-clock time.
 class Timeval {
 public:
     // The epoch.
@@ -28,6 +35,7 @@ public:
 
     // Sets the instant; `microseconds` outside 0..999999 carry into (or borrow from) the seconds.
     void set(long long seconds, long long microseconds) noexcept;
+    // Sets the current time.
     // Errors: aborts the process if the clock cannot be read.
     void setToNow();
     // Sets the largest instant.
@@ -44,12 +52,16 @@ public:
     // Threads: safe from any thread.
     void localtime(struct tm& result) const;
 
+    // Returns: whether this instant is before the other.
     [[nodiscard]] bool operator<(const Timeval& other) const noexcept {
         return _tv.tv_sec != other._tv.tv_sec ? _tv.tv_sec < other._tv.tv_sec
                                               : _tv.tv_usec < other._tv.tv_usec;
     }
+    // Returns: whether this instant is not after the other.
     [[nodiscard]] bool operator<=(const Timeval& other) const noexcept { return !(other < *this); }
+    // Returns: whether this instant is after the other.
     [[nodiscard]] bool operator>(const Timeval& other) const noexcept { return other < *this; }
+    // Returns: whether this instant is not before the other.
     [[nodiscard]] bool operator>=(const Timeval& other) const noexcept { return !(*this < other); }
 
     // Returns: a minus b in milliseconds, the sub-second part rounded up: 1 us later counts as 1.
@@ -60,13 +72,14 @@ public:
     // microseconds: 1.5 s count as 1000500. describeDifference is based on it.
     [[nodiscard]] static long long usecDifference(const Timeval& a, const Timeval& b) noexcept;
     // Returns: usecDifference as text: a whole number, or one with one to three decimals, and a
-    // unit
-    // ("5.000 seconds"), preceded by "-" if a is before b.
+    // unit ("5.000 seconds"), preceded by "-" if a is before b.
     [[nodiscard]] static std::string describeDifference(const Timeval& a, const Timeval& b);
 
-    // The differences above from this instant to now, positive for an instant in the past.
+    // Returns: msecDifference from this instant to now, positive for an instant in the past.
     [[nodiscard]] long long msecSince() const { return msecDifference(now(), *this); }
+    // Returns: usecDifference from this instant to now, positive for an instant in the past.
     [[nodiscard]] long long usecSince() const { return usecDifference(now(), *this); }
+    // Returns: describeDifference from this instant to now.
     [[nodiscard]] std::string describeSince() const { return describeDifference(now(), *this); }
 
 private:
@@ -76,8 +89,11 @@ private:
 // A Timeval that starts at the current time.
 class CurrentTimeval : public Timeval {
 public:
+    // The current time.
     CurrentTimeval() { setToNow(); }
+    // Copies the instant; does not read the clock.
     CurrentTimeval(const CurrentTimeval&) noexcept = default;
+    // Copies the instant of either class.
     CurrentTimeval& operator=(const CurrentTimeval&) noexcept = default;
     CurrentTimeval& operator=(const Timeval& other) noexcept {
         Timeval::operator=(other);

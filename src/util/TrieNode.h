@@ -4,6 +4,12 @@
 // A trie over bytes: each node keeps one child per byte value and a list of the values that were
 // stored under the key that leads to it. The empty key leads to the node itself.
 //
+//     TrieNode<int> root;
+//     root.addData("ab", 1);
+//     root.addData("", 2);
+//     std::vector<int*> found;
+//     root.findData("abc", found);  // *found[0] is 2, *found[1] is 1
+//
 // A node owns its children and its values. Copying, clearing and destruction recurse once for each
 // byte of the longest key, so keys of some ten thousand bytes need a larger stack than usual.
 //
@@ -13,12 +19,14 @@
 #include <utility>
 #include <vector>
 
+// A node, and the trie below it.
 template <typename T>
 class TrieNode {
 public:
     // One child for each value of a byte.
     static constexpr int ALPHABET_SIZE = 256;
 
+    // A trie without values.
     TrieNode() : _children() {}
 
     // Copies the whole subtree, values included.
@@ -33,19 +41,20 @@ public:
 
     TrieNode& operator=(const TrieNode&) = delete;
 
+    // Destroys all values and all children.
     ~TrieNode() { clear(); }
 
-    // Stores a copy of `data` behind the values already stored under `key`.
-    // Errors: what copying `data` throws, std::bad_alloc; no value is stored then.
+    // Stores a copy of `data` under `key`, after the values already stored there.
+    // Errors: std::bad_alloc, and what copying `data` throws; no value is stored then.
     void addData(const std::string& key, const T& data) { reach(key)._dataList.push_back(data); }
 
-    // The same, moving `data`.
+    // Moves `data` to the values under `key`.
     void addData(const std::string& key, T&& data) {
         reach(key)._dataList.push_back(std::move(data));
     }
 
-    // Replaces `results` by pointers to all values that are stored under a beginning of `key`: the
-    // empty one first, then ever longer ones, each node's values in the order of their storing.
+    // Replaces `results` by pointers to all values that are stored under a prefix of `key`, the
+    // shortest prefix first, each node's values in the order of insertion.
     // Owns: the pointers point into the trie and are valid until it changes.
     // Cost: one step per byte of `key` at most, and one pointer per result.
     void findData(const std::string& key, std::vector<T*>& results) {
@@ -61,7 +70,8 @@ public:
         }
     }
 
-    // Destroys all values and all children.
+    // Destroys all values and all children; the node can be filled again. Each child's destructor
+    // clears that child, so this recurses once for each byte of the longest key.
     void clear() {
         _dataList.clear();
         for (TrieNode*& child : _children) {
@@ -73,7 +83,8 @@ public:
 private:
     static int index(char c) { return static_cast<unsigned char>(c); }
 
-    // Returns: the node that `key` leads to; nodes that are missing on the way are made.
+    // Returns: the node that `key` leads to. Nodes that are missing on the way are created; they
+    // stay if a later step fails.
     TrieNode& reach(const std::string& key) {
         TrieNode* node = this;
         for (const char c : key) {
@@ -93,7 +104,7 @@ private:
     }
 
     TrieNode* _children[ALPHABET_SIZE];  // by the unsigned value of the byte; null: no child
-    std::vector<T> _dataList;            // in the order of storing
+    std::vector<T> _dataList;            // in the order of insertion
 };
 
 #endif  // QUELTA_UTIL_TRIENODE_H_

@@ -11,6 +11,7 @@
 
 namespace {
 
+// Returns: the number of literal segments, the runs between stars that are not empty.
 int countSegments(const char* pattern) {
     int count = 0;
     bool atStart = true;
@@ -24,7 +25,7 @@ int countSegments(const char* pattern) {
     return count;
 }
 
-// Returns: the text after its prefix `segment`; null if it does not begin with it.
+// Returns: `text` past its prefix `segment`, or null if it does not start with it.
 const char* skipPrefix(const char* text, const char* segment) {
     const std::size_t length = std::strlen(segment);
     return std::strncmp(text, segment, length) == 0 ? text + length : nullptr;
@@ -40,8 +41,9 @@ const char* skipToSegment(const char* cursor, const char* segment) {
     return found == nullptr ? nullptr : found + std::strlen(segment);
 }
 
-// Searches `segment` from `cursor` on, in steps that do not overlap, until one ends at `end`. The
-// text is known to end with the segment, so only a segment that may overlap itself needs the steps.
+// Searches for `segment` from `cursor` in non-overlapping steps, until an occurrence ends at `end`.
+// The caller knows that the text ends with `segment`. The steps can miss that occurrence only if
+// the segment can overlap itself; for any other segment it is enough that `cursor` is before it.
 bool stepsReachEnd(const char* cursor, const char* end, const char* segment, std::size_t length) {
     if (std::strchr(segment + 1, segment[0]) == nullptr) {
         return cursor <= end - length;
@@ -88,7 +90,8 @@ WildcardMatcher::~WildcardMatcher() {
     delete[] _needle;
 }
 
-// Deliberate: the copies that an earlier pattern left are not freed.
+// Compiles `pattern` after the segments that are already counted.
+// Deliberate: the copies of an earlier pattern are not freed.
 void WildcardMatcher::init(const char* pattern) {
     if (pattern != nullptr && _subStringCount + countSegments(pattern) > MAX_SUBSTRINGS) {
         throw std::length_error("WildcardMatcher: too many literal segments in a pattern");
@@ -101,7 +104,8 @@ void WildcardMatcher::init(const char* pattern) {
     }
 }
 
-// Cuts _buffer into segments, behind those that are already counted.
+// Cuts _buffer into segments, after those already counted. Each star is overwritten by a NUL, so
+// that every segment becomes a string.
 void WildcardMatcher::compile() {
     bool atSegmentStart = true;
     for (char* p = _buffer; *p != '\0'; ++p) {
@@ -131,12 +135,13 @@ bool WildcardMatcher::isMatch(const char* haystack, std::size_t length) const {
     return matches(haystack, haystack + length);
 }
 
-// An object that had segments when it was assigned to has null entries, which never match.
+// `end` is the NUL of `text`; it is used only if there is a hard end.
 bool WildcardMatcher::matches(const char* text, const char* end) const {
+    // An object that had segments when it was assigned to has null entries, which never match.
     if (_subStringCount > 0 && _subStrings[0] == nullptr) {
         return false;
     }
-    // Most texts are refused by their end, so that is compared first.
+    // Test the suffix first: it rejects most texts at once.
     const int last = _hardEnd ? _subStringCount - 1 : _subStringCount;
     std::size_t lastLength = 0;
     if (_hardEnd) {
@@ -163,6 +168,8 @@ bool WildcardMatcher::matches(const char* text, const char* end) const {
     return stepsReachEnd(cursor, end, _subStrings[last], lastLength);
 }
 
+// The same steps as matches(), from left to right only, because the text before each occurrence is
+// recorded on the way.
 bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& substrs) {
     QUELTA_ASSERT(haystack != nullptr);
     substrs.clear();

@@ -1,14 +1,19 @@
 #ifndef QUELTA_UTIL_WILDCARDMATCHER_H_
 #define QUELTA_UTIL_WILDCARDMATCHER_H_
 
-// A compiled text pattern in which `*` stands for any run of characters, the empty run included.
+// A compiled text pattern in which `*` represents any run of characters, the empty run included.
 // `*` is the only special character; matching is byte-wise and case-sensitive.
 //
-// A pattern is cut at its stars into literal segments. A segment in front of the first star must
-// begin the text (hard start), one behind the last star must end it (hard end), the others are
-// placed one after the other, each at its leftmost occurrence. Nothing is ever placed again.
+//     const WildcardMatcher matcher("app.*.log");
+//     if (matcher.isMatch("app.2.log")) {
+//         std::puts(matcher.getPatternPrefix());  // "app."
+//     }
 //
-// Construct, then ask as often as needed. Assignment is not a recompilation: see operator=.
+// A pattern is cut at its stars into literal segments. A segment before the first star must begin
+// the text (hard start), one after the last star must end it (hard end). The others must follow
+// each other in the text, each at its leftmost occurrence. There is no backtracking.
+//
+// Construct a matcher for each pattern. Assignment does not replace a pattern: see operator=.
 //
 // Invariants of an object that was never assigned to: the segments fill _subStrings from the front
 // without a gap and none is empty; _isWord is 1 exactly when there is one segment and both hard
@@ -21,26 +26,29 @@
 #include <string>
 #include <vector>
 
+// A compiled pattern.
 class WildcardMatcher {
 public:
+    // The kind of a compiled form. Do not use it to classify a pattern.
+    // Deliberate: no pattern compiles to POSTFIX_MATCHER, PREFIX_MATCHER or MIDFIX_MATCHER.
     enum MatchType {
-        ERROR_MATCHER = -1,
-        POSTFIX_MATCHER = 0,
-        PREFIX_MATCHER = 1,
-        MIDFIX_MATCHER = 2,
-        MULTIFIX_MATCHER = 3,
-        SINGLE_WORD_MATCHER = 4
+        ERROR_MATCHER = -1,      // no segments: the empty pattern, or stars only
+        POSTFIX_MATCHER = 0,     // no segments, but a hard end
+        PREFIX_MATCHER = 1,      // no segments, but a hard start
+        MIDFIX_MATCHER = 2,      // no segments, but both
+        MULTIFIX_MATCHER = 3,    // segments and a star
+        SINGLE_WORD_MATCHER = 4  // no star
     };
 
     // The most literal segments that a pattern may have.
     static constexpr int MAX_SUBSTRINGS = 256;
 
-    // Compiles `pattern`, NUL-terminated; null compiles like the empty pattern. The conversion is
-    // wanted: a pattern stands for its matcher.
+    // Compiles `pattern`, NUL-terminated; null compiles like the empty pattern. Implicit, so that a
+    // pattern can be passed where a matcher is expected.
     // Errors: std::length_error for more than MAX_SUBSTRINGS segments; std::bad_alloc.
     WildcardMatcher(const char* pattern);
 
-    // Compiles the other's pattern text afresh; nothing is shared.
+    // Compiles the other's pattern text again; nothing is shared.
     // Errors: std::bad_alloc.
     WildcardMatcher(const WildcardMatcher& other);
 
@@ -48,47 +56,53 @@ public:
     WildcardMatcher(WildcardMatcher&& other) noexcept;
 
     // Compiles the other's pattern text on top of what this object holds.
-    // Deliberate: this is no reset. The segment table is emptied, but count and flags stay; the new
-    // segments follow behind the old count, and the earlier pattern copies stay allocated for the
-    // life of the process. An object that had segments therefore matches nothing any more, since
-    // an empty entry never matches. Assignment to itself does nothing.
-    // Errors: std::length_error when the segments together exceed MAX_SUBSTRINGS, std::bad_alloc;
-    // the object is unchanged then.
+    // Deliberate: this is not a reset. The segment table is emptied, but count and flags stay. The
+    // new segments are placed after the old count, and the earlier pattern copies stay allocated
+    // for the life of the process. An object that had segments therefore matches nothing any more,
+    // since a null entry never matches. Self-assignment is a no-op.
+    // Errors: std::length_error if the segments together exceed MAX_SUBSTRINGS; the object is
+    // unchanged then. std::bad_alloc; it matches as before then.
     WildcardMatcher& operator=(const WildcardMatcher& other);
 
+    // Frees the pattern.
     ~WildcardMatcher();
 
-    // Tells whether the whole of `haystack`, not null, matches.
-    // Deliberate: a hard end is sought from left to right in steps that do not overlap, until one
-    // ends the text, so "*aa" does not match "aaa".
+    // Returns: whether the whole of `haystack` matches.
+    // Requires: `haystack` is not null; asserted.
+    // Deliberate: a hard end is searched for from left to right, in non-overlapping steps, until an
+    // occurrence ends the text, so "*aa" does not match "aaa".
     // Cost: no allocation.
     bool isMatch(const char* haystack) const;
 
-    // The same for a text whose length in bytes, up to its NUL, is known.
+    // Returns: whether the whole of a text matches whose length in bytes, up to its NUL, is known.
     bool isMatch(const char* haystack, std::size_t length) const;
 
-    // Fetch into the cache what isMatch reads, for callers that try many matchers in a row:
-    // prefetch() the object, and some matchers later prefetchSegment() its first segment.
+    // Prefetches what isMatch reads of the object, for callers that try many matchers in a row.
     void prefetch() const {
         __builtin_prefetch(this);
         __builtin_prefetch(&_subStrings[4]);
         __builtin_prefetch(&_subStringCount);
     }
+    // Prefetches the first segment; call it a few matchers after prefetch().
     void prefetchSegment() const { __builtin_prefetch(_subStrings[0]); }
 
-    // The same test. `substrs` is replaced by the texts that the stars covered, in pattern order;
-    // after a failure it holds what was covered up to there.
+    // Tests in the same way, and replaces `substrs` by the texts that the stars covered, in pattern
+    // order. After a failure it holds what was covered until then.
+    // Returns: whether the whole of `haystack`, not null, matches.
     // Deliberate: what the last star covers is split at each earlier occurrence of a hard end.
+    // Errors: std::bad_alloc.
     bool isMatch(const char* haystack, std::vector<std::string>& substrs);
 
-    // Returns: the literal text in front of the first star, the whole pattern if it has no star,
-    // "" if it begins with one; never null. Belongs to the matcher.
+    // Returns: the literal text before the first star, the whole pattern if it has no star, "" if
+    // it begins with one; never null.
+    // Owns: the text belongs to the matcher.
     const char* getPatternPrefix() const;
 
     // Prints the compiled form on standard output.
     void debugOpaqueMatcher() const;
 
-    // Returns: the pattern as given; belongs to the matcher.
+    // Returns: the pattern as given, which may be null.
+    // Owns: the text belongs to the matcher.
     const char* getOrigPattern() const { return _needle; }
 
 private:

@@ -28,6 +28,8 @@ done
 for link in $(grep -o ']([^)]*)' "$prefix/share/doc/quelta/README.md" | tr -d ']()'); do
     [ -e "$prefix/share/doc/quelta/$link" ] || fail "the README links to $link"
 done
+[ ! -d "$here/../../build/docs/html" ] || [ -s "$prefix/share/doc/quelta/api/index.html" ] ||
+    fail "the API reference is built and not installed"
 for directory in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
     [ -d "$prefix/$directory" ] || fail "missing: $directory"
 done

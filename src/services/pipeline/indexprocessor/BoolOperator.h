@@ -1,12 +1,26 @@
 #ifndef QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_BOOLOPERATOR_H_
 #define QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_BOOLOPERATOR_H_
 
-// The operators of the rule network: an operator counts the matches that it has, fires when they
-// suffice, and then holds its implications in the caller's set and counts as a match of each child.
+// The operators of the rule network. An operator counts its matches and fires when they suffice.
+// While it fires, its implications are in the caller's set and it is a match of each child. AND
+// operators come with the network; a class of one's own gives shouldFire another meaning:
 //
-// Whoever changes a count calls update afterwards; Rete.h does both for conditions.
+//     class OrOperator : public BoolOperator {
+//     public:
+//         using BoolOperator::BoolOperator;
+//         bool shouldFire() override { return _matchCount > 0; }
+//     };
+//     StringSet implications;
+//     std::string implication = "compressed";
+//     OrOperator op(nullptr, implication);
+//     op.incNeedMatch();
+//     op.incNeedMatch();
+//     op.addMatch(implications);  // the set now contains "compressed"
 //
-// Invariant: 0 <= _matchCount <= _needMatch, unless reset or a caller's own class says otherwise.
+// Code that changes a count must call update() afterwards; Conditional in Rete.h does both.
+//
+// Invariant: 0 <= _matchCount <= _needMatch, unless a derived class breaks it.
+//
 // Operators point at children without owning them, and must not form a cycle. An update recurses
 // along the children: a chain of some 200,000 operators needs more than the usual 8 MiB of stack.
 //
@@ -18,9 +32,12 @@
 
 class BoolOperator;
 
+// A set of implications or names.
 using StringSet = std::set<std::string>;
+// Operators in the order of their addresses; not owned.
 using OpSet = std::set<BoolOperator*>;
 
+// The text of AND_OPERATOR.
 inline constexpr char AND_OPERATOR_TEXT[] = "AND";
 // The type tag of AndOperator.
 inline constexpr const char* AND_OPERATOR = AND_OPERATOR_TEXT;
@@ -28,8 +45,8 @@ inline constexpr const char* AND_OPERATOR = AND_OPERATOR_TEXT;
 // A node of the network. Derive from it to give shouldFire another meaning.
 class BoolOperator {
 public:
-    // Makes an operator without needs or matches that implies `implication`. A parent, null
-    // allowed, gets the operator as a child, and the operator needs the parent's firing then.
+    // An operator without needs or matches that implies `implication`. If `parent` is not null, the
+    // operator becomes its child and needs it to fire.
     BoolOperator(BoolOperator* parent, std::string& implication)
         : _needMatch(0), _matchCount(0), _fired(false), _type(nullptr) {
         addImplication(implication);
@@ -39,51 +56,52 @@ public:
         }
     }
 
-    // Copies counts, state, implications and children; nobody's child or condition's operator.
+    // Copies counts, state, implications and children. The copy is not registered with any parent
+    // or condition.
     BoolOperator(const BoolOperator&) = default;
 
+    // Does not touch the children. No parent or condition may update the operator any more.
     virtual ~BoolOperator() = default;
 
     // Returns: whether the implications are in the caller's set.
     bool hasFired() { return _fired; }
 
-    // Counts one match more, never beyond the need.
+    // Adds a match, up to the need.
     void incCount() {
         if (_matchCount < _needMatch) {
             ++_matchCount;
         }
     }
 
-    // Counts one match less, never below none.
+    // Removes a match, down to 0.
     void decCount() {
         if (_matchCount > 0) {
             --_matchCount;
         }
     }
 
-    // Counts one match more and updates.
-    // Returns: whether the operator began or ceased to fire.
+    // Adds a match and updates.
+    // Returns: whether the operator started or stopped firing.
     bool addMatch(StringSet& implications) {
         incCount();
         return update(implications);
     }
 
-    // Counts one match less and updates.
-    // Returns: whether the operator began or ceased to fire.
+    // Removes a match and updates.
+    // Returns: whether the operator started or stopped firing.
     bool retractMatch(StringSet& implications) {
         decCount();
         return update(implications);
     }
 
-    // Fires or ceases to fire as the count demands, then updates all children, depth first and in
-    // pointer order; a child that is reached along several paths is updated once for each.
-    // Deliberate: implications are not counted by owner; the first of two operators with the same
-    // implication that ceases to fire takes it out.
-    // Returns: whether this operator began or ceased to fire.
+    // Starts or stops firing if shouldFire says so, then updates all children, depth first and in
+    // pointer order. A child that is reached along several paths is updated once for each.
+    // Returns: whether this operator started or stopped firing.
+    // Deliberate: if two operators share an implication, the first to stop firing removes it.
     bool update(StringSet& returnImplications);
 
-    // Forgets all matches and updates.
-    // Returns: whether the operator ceased to fire.
+    // Sets the count to 0 and updates.
+    // Returns: whether the operator started or stopped firing.
     bool reset(StringSet& implications) {
         _matchCount = 0;
         return update(implications);
@@ -95,7 +113,8 @@ public:
     // Raises the number of matches that the operator needs.
     void incNeedMatch() { ++_needMatch; }
 
-    // Makes `child` count this operator's firing; its need is the caller's to raise.
+    // Makes this operator a match of `child` while it fires.
+    // Deliberate: the need of the child stays; the caller must raise it with incNeedMatch.
     // Owns: nothing; the child must live as long as this operator is updated.
     void addChild(BoolOperator& child) { _children.insert(&child); }
 
@@ -103,21 +122,21 @@ public:
     std::string toString() const;
 
 protected:
-    // Tells whether the operator's matches suffice.
+    // Returns: whether the operator's matches suffice.
     virtual bool shouldFire() = 0;
 
     std::int32_t _needMatch;   // matches needed: one per registration, one per parent
     std::int32_t _matchCount;  // matches present, 0.._needMatch
     bool _fired;               // whether _implications are in the caller's set
-    StringSet _implications;
-    OpSet _children;    // not owned
-    const char* _type;  // null, or the type tag
+    StringSet _implications;   // what firing implies
+    OpSet _children;           // not owned
+    const char* _type;         // null, or the type tag
 };
 
 // Fires while all the matches that it needs are present; without needs, from its first update.
 class AndOperator : public BoolOperator {
 public:
-    // As BoolOperator's constructor.
+    // An operator as by BoolOperator's constructor.
     AndOperator(BoolOperator* parent, std::string& implication)
         : BoolOperator(parent, implication) {
         _type = AND_OPERATOR;

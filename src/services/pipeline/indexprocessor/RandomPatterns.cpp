@@ -29,8 +29,9 @@ struct Hash {
     }
 };
 
-// The characters after a run move as a block of fixed size, which is twice as fast as a move of
-// their exact number.
+// Replaces random runs of the alphabet by stars. A later run may contain earlier stars. The
+// characters after a run move as a block of fixed size, which is twice as fast as a move of their
+// exact number.
 Pattern drawPattern() {
     char wild[2 * SIZE] = {};
     ALPHABET.copy(wild, ALPHABET.size());

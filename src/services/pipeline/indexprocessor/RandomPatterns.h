@@ -1,16 +1,22 @@
 #ifndef QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RANDOMPATTERNS_H_
 #define QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RANDOMPATTERNS_H_
 
-// The test data of the stress program: patterns made of the alphabet, in which a `*` takes the
-// place of one to twenty random runs of letters. All numbers come from random(), which the program
-// never seeds, so every run draws the same patterns.
+// The test data of the stress program: patterns made of the alphabet, in which a `*` replaces each
+// of one to twenty random runs of letters.
+//
+//     for (const std::string& pattern : randomPatterns(1000)) {
+//         std::puts(pattern.c_str());
+//     }
+//
+// All numbers come from random(), which the program never seeds, so every run draws the same
+// patterns.
 // Not thread-safe; one thread at a time.
 
 #include <set>
 #include <string>
 
 // Draws one number.
-// Requires: min <= max; an empty range, max = min - 1, is asserted.
+// Requires: min <= max; only an empty range, max = min - 1, is asserted.
 // Returns: a number from min to max, both included.
 int randint(int min, int max);
 

@@ -43,7 +43,7 @@ const char* const WORDS[183] = {
     "windowsservices", "write", "wsserverimpl"};
 // clang-format on
 
-// Prints the implications on one line, each followed by a comma and a blank; "[]" for none.
+// Prints the implications on one line, each followed by a comma and a space; "[]" for none.
 void printImplications(StringSet& implications) {
     if (implications.empty()) {
         std::puts("[]");
@@ -56,8 +56,8 @@ void printImplications(StringSet& implications) {
     std::putchar('\n');
 }
 
-// Replaces `text` by one to four random words, a blank behind each; a query has operators in some
-// of the gaps, "AND NOT" only in the last.
+// Replaces `text` by one to four random words, each followed by a space. A query may have an
+// operator between two words; "AND NOT" only before the last one.
 void generateRandomText(std::string& text, bool isQuery) {
     text.clear();
     const int kLen = randint(1, 4);
@@ -78,14 +78,14 @@ void generateRandomText(std::string& text, bool isQuery) {
     }
 }
 
-// Fills `rs` with up to `testcount` random patterns, each behind an operator of its own that
-// implies the pattern, sets one term, and prints the counts and the seconds that resetting and
-// matching took.
+// Fills `rs` with up to `testcount` random patterns. Each feeds an operator of its own that implies
+// the pattern and a newline. Then sets one term, and prints the counts and the seconds that
+// resetting and matching took.
 void testWildCards(RuleSystem* rs, int testcount) {
     StringSet implications;
     StringSet wildcards = randomPatterns(testcount);
     const std::size_t conditions = wildcards.size();
-    // The patterns leave the set one by one, so that the network reuses their memory.
+    // Patterns are removed from the set one by one, so that the network can reuse their memory.
     while (!wildcards.empty()) {
         const StringSet::node_type wild = wildcards.extract(wildcards.begin());
         std::string imp = wild.value() + '\n';
@@ -97,7 +97,7 @@ void testWildCards(RuleSystem* rs, int testcount) {
     const std::time_t start = std::time(nullptr);
     rs->resetAll(implications);
     printImplications(implications);
-    // The letter n is gone: only patterns whose star covers its place match.
+    // The alphabet with its n replaced: only patterns with a star over that position match.
     const std::string text = "abcdefghijklmxopqrstuvwxyz";
     rs->setCondition(text, candidates, implications);
     std::printf("%lu implications\n", static_cast<unsigned long>(implications.size()));

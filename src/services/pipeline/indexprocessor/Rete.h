@@ -1,16 +1,29 @@
 #ifndef QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RETE_H_
 #define QUELTA_SERVICES_PIPELINE_INDEXPROCESSOR_RETE_H_
 
-// The rule network: named conditions, terms or `*` patterns, feed boolean operators; an operator
-// that has all the matches it needs fires and puts its implications into the caller's set, and
-// takes them out again when it has not.
+// The rule network: named conditions, terms or `*` patterns, feed boolean operators. An operator
+// that has all the matches it needs fires and inserts its implications into the caller's set. When
+// it stops firing, it removes them.
 //
-// Make operators on the heap, hand them over with addCondition, then resetAll, then setCondition
-// and resetCondition for each term. A term meets the literal condition of that name and all pattern
+//     RuleSystem rules;
+//     StringSet implications;
+//     std::string implication = "archive";
+//     AndOperator& rule = *new AndOperator(nullptr, implication);  // the system deletes it
+//     rules.addCondition("*.gz", rule);
+//     rules.addCondition("large", rule);
+//     rules.resetAll(implications);
+//     RuleSystem::Candidates candidates;
+//     rules.setCondition("a.gz", candidates, implications);
+//     rules.setCondition("large", candidates, implications);    // {"archive"}
+//     rules.resetCondition("large", candidates, implications);  // {}
+//
+// Create operators with new, pass them to addCondition, call resetAll, then setCondition and
+// resetCondition for each term. A term affects the condition of that name and all pattern
 // conditions that match; the patterns are found through a trie under their literal prefix.
 //
 // A RuleSystem owns its operators and conditions. Operators and conditions only point at each
-// other; operators must not form a cycle. State changes only along what a change touches.
+// other; operators must not form a cycle. A change updates only the operators reachable from the
+// conditions it affects.
 //
 // Not thread-safe; one thread at a time per object.
 
@@ -30,7 +43,9 @@
 
 class Conditional;
 
+// Conditions by name.
 using ConditionMap = std::map<std::string, Conditional*>;
+// The compiled pattern and the condition of each pattern, under its literal prefix.
 using PrefixTrie = TrieNode<std::pair<WildcardMatcher, Conditional*>>;
 
 // The term that is always set after RuleSystem::resetAll.
@@ -39,7 +54,7 @@ inline const std::string META_ALL = "meta::all";
 // A named condition, set or not, and the operators that it feeds.
 class Conditional {
 public:
-    // Makes a condition that is not set and feeds nothing.
+    // A condition that is not set and feeds nothing.
     explicit Conditional(const std::string& name) : _name(name), _setValue(false) {}
 
     // Replaces `out` by the name.
@@ -51,9 +66,11 @@ public:
     // Makes the condition feed `op`, which is not owned.
     void addOperator(BoolOperator& op) { _operators.insert(&op); }
 
-    // Sets or resets the condition: a change is counted by its operators, and all of them are
-    // updated whether there was a change or not.
+    // Sets the condition. If it was not set, each of its operators gets a match. All of them are
+    // updated, whether there was a change or not.
     void set(StringSet& implications) { changeState(true, implications); }
+    // Resets the condition. If it was set, each of its operators loses a match. All of them are
+    // updated, whether there was a change or not.
     void reset(StringSet& implications) { changeState(false, implications); }
 
     // Returns: name, state and number of operators, like "name = set (2 operators)".
@@ -73,36 +90,40 @@ public:
     // The candidates of a lookup: pointers into the trie, valid until a condition is added.
     using Candidates = std::vector<std::pair<WildcardMatcher, Conditional*>*>;
 
+    // A system without conditions and operators.
     RuleSystem() = default;
 
-    // Requires: `other` holds no operator, as operators cannot be copied; asserted.
+    // An empty system, like `other`.
+    // Requires: `other` has no operators, as these cannot be copied; asserted.
     RuleSystem(const RuleSystem& other);
     RuleSystem& operator=(const RuleSystem&) = delete;
 
+    // Deletes all conditions and operators.
     ~RuleSystem() { clearRules(); }
 
-    // Takes ownership of `op`, made with new. Doing so twice is the same as once.
+    // Takes ownership of `op`, created with new. Adding it again has no effect.
     void addOperator(BoolOperator& op) { _allOperators.insert(_allOperators.end(), &op); }
 
     // Makes the condition `keyword` feed `op`, and takes ownership of `op`. A keyword with a `*`
     // is a pattern, and a candidate once for each time it is added.
-    // Deliberate: each call raises the need, also for an operator that the condition feeds already
-    // and for a condition that is set already; neither is counted before the next set.
+    // Deliberate: each call raises the need, even if the condition already feeds `op` or is already
+    // set; the match is not counted until the condition is next set.
     // Errors: std::length_error for a pattern with more than WildcardMatcher::MAX_SUBSTRINGS
-    // segments, before anything has changed. std::bad_alloc: what was done is kept, nothing
-    // dangles; `op` is owned if it had been recorded by then, so who must know calls addOperator
-    // first.
+    // segments, before anything has changed. std::bad_alloc: completed steps are kept and nothing
+    // dangles. `op` may or may not be owned then; call addOperator first if you need to know.
     void addCondition(const std::string& keyword, BoolOperator& op);
 
-    // Sets the condition named `term` and all pattern conditions that match it.
-    // `wildcardMatches` is replaced by the candidates, matching or not.
-    // Returns: whether the term met any condition.
+    // Sets the condition named `term` and all pattern conditions that match it. `wildcardMatches`
+    // is replaced by the candidates, matching or not.
+    // Returns: whether there was such a condition.
+    // Deliberate: a condition is either set or not. A pattern condition that two terms set is reset
+    // by the first of them that is reset.
     bool setCondition(const std::string& term, Candidates& wildcardMatches,
                       StringSet& implications) {
         return changeCondition(true, term, wildcardMatches, implications);
     }
 
-    // Resets the conditions that setCondition would set.
+    // Resets the conditions that setCondition would set, whether or not this term has set them.
     void resetCondition(const std::string& term, Candidates& wildcardMatches,
                         StringSet& implications) {
         changeCondition(false, term, wildcardMatches, implications);
@@ -133,7 +154,7 @@ private:
     OpSet _allOperators;       // owned
     ConditionMap _conditions;  // by name; owned
     PrefixTrie _wildcardTrie;  // pattern conditions, under their literal prefix
-    // Deliberate: names that have ever been set; only clearRules takes any out.
+    // Deliberate: names that have ever been set; only clearRules removes any.
     StringSet _setConditions;
 };
 
@@ -158,13 +179,13 @@ inline std::string Conditional::toString() const {
            " operators)";
 }
 
-// The assertion reads this object's own field, which has just been copied.
 inline RuleSystem::RuleSystem(const RuleSystem& other) : _allOperators(other._allOperators) {
+    // The set is copied only to be tested, so that the assertion's text names the field.
     QUELTA_ASSERT(_allOperators.empty());
 }
 
-// A pattern that is refused must change nothing, so it is compiled first.
 inline void RuleSystem::addCondition(const std::string& keyword, BoolOperator& op) {
+    // A pattern that is refused must change nothing, so it is compiled first.
     std::optional<WildcardMatcher> matcher;
     if (keyword.find('*') != std::string::npos) {
         matcher.emplace(keyword.c_str());
