@@ -14,7 +14,7 @@ Blocks are fenced and name their language:
                 the last cpp block
     sh, cmake, mermaid
                 not tested here
-The commands of a page run in one temporary directory.
+The commands of a page run in one temporary directory, which the page calls /srv.
 """
 import pathlib
 import re
@@ -70,7 +70,7 @@ def run_commands(text, binary, directory):
             shutil.copy(binary, directory / name)
         done = subprocess.run(command, shell=True, cwd=directory, text=True, timeout=60,
                               stdout=subprocess.PIPE, stderr=subprocess.STDOUT, check=False)
-        result += f'$ {command}\n{done.stdout}'
+        result += f'$ {command}\n' + done.stdout.replace(str(directory), '/srv')
     return result
 
 
