@@ -38,10 +38,10 @@ void addRule(RuleSystem& rules, const std::string& line) {
     if (colon == std::string::npos || implication.empty()) {
         throw std::runtime_error("expected \"implication: condition, ...\"");
     }
-    auto made = std::make_unique<AndOperator>(nullptr, implication);
-    AndOperator& op = *made;
+    auto owner = std::make_unique<AndOperator>(nullptr, implication);
+    AndOperator& op = *owner;
     rules.addOperator(op);
-    made.release();  // rules owns it now, even if a condition is refused
+    owner.release();  // rules owns it now, even if a condition is refused
 
     std::istringstream conditions(line.substr(colon + 1));
     for (std::string condition; std::getline(conditions, condition, ',');) {

@@ -47,8 +47,8 @@ TEST(RuleConsoleTest, PrintsWhatFiresAndWhatStopsFiring) {
         "+ archive the web log\n"
         "+ old log\n"
         "+ web log\n"
-        "+ call somebody\n"
-        "- call somebody\n"
+        "+ call support\n"
+        "- call support\n"
         "- archive the web log\n"
         "- old log\n"
         "- web log\n",
