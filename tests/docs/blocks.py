@@ -16,6 +16,7 @@ Blocks are fenced and name their language:
                 not tested here
 The commands of a page run in one temporary directory, which the page calls /srv.
 """
+import os
 import pathlib
 import re
 import shutil
@@ -64,12 +65,14 @@ def extract(page, directory):
 
 def run_commands(text, binary, directory):
     """Runs the commands of a console block. Returns the block as it should be."""
+    environment = {name: value for name, value in os.environ.items() if 'QUELTA' not in name}
     result = ''
     for command in re.findall(r'^\$ (.*)', text, re.MULTILINE):
         for name in re.findall(r'\./(\w+)', command):
             shutil.copy(binary, directory / name)
-        done = subprocess.run(command, shell=True, cwd=directory, text=True, timeout=60,
-                              stdout=subprocess.PIPE, stderr=subprocess.STDOUT, check=False)
+        done = subprocess.run(command, shell=True, cwd=directory, env=environment, text=True,
+                              stdout=subprocess.PIPE, stderr=subprocess.STDOUT, timeout=60,
+                              check=False)
         result += f'$ {command}\n' + done.stdout.replace(str(directory), '/srv')
     return result
 
@@ -78,7 +81,7 @@ def run(page, directory):
     status = 0
     number = -1
     with tempfile.TemporaryDirectory() as scratch:
-        scratch = pathlib.Path(scratch)
+        scratch = pathlib.Path(scratch).resolve()
         for language, text, line in blocks(page):
             if language == 'cpp':
                 number += 1
