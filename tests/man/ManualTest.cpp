@@ -18,10 +18,10 @@
 #include "support/InChild.h"
 #include "support/TempDir.h"
 #include "util/LogFormat.h"
-#include "util/internal/LogGlobals.h"
 #include "util/LogMsgMetadata.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
+#include "util/internal/LogGlobals.h"
 
 namespace {
 
