@@ -1,5 +1,5 @@
-// Usage: own_log CONFIG FOLDER
-// Logs through a configuration file of its own. FOLDER is what "${QUELTA_HOME}" stands for in it.
+// Usage: own_log CONFIG DIRECTORY
+// Logs through a configuration file of its own, in which "${QUELTA_HOME}" is replaced by DIRECTORY.
 
 #include <cstdio>
 #include <exception>
@@ -11,7 +11,7 @@
 
 namespace {
 
-// One logger for each part of a program, under the name that the configuration knows it by.
+// One logger for each part of the program, with the name of its category in the configuration.
 Logger logger("OwnLog");
 Logger workLogger("OwnLog.Work");
 
@@ -26,12 +26,13 @@ void work(int item) {
 
 int main(int argc, char** argv) {
     if (argc != 3) {
-        std::fputs("Usage: own_log CONFIG FOLDER\n", stderr);
+        std::fputs("Usage: own_log CONFIG DIRECTORY\n", stderr);
         return 2;
     }
-    const bool complete = Logger::initialize(Pathname(argv[1]), Pathname(argv[2]));
-    if (complete) {
-        logger.info("logging is configured from %s", argv[1]);
+    // True even if lines of the file are wrong: each of them is reported in the log.
+    const bool read = Logger::initialize(Pathname(argv[1]), Pathname(argv[2]));
+    if (read) {
+        logger.info("the logging configuration is %s", argv[1]);
     }
 
     for (int item = 1; item <= 30; ++item) {
@@ -49,5 +50,5 @@ int main(int argc, char** argv) {
     if (workLogger.isDebugEnabled()) {
         logger.info("items are logged");
     }
-    return complete ? 0 : 1;
+    return read ? 0 : 1;
 }

@@ -1,14 +1,14 @@
 // Usage: rule_console RULES
-// Reads rules from a file, then terms from standard input, one to a line, and prints what each of
-// them changes: "+ implication" when a rule fires, "- implication" when it is withdrawn.
+// Reads rules from a file, then terms from standard input, one to a line. Prints what each term
+// changes: "+ implication" when a rule fires, "- implication" when it stops firing.
 //
-//     implication: condition, condition    a rule; `*` in a condition stands for any characters
+//     implication: condition, condition    a rule; `*` in a condition matches any characters
 //     term                                 sets the conditions that match the term
-//     -term                                takes them back
-//     !                                    takes everything back
+//     -term                                resets them
+//     !                                    resets all conditions
 //
 // Empty lines, and lines of the file that start with `#`, are ignored. The term `meta::all` is set
-// from the start and after each `!`.
+// at the start and after each `!`.
 
 #include <algorithm>
 #include <fstream>
@@ -31,17 +31,17 @@ std::string trimmed(const std::string& text) {
     return text.substr(first, text.find_last_not_of(" \t\r") - first + 1);
 }
 
-// A rule is an operator, fed by each of the conditions, that implies one text.
+// A rule is an operator that all conditions feed and that implies one text.
 void addRule(RuleSystem& rules, const std::string& line) {
     const std::size_t colon = line.find(':');
     std::string implication = trimmed(line.substr(0, colon));
     if (colon == std::string::npos || implication.empty()) {
         throw std::runtime_error("expected \"implication: condition, ...\"");
     }
-    auto made = std::make_unique<AndOperator>(nullptr, implication);
-    AndOperator& op = *made;
+    auto owner = std::make_unique<AndOperator>(nullptr, implication);
+    AndOperator& op = *owner;
     rules.addOperator(op);
-    made.release();  // the rule system owns it from here on
+    owner.release();  // rules owns it now, even if a condition is refused
 
     std::istringstream conditions(line.substr(colon + 1));
     for (std::string condition; std::getline(conditions, condition, ',');) {
@@ -78,8 +78,8 @@ void printChanges(const StringSet& before, const StringSet& after) {
     StringSet changed;
     std::set_difference(before.begin(), before.end(), after.begin(), after.end(),
                         std::inserter(changed, changed.end()));
-    for (const std::string& withdrawn : changed) {
-        std::cout << "- " << withdrawn << '\n';
+    for (const std::string& stopped : changed) {
+        std::cout << "- " << stopped << '\n';
     }
     changed.clear();
     std::set_difference(after.begin(), after.end(), before.begin(), before.end(),

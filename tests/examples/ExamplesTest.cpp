@@ -1,4 +1,4 @@
-// The example programs, built and run as README.md shows them.
+// The example programs do what README.md shows.
 
 #include <gtest/gtest.h>
 
@@ -15,7 +15,7 @@ const std::string project = PROJECT;
 const std::string sampleRules = project + "/examples/rules.txt";
 const std::string sampleConfig = project + "/examples/own_log.cfg";
 
-// Whether README.md shows this text, indented as it shows all that is typed and printed.
+// Whether README.md has this text, indented by four spaces like all its input and output.
 testing::AssertionResult readmeShows(const std::string& text) {
     std::string indented;
     std::istringstream lines(text);
@@ -28,7 +28,7 @@ testing::AssertionResult readmeShows(const std::string& text) {
     return testing::AssertionSuccess();
 }
 
-TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
+TEST(RuleConsoleTest, PrintsWhatFiresAndWhatStopsFiring) {
     const ProgramRun run = Program(RULE_CONSOLE)
                                .arg(sampleRules)
                                .input(
@@ -47,8 +47,8 @@ TEST(RuleConsoleTest, PrintsWhatFiresAndWhatIsWithdrawn) {
         "+ archive the web log\n"
         "+ old log\n"
         "+ web log\n"
-        "+ call somebody\n"
-        "- call somebody\n"
+        "+ call support\n"
+        "- call support\n"
         "- archive the web log\n"
         "- old log\n"
         "- web log\n",
@@ -107,7 +107,7 @@ TEST(OwnLogTest, LogsThroughItsOwnConfiguration) {
     const ProgramRun run = Program(OWN_LOG).arg(sampleConfig).arg(dir.path()).run();
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.out);
-    EXPECT_EQ("INFO    : logging is configured from " + sampleConfig +
+    EXPECT_EQ("INFO    : the logging configuration is " + sampleConfig +
                   "\n"
                   "ERROR   : cannot find " +
                   dir.path() +
@@ -134,7 +134,7 @@ TEST(OwnLogTest, DoesWhatTheReadmeShows) {
     EXPECT_TRUE(readmeShows("/tmp/own.log  /tmp/own.log.1  /tmp/own.log.2\n"));
 }
 
-TEST(OwnLogTest, GoesOnWithoutAConfigurationAndSaysSo) {
+TEST(OwnLogTest, ContinuesWithoutAConfigurationAndReportsIt) {
     const ProgramRun run = Program(OWN_LOG).arg("/nowhere/own_log.cfg").arg("/nowhere").run();
     EXPECT_EQ(1, run.status);
     EXPECT_EQ(

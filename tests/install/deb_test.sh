@@ -66,6 +66,8 @@ $expected) ;;
 *) fail "Rete said: $out" ;;
 esac
 
+grep -q "^cp -r /usr/share/quelta/sample " "$root/usr/share/man/man1/Rete.1" ||
+    fail "Rete(1) does not name the installed sample"
 for page in man1/Rete.1 man5/log-cmdline.cfg.5; do
     "$here/../man/page_test.sh" "$root/usr/share/man/$page" || fail "$page"
 done

@@ -34,6 +34,9 @@ for directory in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; 
     [ -d "$prefix/$directory" ] || fail "missing: $directory"
 done
 
+grep -q "^cp -r $prefix/share/quelta/sample " "$prefix/share/man/man1/Rete.1" ||
+    fail "Rete(1) does not name the installed sample"
+
 # What is installed does not depend on the source or the build tree.
 source=$(CDPATH= cd -- "$here/../.." && pwd)
 if grep -rIl -e "$source" -e "$build" "$prefix"; then

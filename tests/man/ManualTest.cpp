@@ -1,5 +1,5 @@
-// What the manual page of the configuration file shows is tried: every example of the file is read,
-// every example of a pattern rendered, and the bad file reported.
+// The examples in the manual page of the configuration file: each part of a file is read without a
+// report, each pattern prints what the page shows, and so does the file with mistakes.
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -51,7 +51,7 @@ std::vector<std::string> blocks(const std::string& begin, const std::string& end
     return found;
 }
 
-// Examples are lines of the file, or "pattern   what becomes of it".
+// An example is lines of the file, or "PATTERN   OUTPUT".
 bool showsPattern(const std::string& line) {
     return line.find('%') < line.find('=');
 }
@@ -77,7 +77,7 @@ std::vector<std::pair<std::string, std::string>> patterns() {
     return found;
 }
 
-// The message that the page speaks of.
+// The message that the page describes.
 std::string rendered(const std::string& pattern) {
     static const Logger rete("Rete");
     LogMsgMetadata mdata(&rete, WARN);
@@ -126,7 +126,7 @@ TEST(ManualTest, ExamplesOfTheFileAreReadWithoutComplaint) {
         std::filesystem::create_directories(dir.file("var/log"));
         std::string lines = replaced(block, "/tmp/", dir.path() + '/');
         lines = replaced(lines, "=/var/log/", '=' + dir.path() + "/var/log/");
-        // Examples name appenders that other examples make.
+        // Examples name appenders that other examples create.
         writeFile(dir.file("cfg"), "appender.A1=\nappender.A2=\n" + lines);
         const ChildRun run = inChild([&] {
             EXPECT_TRUE(Logger::initialize(Pathname(dir.file("cfg")), Pathname(dir.path())));

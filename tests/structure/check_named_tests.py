@@ -1,24 +1,28 @@
 #!/usr/bin/env python3
 """Checks that every test that documents name exists.
 
-Usage: check_named_tests.py TESTS_DIR DOCUMENT...
+Usage: check_named_tests.py PROJECT_DIR DOCUMENT...
 
-A test is named as `Suite.Case`. Exits with 1 if a test does not exist, or a document names none.
+A test is named as `Suite.Case`, or by its source: `XTest`, `XBench` or `XFuzz`. Exits with 1 if a
+test does not exist, or a document names none.
 """
 import pathlib
 import re
 import sys
 
-NAMED = re.compile(r'`([A-Z]\w+\.[A-Z]\w+)`')
+NAMED = re.compile(r'`([A-Z]\w+\.[A-Z]\w+|[A-Z]\w+(?:Test|Bench|Fuzz))`')
 DEFINED = re.compile(r'^(?:TYPED_)?TEST(?:_F|_P)?\(\s*(\w+)\s*,\s*(\w+)\s*\)', re.MULTILINE)
 
 
 def main():
     if len(sys.argv) < 3:
         sys.exit(__doc__)
-    tests_dir, *documents = (pathlib.Path(arg) for arg in sys.argv[1:])
-    defined = {f'{suite}.{case}' for path in tests_dir.rglob('*.cpp')
+    project, *documents = (pathlib.Path(arg) for arg in sys.argv[1:])
+    sources = [path for directory in ('tests', 'bench', 'fuzz')
+               for path in (project / directory).rglob('*.cpp')]
+    defined = {f'{suite}.{case}' for path in sources
                for suite, case in DEFINED.findall(path.read_text())}
+    defined |= {path.stem for path in sources}
     problems = []
     for document in documents:
         named = NAMED.findall(document.read_text())

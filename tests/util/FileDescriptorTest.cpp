@@ -81,6 +81,12 @@ TEST_F(FileDescriptorTest, ReadsToTheEndOfTheFile) {
     EXPECT_EQ(0, _file.read(buf, 10));
 }
 
+TEST_F(FileDescriptorTest, TheEndOfTheFileIsNoInterruption) {
+    char c = 0;
+    errno = EINTR;
+    EXPECT_EQ(0, _file.read(&c, 1));
+}
+
 TEST_F(FileDescriptorTest, WritesBytesStringsAndSeveralBuffers) {
     EXPECT_EQ(3, _file.write("abcdef", 3));
     EXPECT_EQ(0, _file.write("abcdef", 0));

@@ -39,16 +39,24 @@ endif()
 configure_file(cmake/quelta.pc.in "${PROJECT_BINARY_DIR}/quelta.pc" @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/quelta.pc" DESTINATION "${quelta_pc_dir}")
 
-# Manual pages, and an installation to start from.
+# Manual pages, and an installation to start from. The prefix that a page names is known only when
+# it is installed, as `cmake --install --prefix` and CPack choose another one.
+set(sample "${CMAKE_INSTALL_DATADIR}/quelta/sample")
+set(QUELTA_SAMPLE "${CMAKE_INSTALL_PREFIX}/${sample}")
+install(CODE "
+  set(PROJECT_VERSION \"${PROJECT_VERSION}\")
+  set(QUELTA_SAMPLE \"\${CMAKE_INSTALL_PREFIX}/${sample}\")")
 foreach(page Rete.1 log-cmdline.cfg.5)
-  configure_file(man/${page}.in "${PROJECT_BINARY_DIR}/man/${page}" @ONLY)
+  set(source "${PROJECT_SOURCE_DIR}/man/${page}.in")
+  set(installed "${PROJECT_BINARY_DIR}/man/installed/${page}")
+  configure_file("${source}" "${PROJECT_BINARY_DIR}/man/${page}" @ONLY)
+  install(CODE "configure_file(\"${source}\" \"${installed}\" @ONLY)")
   string(REGEX MATCH "[0-9]$" section "${page}")
-  install(FILES "${PROJECT_BINARY_DIR}/man/${page}"
-    DESTINATION "${CMAKE_INSTALL_MANDIR}/man${section}")
+  install(FILES "${installed}" DESTINATION "${CMAKE_INSTALL_MANDIR}/man${section}")
 endforeach()
-install(DIRECTORY sample/ DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample")
-install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/etc/myinstall")
-install(DIRECTORY DESTINATION "${CMAKE_INSTALL_DATADIR}/quelta/sample/var/log")
+install(DIRECTORY sample/ DESTINATION "${sample}")
+install(DIRECTORY DESTINATION "${sample}/etc/myinstall")
+install(DIRECTORY DESTINATION "${sample}/var/log")
 # The README, and what it links to.
 install(FILES README.md CHANGELOG.md CONTRIBUTING.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs examples DESTINATION "${CMAKE_INSTALL_DOCDIR}"
