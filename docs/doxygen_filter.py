@@ -24,7 +24,7 @@ LITERAL = re.compile(r'"(\\.|[^"\\])*"|\'(\\.|[^\'\\])+\'')
 def escape(text):
     """Takes their meaning from Doxygen's special characters, except in `code`."""
     parts = text.split('`')
-    parts[::2] = [re.sub(r'([\\@&$#<>%*|"~])', r'\\\1', part) for part in parts[::2]]
+    parts[::2] = [re.sub(r'([\\@&$#<>%"]|--)', r'\\\1', part) for part in parts[::2]]
     return '`'.join(parts)
 
 

@@ -19,6 +19,8 @@ class InThreadActor {
 public:
     // An actor that is not pending.
     InThreadActor() = default;
+    // Does not take the actor out of the list.
+    // Requires: the actor is not pending.
     virtual ~InThreadActor() = default;
     InThreadActor(const InThreadActor&) = delete;
     InThreadActor& operator=(const InThreadActor&) = delete;

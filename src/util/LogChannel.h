@@ -40,10 +40,10 @@ public:
     // Returns: false, with the level as it was, if `word` does not name a level.
     bool changeLevel(const std::string& word);
 
-    // Applies one word of a configuration value: a level, or the name of an existing appender. The
-    // first appender of a value replaces the list, as long as *got_appender_p (not null) is false;
-    // it is replaced by true then.
-    // An appender that is named twice receives each message twice.
+    // Applies one word of a configuration value: a level, or the name of an existing appender. If
+    // *got_appender_p (not null) is false, the appender replaces the list and *got_appender_p
+    // becomes true; otherwise it is appended. An appender that is named twice receives each message
+    // twice.
     // Returns: false, with nothing changed, for any other word.
     bool applyConfWord(const std::string& word, bool* got_appender_p);
 

@@ -14,18 +14,17 @@
 #include <cstdint>
 #include <string_view>
 
-// The severity of a message. Logger has no entry points for NOTICE, ALERT and EMERG; these are
-// useful as minimum levels.
+// The severity of a message.
 enum LogLevel : std::int32_t {
-    DEBUG = 0,
-    INFO = 1,
-    NOTICE = 2,
-    WARN = 3,
-    ERROR = 4,
-    CRIT = 5,
-    ALERT = 6,
-    FATAL = 7,
-    EMERG = 8
+    DEBUG = 0,   // details for developers
+    INFO = 1,    // normal operation; the default minimum of a channel
+    NOTICE = 2,  // useful as a minimum; Logger has no entry point for it
+    WARN = 3,    // a problem that the program works around
+    ERROR = 4,   // an operation failed
+    CRIT = 5,    // a part of the program failed
+    ALERT = 6,   // useful as a minimum; Logger has no entry point for it
+    FATAL = 7,   // the program cannot continue
+    EMERG = 8    // useful as a minimum, to discard everything; Logger has no entry point for it
 };
 
 // Returns: the name of a level, not padded; "???" for any other value. The text is a constant. Its

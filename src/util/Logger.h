@@ -50,7 +50,8 @@ public:
     explicit Logger(const char* name);
     // A copy logs to the same channel under the same name, but never waits to be bound.
     Logger(const Logger& other) = default;
-    // Takes the other's channel and name; never waits to be bound.
+    // Takes the other's channel and name. A logger that waits to be bound keeps waiting, under the
+    // new name.
     Logger& operator=(const Logger& other);
     // Removes the logger from the list if it still waits to be bound.
     ~Logger();

@@ -87,12 +87,12 @@ public:
     // empty.
     [[nodiscard]] Pathname toLeaf() const;
 
-    // Returns: the text after the last '.' of the last element; empty if there is none, or if the
-    // path ends in '.' or '/'.
+    // Returns: the text after the last dot of the last element; empty if there is none, or if the
+    // path ends in a dot or '/'.
     // Deliberate: a name's first dot counts (".bashrc" has the extension "bashrc"), though
     // basenameWithoutExt does not cut there.
     [[nodiscard]] std::string ext() const;
-    // Returns: the last element without its last '.' and what follows; empty if the path ends in
+    // Returns: the last element without its last dot and what follows; empty if the path ends in
     // '/'.
     // Deliberate: a dot that is the element's first character stays (".bashrc"), and a dot at the
     // end is removed ("file." gives "file"), unlike in ext.
@@ -111,7 +111,7 @@ public:
     // --- The shell -------------------------------------------------------------------------------
 
     // Returns: the path as a word of a shell command line, quoted for blanks, quotes, '$', '\\' and
-    // "#&*;=?[]|".
+    // `#&*;=?[]|`.
     // Deliberate: parentheses, redirections, backquotes, '~', '!' and braces are not quoted. Use
     // this for trusted names only; it does not make untrusted names safe.
     [[nodiscard]] std::string shellQuoted() const;

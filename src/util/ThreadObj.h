@@ -62,7 +62,7 @@ public:
     // thread is created then.
     explicit Thread(const char* thrname);
 
-    // Frees the object; the thread must have ended.
+    // Destroys the object of a thread that has ended.
     // Requires: joined (asserted), unless mainThreadDying() was called.
     // Deliberate: after mainThreadDying() a worker that has not started never runs. The destructor
     // waits until its thread has left the start.

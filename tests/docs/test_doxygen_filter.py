@@ -11,7 +11,7 @@ import unittest
 
 FILTER = sys.argv.pop()
 HEADER = r'''#ifndef GUARD_H_
-// A "unit" of 100 %.
+// A "unit" of 100 %, a*b --c.
 //
 //     Queue queue(1);
 //
@@ -45,7 +45,7 @@ void print();
 '''
 FILTERED = r'''#ifndef GUARD_H_
 /// \file
-/// A \"unit\" of 100 \%.
+/// A \"unit\" of 100 \%, a*b \--c.
 ///
 /// \code{.cpp}
 /// Queue queue(1);
