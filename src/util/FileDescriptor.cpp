@@ -141,7 +141,7 @@ bool FileDescriptor::close() {
         return true;
     }
     const bool closed = ::close(_osdep) == 0;
-    _osdep = -1;
+    _osdep = NO_FILE;
     return closed;
 }
 

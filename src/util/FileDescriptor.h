@@ -97,6 +97,8 @@ public:
     bool close();
 
 protected:
+    static constexpr int NO_FILE = -1;  // after a close, and by default
+
     // Closes the descriptor and restores errno.
     void close_saveErrno();
 
@@ -111,7 +113,7 @@ protected:
 class ScopedFileDescriptor : public FileDescriptor {
 public:
     // Refers to no file.
-    ScopedFileDescriptor() : FileDescriptor(-1) {}
+    ScopedFileDescriptor() : FileDescriptor(NO_FILE) {}
     // Shares the number, which both objects will close.
     ScopedFileDescriptor(const ScopedFileDescriptor& other) = default;
     // Opens the file for reading; not valid() if that fails.
@@ -133,7 +135,7 @@ public:
 class ScopedSaferFileDescriptor : public FileDescriptor {
 public:
     // Refers to no file.
-    ScopedSaferFileDescriptor() : FileDescriptor(-1) {}
+    ScopedSaferFileDescriptor() : FileDescriptor(NO_FILE) {}
     // Shares the number, which both objects will close.
     ScopedSaferFileDescriptor(const ScopedSaferFileDescriptor& other) = default;
     // Opens the file for reading, without blocking; not valid() if that fails.

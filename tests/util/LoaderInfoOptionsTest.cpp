@@ -228,6 +228,7 @@ TEST(LoaderInfoTest, WithoutAContextParsesAndPrintsNothing) {
     info.printHelp();
     EXPECT_EQ("", err.text());
     EXPECT_FALSE(info.getDebug());
+    EXPECT_FALSE(info.getUseDebugLog());
     EXPECT_TRUE(info.getDaemon());
     EXPECT_FALSE(info.isError());
 }
