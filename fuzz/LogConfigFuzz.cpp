@@ -18,9 +18,9 @@
 #include "support/SlowConfig.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
-#include "util/internal/LogConfig.h"
 #include "util/LogFormat.h"
 #include "util/Pathname.h"
+#include "util/internal/LogConfig.h"
 
 namespace {
 

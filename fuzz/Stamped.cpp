@@ -7,8 +7,8 @@
 #include <stdexcept>
 
 #include "support/SlowLayout.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
+#include "util/internal/LogGlobals.h"
 
 // Processor time stands still, so that "%u" can be compared.
 extern "C" std::clock_t __wrap_clock();

@@ -16,9 +16,9 @@
 #include "support/SlowConfig.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
-#include "util/internal/LogGlobals.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
+#include "util/internal/LogGlobals.h"
 
 namespace fs = std::filesystem;
 

@@ -54,9 +54,11 @@ Logger::Logger(const char* name)
 
 // The link stays: it belongs to this logger's place in the list, if it has one.
 Logger& Logger::operator=(const Logger& other) {
-    _channel_name = other._channel_name;
-    _channel_name_len = other._channel_name_len;
-    _channel = other._channel;
+    if (this != &other) {
+        _channel_name = other._channel_name;
+        _channel_name_len = other._channel_name_len;
+        _channel = other._channel;
+    }
     return *this;
 }
 
