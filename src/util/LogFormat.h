@@ -111,8 +111,6 @@ private:
     static bool setKind(Atom& atom, char conversion, const char* arg, std::size_t arglen);
     void addLiteral(const char* begin, const char* end);
     Atom* new_atom();
-    void appendAtom(std::string& out, const Atom* a, CachedTm& tm, const LogMsgMetadata& mdata,
-                    const std::string& msg) const;
 
     std::string _fmt;              // the pattern; literal atoms point into it
     Atom* _atoms = nullptr;        // array of _max_atoms, owned
