@@ -44,12 +44,12 @@ public:
     bool setConfig(const char* value);
 
     // Hands a message to the appenders, in the order of the list; tests no level.
-    void write(const LogMsgMetadata& mdata, const std::string& msg);
+    void write(const LogMsgMetadata& mdata, std::string_view msg);
 
     // The same for a message about the appender `dont_touch` (null allowed), which does not get
     // it; nor do appenders whose own failed write is being reported on this thread.
     // Returns: true when at least one appender got the message.
-    bool write(const LogMsgMetadata& mdata, const std::string& msg, const LogAppender* dont_touch);
+    bool write(const LogMsgMetadata& mdata, std::string_view msg, const LogAppender* dont_touch);
 
     LogLevel minlevel = INFO;  // messages below it are discarded
 

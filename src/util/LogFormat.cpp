@@ -155,7 +155,7 @@ LogFormat::Atom* LogFormat::new_atom() {
     return _atom_end++;
 }
 
-void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const {
+void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, std::string_view msg) const {
     CachedTm tm;
     for (const Atom* a = _atoms; a != _atom_end; ++a) {
         const std::size_t mark = out.size();
