@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <string_view>
 
 #include "util/internal/ErrnoKeeper.h"
 #include "util/internal/FormatText.h"
@@ -54,8 +55,8 @@ ssize_t FileDescriptor::writev(const struct iovec* buffers, unsigned int count) 
 }
 
 void FileDescriptor::vformat(const char* fmt, std::va_list args) const {
-    formatText(fmt, args, [this](const char* text, std::size_t length) {
-        static_cast<void>(write(text, length));
+    formatText(fmt, args, [this](std::string_view text) {
+        static_cast<void>(write(text.data(), text.size()));
     });
 }
 

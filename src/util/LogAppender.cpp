@@ -199,10 +199,11 @@ void LogAppender::finalSetup(const char* name) {
     }
 }
 
-void LogAppender::write(const LogMsgMetadata& mdata, const std::string& msg) {
+void LogAppender::write(const LogMsgMetadata& mdata, std::string_view msg) {
     // An appender may have to report another's failure before its own setup is finished.
     const LogFormat* const layout = _fmt != nullptr ? _fmt : rootAppender()._fmt;
     std::string line;
+    line.reserve(2 * msg.size());  // most layouts add less than the length of the message
     layout->apply(line, mdata, msg);
     Failure failure;
     {

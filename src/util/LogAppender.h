@@ -92,7 +92,7 @@ public:
     // by a full device counts with the bytes that were written. The next line tries again.
     // Errors: std::bad_alloc when the line cannot be formatted. errno is not kept.
     // Cost: one `write`; at most one `stat` in five seconds of message time.
-    void write(const LogMsgMetadata& mdata, const std::string& msg);
+    void write(const LogMsgMetadata& mdata, std::string_view msg);
 
 private:
     friend LogAppender& rootAppender();

@@ -95,7 +95,7 @@ bool LogChannel::setConfig(const char* value) {
     return allAccepted;
 }
 
-void LogChannel::write(const LogMsgMetadata& mdata, const std::string& msg) {
+void LogChannel::write(const LogMsgMetadata& mdata, std::string_view msg) {
     if (_appenders.empty()) {
         rootAppender().write(mdata, msg);
         return;
@@ -105,7 +105,7 @@ void LogChannel::write(const LogMsgMetadata& mdata, const std::string& msg) {
     }
 }
 
-bool LogChannel::write(const LogMsgMetadata& mdata, const std::string& msg,
+bool LogChannel::write(const LogMsgMetadata& mdata, std::string_view msg,
                        const LogAppender* dont_touch) {
     bool written = false;
     const auto writeTo = [&](LogAppender& appender) {

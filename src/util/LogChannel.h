@@ -19,6 +19,7 @@
 // Configured before other threads start; safe from any thread afterwards.
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "util/LogLevel.h"
@@ -55,12 +56,12 @@ public:
 
     // Writes a message to the appenders, in the order of the list; does not test the level.
     // Errors: std::bad_alloc if the line cannot be formatted.
-    void write(const LogMsgMetadata& mdata, const std::string& msg);
+    void write(const LogMsgMetadata& mdata, std::string_view msg);
 
     // Writes a message about the appender `dont_touch` (null allowed), which does not get it; nor
     // do appenders whose own failed write is being reported on this thread.
     // Returns: true if at least one appender got the message.
-    bool write(const LogMsgMetadata& mdata, const std::string& msg, const LogAppender* dont_touch);
+    bool write(const LogMsgMetadata& mdata, std::string_view msg, const LogAppender* dont_touch);
 
     LogLevel minlevel = INFO;  // messages below it are discarded
 

@@ -155,48 +155,42 @@ LogFormat::Atom* LogFormat::new_atom() {
     return _atom_end++;
 }
 
-void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const {
+void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, std::string_view msg) const {
     CachedTm tm;
     for (const Atom* a = _atoms; a != _atom_end; ++a) {
-        appendAtom(out, a, tm, mdata, msg);
-    }
-}
-
-// Appends the text of one atom, fitted into its widths.
-void LogFormat::appendAtom(std::string& out, const Atom* a, CachedTm& tm,
-                           const LogMsgMetadata& mdata, const std::string& msg) const {
-    const std::size_t mark = out.size();
-    switch (a->what) {
-        case Atom::MSG:
-            out.append(msg);
-            break;
-        case Atom::STR:
-            out.append(a->arg.str, a->slen);
-            break;
-        case Atom::CATEGORY:
-            out.append(mdata.category->_channel_name, mdata.category->_channel_name_len);
-            break;
-        case Atom::LEVEL: {
-            std::size_t len = 0;
-            const char* const name = loglevel2str(&len, mdata.level);
-            out.append(name, len);
-            break;
+        const std::size_t mark = out.size();
+        switch (a->what) {
+            case Atom::MSG:
+                out.append(msg);
+                break;
+            case Atom::STR:
+                out.append(a->arg.str, a->slen);
+                break;
+            case Atom::CATEGORY:
+                out.append(mdata.category->_channel_name, mdata.category->_channel_name_len);
+                break;
+            case Atom::LEVEL: {
+                std::size_t len = 0;
+                const char* const name = loglevel2str(&len, mdata.level);
+                out.append(name, len);
+                break;
+            }
+            case Atom::THREADNAME:
+                out.append(Thread::currentName());
+                break;
+            case Atom::EPOCH_MSEC:
+                appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()));
+                break;
+            case Atom::EPOCH_SEC:
+                appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()) / 1000);
+                break;
+            case Atom::TIME_PROC:
+                appendNumber(out, std::clock());
+                break;
+            default:
+                QUELTA_ASSERT(a->what == Atom::TIME_FMT);
+                a->arg.fdate->fmt(out, tm, mdata);
         }
-        case Atom::THREADNAME:
-            out.append(Thread::currentName());
-            break;
-        case Atom::EPOCH_MSEC:
-            appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()));
-            break;
-        case Atom::EPOCH_SEC:
-            appendNumber(out, Timeval::msecDifference(mdata.stamp, epoch_timeval()) / 1000);
-            break;
-        case Atom::TIME_PROC:
-            appendNumber(out, std::clock());
-            break;
-        default:
-            QUELTA_ASSERT(a->what == Atom::TIME_FMT);
-            a->arg.fdate->fmt(out, tm, mdata);
+        fitWidths(out, mark, *a);
     }
-    fitWidths(out, mark, *a);
 }

@@ -28,6 +28,7 @@
 #include <cstdint>
 #include <ctime>
 #include <string>
+#include <string_view>
 
 #include "util/LogLevel.h"
 #include "util/LogMsgMetadata.h"
@@ -91,15 +92,15 @@ public:
     LogFormat& operator=(const LogFormat&) = delete;
 
     // Appends the line for one message to `out`; a final newline comes only from "%n".
-    // Requires: `msg` and `out` are different objects; only "%c" needs `mdata.category`.
+    // Requires: `msg` does not point into `out`; only "%c" needs `mdata.category`.
     // Errors: std::bad_alloc.
     // Threads: safe from any thread.
     // Cost: at most one conversion to local time, none without a date.
-    void apply(std::string& out, const LogMsgMetadata& mdata, const std::string& msg) const;
+    void apply(std::string& out, const LogMsgMetadata& mdata, std::string_view msg) const;
 
     // Tests the level, formats and writes to the channel: the common path of Logger's entry points.
     // Never throws; errno is kept.
-    static void do_log(Logger* logger, LogLevel level, const std::string& msg);
+    static void do_log(Logger* logger, LogLevel level, std::string_view msg);
     static void do_log(Logger* logger, LogLevel level, const char* fmt, va_list ap)
         __attribute__((format(printf, 3, 0)));
 
@@ -119,8 +120,6 @@ private:
     static bool setKind(Atom& atom, char conversion, const char* arg, std::size_t arglen);
     void addLiteral(const char* begin, const char* end);
     Atom* new_atom();
-    void appendAtom(std::string& out, const Atom* a, CachedTm& tm, const LogMsgMetadata& mdata,
-                    const std::string& msg) const;
 
     std::string _fmt;              // the pattern; literal atoms point into it
     Atom* _atoms = nullptr;        // array of _max_atoms, owned

@@ -2,42 +2,18 @@
 
 #include <cerrno>
 #include <cstring>
+#include <string_view>
 
 #include "util/Assert.h"
 #include "util/LogAppender.h"
 #include "util/LogFormat.h"
 #include "util/Timeval.h"
 #include "util/internal/ErrnoKeeper.h"
-#include "util/internal/ErrorText.h"
 #include "util/internal/FileCloser.h"
 #include "util/internal/FormatText.h"
 #include "util/internal/LogConfig.h"
 #include "util/internal/LogGlobals.h"
 #include "util/internal/RetryOnEintr.h"
-
-namespace {
-
-constexpr std::size_t ERROR_TEXT_SIZE = 1000;
-
-// The format with every "%m" replaced by the text of `errnum`.
-std::string withErrorText(const char* fmt, int errnum) {
-    char text[ERROR_TEXT_SIZE];
-    const char* const inserted = errorText(errnum, text, sizeof text) ? text : "UNKNOWN ERROR";
-
-    std::string result;
-    for (const char* p = fmt; *p != '\0'; ++p) {
-        if (*p != '%' || (p[1] != 'm' && p[1] != '%')) {
-            result += *p;
-        } else if (*++p == 'm') {
-            result += inserted;
-        } else {
-            result += "%%";  // a pair, whose second half does not begin a "%m"
-        }
-    }
-    return result;
-}
-
-}  // namespace
 
 Logger::Logger(const char* name)
     : _channel_name(name), _channel_name_len(std::strlen(name)), _channel(nullptr), _next(nullptr) {
@@ -122,12 +98,7 @@ bool Logger::setChannelLevel(const char* name, const std::string& level) {
 }
 
 void Logger::vformat(std::string& out, int errnum, const char* fmt, va_list ap) {
-    std::string expanded;
-    if (std::strstr(fmt, "%m") != nullptr) {
-        expanded = withErrorText(fmt, errnum);
-        fmt = expanded.c_str();
-    }
-    formatText(fmt, ap, [&](const char* text, std::size_t length) { out.assign(text, length); });
+    formatMessage(errnum, fmt, ap, [&](std::string_view text) { out = text; });
 }
 
 void Logger::format(std::string& out, const char* fmt, ...) {

@@ -41,3 +41,22 @@ TEST(LogMemoryFaultTest, AMessageReachesTheFileOrStandardErrorOnce) {
     }
     EXPECT_GT(n, 2U);
 }
+
+TEST(LogMemoryFaultTest, AFormattedMessageNeedsNoMemoryExceptForItsLine) {
+    REQUIRE_ALLOCATION_PROBE();
+    const TempDir dir;
+    const std::string text(250, 'x');
+    const ChildRun run = inChild([&] {
+        FileAppender log(dir.file("app.log"));
+        rootChannel()._appenders = {&log};
+        Logger logger("any");
+        Logger::initialize();
+        logger.info("opens the file");
+        AllocationProbe probe;
+        logger.info("%s %d", text.c_str(), 42);
+        probe.stop();
+        EXPECT_EQ(1U, probe.count());
+    });
+    EXPECT_EQ(0, run.status) << run.err;
+    EXPECT_EQ("opens the file\n" + text + " 42\n", readFile(dir.file("app.log")));
+}

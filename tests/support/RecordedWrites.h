@@ -16,6 +16,7 @@
 #include <functional>
 #include <mutex>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -81,20 +82,21 @@ private:
     std::vector<Message> _messages;
 };
 
-// LogAppender::write(const LogMsgMetadata&, const std::string&) as the linker names it, after the
+// LogAppender::write(const LogMsgMetadata&, std::string_view) as the linker names it, after the
 // prefixes of the real and of the wrapped function.
 // clang-format off
 #define QUELTA_APPENDER_WRITE(prefix) \
-    prefix##__ZN11LogAppender5writeERK14LogMsgMetadataRKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEE
+    prefix##__ZN11LogAppender5writeERK14LogMsgMetadataSt17basic_string_viewIcSt11char_traitsIcEE
 // clang-format on
 
 extern "C" {
 void QUELTA_APPENDER_WRITE(__real)(LogAppender* appender, const LogMsgMetadata& mdata,
-                                   const std::string& msg);
+                                   std::string_view msg);
 void QUELTA_APPENDER_WRITE(__wrap)(LogAppender* appender, const LogMsgMetadata& mdata,
-                                   const std::string& msg) {
+                                   std::string_view msg) {
     if (RecordedWrites::s_current != nullptr) {
-        RecordedWrites::s_current->record({appender, mdata.category, mdata.level, msg});
+        RecordedWrites::s_current->record(
+            {appender, mdata.category, mdata.level, std::string(msg)});
     } else {
         QUELTA_APPENDER_WRITE(__real)(appender, mdata, msg);
     }

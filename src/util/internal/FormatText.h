@@ -1,19 +1,22 @@
 #ifndef QUELTA_UTIL_INTERNAL_FORMATTEXT_H_
 #define QUELTA_UTIL_INTERNAL_FORMATTEXT_H_
 
-// printf into a buffer that grows until the text fits.
+// printf into a buffer that grows until the text fits, and "%m" in formats of messages.
 // Safe from any thread.
 
 #include <cstdarg>
 #include <cstddef>
 #include <cstdio>
+#include <cstring>
 #include <memory>
 #include <stdexcept>
+#include <string>
+#include <string_view>
 
-// Formats the arguments and calls `use(text, length)` with the text, which is valid during the
-// call. Errors: std::bad_alloc; std::runtime_error if the C library cannot format the arguments,
-// for example a wide character without a multibyte form. Cost: allocates only for texts of 256
-// characters and more.
+// Formats the arguments and calls `use(text)` with the text, a std::string_view that is valid
+// during the call. Errors: std::bad_alloc; std::runtime_error if the C library cannot format the
+// arguments, for example a wide character without a multibyte form. Cost: allocates only for texts
+// of 256 characters and more.
 template <typename Use>
 __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_list ap, Use use) {
     constexpr std::size_t MAX_GUESSED_SIZE = std::size_t{1} << 20;  // bytes
@@ -27,7 +30,7 @@ __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_l
         const int length = std::vsnprintf(buf, size, fmt, pass);
         va_end(pass);
         if (length >= 0 && static_cast<std::size_t>(length) < size) {
-            use(buf, static_cast<std::size_t>(length));
+            use(std::string_view(buf, static_cast<std::size_t>(length)));
             return;
         }
         // A negative length may mean that the buffer is too small, up to a point.
@@ -38,6 +41,21 @@ __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_l
         larger.reset(new char[size]);
         buf = larger.get();
     }
+}
+
+// Returns: the format with every "%m" replaced by the text of `errnum`.
+std::string withErrorText(const char* fmt, int errnum);
+
+// formatText for a message, in whose format "%m" is replaced by the text of `errnum`.
+template <typename Use>
+__attribute__((format(printf, 2, 0))) void formatMessage(int errnum, const char* fmt,
+                                                         std::va_list ap, Use use) {
+    std::string expanded;
+    if (std::strstr(fmt, "%m") != nullptr) {
+        expanded = withErrorText(fmt, errnum);
+        fmt = expanded.c_str();
+    }
+    formatText(fmt, ap, use);
 }
 
 #endif  // QUELTA_UTIL_INTERNAL_FORMATTEXT_H_

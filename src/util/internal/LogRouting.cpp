@@ -3,22 +3,34 @@
 #include <unistd.h>
 
 #include <string>
+#include <string_view>
 
 #include "util/LogFormat.h"
 #include "util/Logger.h"
 #include "util/internal/ErrnoKeeper.h"
+#include "util/internal/FormatText.h"
 #include "util/internal/LogGlobals.h"
 #include "util/internal/NeverDestroyed.h"
 
 constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
 
-void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept try {
+namespace {
+
+// fallback_to_stderr without a string for the message.
+void writeToStderr(LogLevel level, std::string_view msg) noexcept try {
     std::size_t length = 0;
-    const std::string line = loglevel2str(&length, level) + (" - " + msg + '\n');
+    std::string line = loglevel2str(&length, level);
+    line.append(" - ").append(msg).append("\n");
     // One write, so that lines of several threads or processes do not mix.
     [[maybe_unused]] const ssize_t ignored = ::write(STDERR_FILENO, line.data(), line.size());
 } catch (...) {
     // There is nowhere left to report to.
+}
+
+}  // namespace
+
+void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept {
+    writeToStderr(level, msg);
 }
 
 bool LogFormat::check_for_unitialized_logger(const Logger* logger) {
@@ -32,10 +44,10 @@ bool LogFormat::check_for_unitialized_logger(const Logger* logger) {
     return waiting == nullptr;
 }
 
-void LogFormat::do_log(Logger* logger, LogLevel level, const std::string& msg) {
+void LogFormat::do_log(Logger* logger, LogLevel level, std::string_view msg) {
     const ErrnoKeeper errnoKeeper;
     if (check_for_unitialized_logger(logger)) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
         return;
     }
     LogChannel& channel = logger->_channel != nullptr ? *logger->_channel : rootChannel();
@@ -45,7 +57,7 @@ void LogFormat::do_log(Logger* logger, LogLevel level, const std::string& msg) {
     try {
         channel.write(LogMsgMetadata(logger, level), msg);
     } catch (...) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
     }
 }
 
@@ -55,15 +67,12 @@ void LogFormat::do_log(Logger* logger, LogLevel level, const char* fmt, va_list 
     if (level < channel.minlevel && !check_for_unitialized_logger(logger)) {
         return;
     }
-    std::string msg;
     try {
-        msg = fmt;  // written if it cannot be formatted
-        Logger::vformat(msg, errnoKeeper.saved(), fmt, ap);
+        formatMessage(errnoKeeper.saved(), fmt, ap,
+                      [&](std::string_view msg) { do_log(logger, level, msg); });
     } catch (...) {
-        fallback_to_stderr(level, msg);
-        return;
+        writeToStderr(level, fmt);  // unformatted rather than lost
     }
-    do_log(logger, level, msg);
 }
 
 void LogFormat::internal(const LogAppender* failing, LogLevel level, const char* fmt, ...) {
@@ -89,6 +98,6 @@ void LogFormat::internal(const LogAppender* failing, LogLevel level, const char*
     }
     va_end(ap);
     if (!written) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
     }
 }
