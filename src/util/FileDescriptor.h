@@ -54,7 +54,7 @@ public:
     [[nodiscard]] ssize_t writev(const struct iovec* buffers, unsigned int count) const;
 
     // Formats like vprintf and writes the text. Write errors are not reported.
-    // Errors: std::bad_alloc if memory is exhausted by a text of more than 255 bytes.
+    // Errors: std::bad_alloc, for a text of more than 255 bytes or one that cannot be formatted.
     // Cost: no allocation up to 255 bytes.
     void vformat(const char* fmt, std::va_list args) const __attribute__((format(printf, 2, 0)));
     // The same as vformat, with the arguments of printf.

@@ -109,7 +109,7 @@ public:
     // Deliberate: the error text becomes a part of the format, so that a "%" in it would be read
     // as a conversion.
     // Requires: the arguments fit the format; they may point into `out`.
-    // Errors: std::bad_alloc; std::runtime_error if the C library cannot format the arguments.
+    // Errors: std::bad_alloc, also if the C library cannot format the arguments.
     // Cost: allocates only for `out`, and for texts of 256 characters and more.
     static void vformat(std::string& out, int errnum, const char* fmt, va_list ap)
         __attribute__((format(printf, 3, 0)));

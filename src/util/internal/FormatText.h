@@ -9,14 +9,14 @@
 #include <cstdio>
 #include <cstring>
 #include <memory>
-#include <stdexcept>
+#include <new>
 #include <string>
 #include <string_view>
 
 // Formats the arguments and calls `use(text)` with the text, a std::string_view that is valid
-// during the call. Errors: std::bad_alloc; std::runtime_error if the C library cannot format the
-// arguments, for example a wide character without a multibyte form. Cost: allocates only for texts
-// of 256 characters and more.
+// during the call. Errors: std::bad_alloc, also if the C library cannot format the arguments, for
+// example a wide character without a multibyte form. Cost: allocates only for texts of 256
+// characters and more.
 template <typename Use>
 __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_list ap, Use use) {
     constexpr std::size_t MAX_GUESSED_SIZE = std::size_t{1} << 20;  // bytes
@@ -33,9 +33,10 @@ __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_l
             use(std::string_view(buf, static_cast<std::size_t>(length)));
             return;
         }
-        // A negative length may mean that the buffer is too small, up to a point.
+        // A negative length may mean that the buffer is too small. Doubling it until memory is
+        // exhausted would end in the same exception.
         if (length < 0 && size >= MAX_GUESSED_SIZE) {
-            throw std::runtime_error("cannot format a text");
+            throw std::bad_alloc();
         }
         size = length < 0 ? 2 * size : static_cast<std::size_t>(length) + 1;
         larger.reset(new char[size]);
