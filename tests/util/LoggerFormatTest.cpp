@@ -12,10 +12,10 @@
 
 #include "support/ScriptedLibc.h"
 #include "util/Logger.h"
-#include "util/internal/LogRouting.h"
 
 // The internal functions, which other programs may declare for themselves.
 bool setup_log_channel(const std::string& line);
+void fallback_to_stderr(LogLevel level, const std::string& msg);
 Timeval& epoch_timeval();
 bool read_line(std::string& result, std::FILE* ifile);
 bool handle_xml_comment(std::string& result, const char* cf, unsigned& lineno, std::FILE* ifile);

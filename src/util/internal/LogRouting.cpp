@@ -14,7 +14,10 @@
 
 constinit thread_local const ReportMark* ReportMark::s_innermost = nullptr;
 
-void fallback_to_stderr(LogLevel level, std::string_view msg) noexcept try {
+namespace {
+
+// fallback_to_stderr without a string for the message.
+void writeToStderr(LogLevel level, std::string_view msg) noexcept try {
     std::size_t length = 0;
     std::string line = loglevel2str(&length, level);
     line.append(" - ").append(msg).append("\n");
@@ -22,6 +25,12 @@ void fallback_to_stderr(LogLevel level, std::string_view msg) noexcept try {
     [[maybe_unused]] const ssize_t ignored = ::write(STDERR_FILENO, line.data(), line.size());
 } catch (...) {
     // There is nowhere left to report to.
+}
+
+}  // namespace
+
+void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept {
+    writeToStderr(level, msg);
 }
 
 bool LogFormat::check_for_unitialized_logger(const Logger* logger) {
@@ -38,7 +47,7 @@ bool LogFormat::check_for_unitialized_logger(const Logger* logger) {
 void LogFormat::do_log(Logger* logger, LogLevel level, std::string_view msg) {
     const ErrnoKeeper errnoKeeper;
     if (check_for_unitialized_logger(logger)) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
         return;
     }
     LogChannel& channel = logger->_channel != nullptr ? *logger->_channel : rootChannel();
@@ -48,7 +57,7 @@ void LogFormat::do_log(Logger* logger, LogLevel level, std::string_view msg) {
     try {
         channel.write(LogMsgMetadata(logger, level), msg);
     } catch (...) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
     }
 }
 
@@ -62,7 +71,7 @@ void LogFormat::do_log(Logger* logger, LogLevel level, const char* fmt, va_list 
         formatMessage(errnoKeeper.saved(), fmt, ap,
                       [&](std::string_view msg) { do_log(logger, level, msg); });
     } catch (...) {
-        fallback_to_stderr(level, fmt);  // unformatted rather than lost
+        writeToStderr(level, fmt);  // unformatted rather than lost
     }
 }
 
@@ -89,6 +98,6 @@ void LogFormat::internal(const LogAppender* failing, LogLevel level, const char*
     }
     va_end(ap);
     if (!written) {
-        fallback_to_stderr(level, msg);
+        writeToStderr(level, msg);
     }
 }

@@ -6,7 +6,7 @@
 // LogFormat: do_log, internal and check_for_unitialized_logger.
 // Safe from any thread.
 
-#include <string_view>
+#include <string>
 
 #include "util/LogLevel.h"
 
@@ -14,7 +14,7 @@ class LogAppender;
 
 // Writes "LEVEL - message" and a newline to standard error, with one write whose result is ignored.
 // Throws nothing.
-void fallback_to_stderr(LogLevel level, std::string_view msg) noexcept;
+void fallback_to_stderr(LogLevel level, const std::string& msg) noexcept;
 
 // Marks an appender, for the current thread and scope, as one whose failed write is being reported.
 // It gets no report meanwhile, so appenders that all fail do not recurse.
