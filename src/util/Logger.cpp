@@ -117,6 +117,9 @@ void Logger::format(std::string& out, int errnum, const char* fmt, ...) {
 }
 
 void Logger::fatal(const char* fmt, ...) {
+    if (suppresses(FATAL)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, FATAL, fmt, ap);
@@ -124,6 +127,9 @@ void Logger::fatal(const char* fmt, ...) {
 }
 
 void Logger::crit(const char* fmt, ...) {
+    if (suppresses(CRIT)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, CRIT, fmt, ap);
@@ -131,6 +137,9 @@ void Logger::crit(const char* fmt, ...) {
 }
 
 void Logger::error(const char* fmt, ...) {
+    if (suppresses(ERROR)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, ERROR, fmt, ap);
@@ -138,6 +147,9 @@ void Logger::error(const char* fmt, ...) {
 }
 
 void Logger::warn(const char* fmt, ...) {
+    if (suppresses(WARN)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, WARN, fmt, ap);
@@ -145,6 +157,9 @@ void Logger::warn(const char* fmt, ...) {
 }
 
 void Logger::info(const char* fmt, ...) {
+    if (suppresses(INFO)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, INFO, fmt, ap);
@@ -152,6 +167,9 @@ void Logger::info(const char* fmt, ...) {
 }
 
 void Logger::debug(const char* fmt, ...) {
+    if (suppresses(DEBUG)) {
+        return;
+    }
     va_list ap;
     va_start(ap, fmt);
     LogFormat::do_log(this, DEBUG, fmt, ap);

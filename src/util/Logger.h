@@ -122,6 +122,11 @@ public:
 private:
     friend class LogFormat;  // the layouts print the name; the routing reads the channel
 
+    // Whether the bound channel discards messages of a level; false while no channel is bound.
+    bool suppresses(LogLevel level) const {
+        return _channel != nullptr && level < _channel->minlevel;
+    }
+
     const char* _channel_name;      // not owned
     std::size_t _channel_name_len;  // its length, for the layouts
     LogChannel* _channel;           // not owned; null, read as the root channel, until bound
