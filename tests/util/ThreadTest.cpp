@@ -4,7 +4,9 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <csignal>
+#include <cstring>
 #include <string>
 #include <thread>
 #include <type_traits>
@@ -193,6 +195,31 @@ TEST(ThreadTest, DyingMainThreadDestroysWorkersThatNeverStarted) {
             }
             EXPECT_FALSE(ran);
         }
+    });
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+}
+
+TEST(ThreadTest, TheDestructorWaitsUntilAWorkerThatNeverStartedIsDoneWithTheObject) {
+    static std::atomic<bool> destroyed{false};
+    static std::atomic<bool> woken{false};
+    const ChildRun run = inChild([] {
+        mainThread();
+        {
+            const Worker worker("Sorter", [] {});
+            Thread::mainThreadDying();
+            onPthreadCall = [](const char* function) {
+                // The worker's answer to the destructor is its only broadcast.
+                if (Thread::current() != nullptr &&
+                    std::strcmp(function, "pthread_cond_broadcast") == 0) {
+                    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+                    EXPECT_FALSE(destroyed);
+                    woken = true;
+                }
+            };
+        }
+        destroyed = true;
+        waitUntil([] { return woken.load(); });
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);
