@@ -17,6 +17,7 @@
 
 #include <ctime>
 #include <string>
+#include <tuple>
 
 // An instant of wall-clock time.
 class Timeval {
@@ -54,8 +55,7 @@ public:
 
     // Returns: whether this instant is before the other.
     [[nodiscard]] bool operator<(const Timeval& other) const noexcept {
-        return _tv.tv_sec != other._tv.tv_sec ? _tv.tv_sec < other._tv.tv_sec
-                                              : _tv.tv_usec < other._tv.tv_usec;
+        return std::tie(_tv.tv_sec, _tv.tv_usec) < std::tie(other._tv.tv_sec, other._tv.tv_usec);
     }
     // Returns: whether this instant is not after the other.
     [[nodiscard]] bool operator<=(const Timeval& other) const noexcept { return !(other < *this); }
