@@ -75,7 +75,6 @@ WildcardMatcher::WildcardMatcher(WildcardMatcher&& other) noexcept
       _subStringCount(std::exchange(other._subStringCount, 0)),
       _isWord(std::exchange(other._isWord, 0)) {
     std::copy(std::begin(other._subStrings), std::end(other._subStrings), _subStrings);
-    other._subStrings[0] = nullptr;
 }
 
 WildcardMatcher& WildcardMatcher::operator=(const WildcardMatcher& other) {

@@ -1,5 +1,6 @@
 #include "util/WildcardMatcher.h"
 
+#include <cstring>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -37,7 +38,9 @@ constexpr bool (WildcardMatcher::*withCapture)(const char*, std::vector<std::str
 
 bool matches(const char* pattern, const char* text) {
     const WildcardMatcher matcher(pattern);
-    return matcher.isMatch(text);
+    const bool matched = matcher.isMatch(text);
+    EXPECT_EQ(matched, matcher.isMatch(text, std::strlen(text))) << pattern << " on " << text;
+    return matched;
 }
 
 std::string dump(const WildcardMatcher& matcher) {

@@ -444,9 +444,8 @@ TEST_F(ReteTest, APatternsOwnTextSetsItEvenIfTheMatcherDoesNotMatch) {
     // A matcher that was assigned to matches nothing. Its earlier copies stay allocated, and
     // reachable for leak checkers.
     WildcardMatcher& matcher = rs._wildcardTrie._dataList.at(0).first;
-    static const char* leaked[2];
-    leaked[0] = matcher._needle;
-    leaked[1] = matcher._buffer;
+    static auto& leaked = *new std::vector<const char*>;
+    leaked.insert(leaked.end(), {matcher._needle, matcher._buffer});
     matcher = WildcardMatcher("b");
     EXPECT_FALSE(set("xa"));
     EXPECT_TRUE(set("*a"));
