@@ -5,6 +5,7 @@
 
 #include <atomic>
 #include <functional>
+#include <mutex>
 #include <thread>
 #include <utility>
 
@@ -39,6 +40,13 @@ void waitUntil(Condition condition) {
     while (!condition()) {
         std::this_thread::yield();
     }
+}
+
+// Returns: the number of workers that are registered. Waiting until there are none keeps a child
+// from exiting, and destroying the locks of threads, while a detached worker still runs.
+inline unsigned registeredWorkers() {
+    const std::lock_guard<Mutex> lock(ActiveThreads::_mutex);
+    return ActiveThreads::_nthreads;
 }
 
 // A worker that stays in main() until leave().

@@ -44,7 +44,7 @@ TEST(ActiveThreadsTest, HoldsWorkersThatHaveNotStartedYet) {
     ScriptedCalls waits("pthread_cond_wait");
     Worker worker("Sorter", [] {});
     waitUntil([&] { return waits.calls() > 0; });
-    EXPECT_EQ(1U, ActiveThreads::_nthreads);
+    EXPECT_EQ(1U, registeredWorkers());
     worker.go();
     worker.join();
     expectNoRegistry();

@@ -195,6 +195,7 @@ TEST(ThreadTest, DyingMainThreadDestroysWorkersThatNeverStarted) {
             }
             EXPECT_FALSE(ran);
         }
+        waitUntil([] { return registeredWorkers() == 0; });
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);
@@ -220,6 +221,7 @@ TEST(ThreadTest, TheDestructorWaitsUntilAWorkerThatNeverStartedIsDoneWithTheObje
         }
         destroyed = true;
         waitUntil([] { return woken.load(); });
+        waitUntil([] { return registeredWorkers() == 0; });
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);
@@ -249,6 +251,7 @@ TEST(ThreadTest, DyingMainThreadDestroysTheObjectOfARunningWorker) {
         destroyed = true;
         waitUntil([] { return !running; });
         EXPECT_TRUE(named);
+        waitUntil([] { return registeredWorkers() == 0; });
     });
     EXPECT_EQ(0, run.status);
     EXPECT_EQ("", run.err);

@@ -65,6 +65,7 @@ std::set<std::string> randomPatterns(int count) {
         patterns.insert(drawPattern());
     }
     std::vector<std::string> sorted;  // a set is built faster from sorted strings
+    sorted.reserve(patterns.size());
     for (const Pattern& pattern : patterns) {
         sorted.emplace_back(pattern.text);
     }
