@@ -118,7 +118,7 @@ TEST(ManualTest, ExamplesOfPatternsRenderAsShown) {
     EXPECT_LE(20U, examples.size());
 }
 
-TEST(ManualTest, ExamplesOfTheFileAreReadWithoutComplaint) {
+TEST(ManualTest, ExamplesOfTheFileAreReadWithoutAReport) {
     std::string all;
     for (const std::string& block : configurations()) {
         all += block;
@@ -167,7 +167,7 @@ TEST(ManualTest, BadFileIsReportedAsShown) {
     EXPECT_EQ(shown[1], run.err);
 }
 
-TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
+TEST(ManualTest, SampleConfigurationIsReadWithoutAReport) {
     const TempDir home;
     std::filesystem::create_directories(home.file("var/log"));
     const ChildRun run = inChild([&] {

@@ -77,39 +77,39 @@ TEST_F(ReteRunTest, AnnouncesItsConfigurationAndReports) {
 // Instrumented, a run takes half a minute; there the one above has to do.
 #ifndef QUELTA_SANITIZED
 
-TEST_F(ReteRunTest, TakesARelativeInstallationFromWhereItRuns) {
+TEST_F(ReteRunTest, ARelativeInstallationIsBelowTheWorkingDirectory) {
     writeFile(config(), "rootCategory=A\nappender.A.fileName=${QUELTA_HOME}/log\nbad\n");
     expectRun(reteWithoutHome().set("QUELTA_HOME", "home").in(_dir.path()), 0,
               announcement("home") + report, "");
     EXPECT_EQ("home/etc/log-cmdline.cfg:3: Parse error at \"bad\"\n", readFile(log()));
 }
 
-TEST_F(ReteRunTest, CleansDoubledAndTrailingSeparators) {
+TEST_F(ReteRunTest, RemovesDoubledAndTrailingSeparators) {
     writeFile(config(), "");
     const std::string untidy = '/' + _dir.path() + "//home///";
     expectRun(reteWithoutHome().set("QUELTA_HOME", untidy), 0, announcement(_home) + report, "");
 }
 
-TEST_F(ReteRunTest, LooksAtNoArguments) {
+TEST_F(ReteRunTest, IgnoresItsArguments) {
     writeFile(config(), "");
     expectRun(rete().arg("--help").arg("--unknown").arg("-c").arg("other").arg("-p").arg("x"), 0,
               announcement(_home) + report, "");
 }
 
-TEST_F(ReteRunTest, GoesOnWithoutConfiguration) {
+TEST_F(ReteRunTest, ContinuesWithoutConfiguration) {
     expectRun(
         rete(), 0, announcement(_home) + report,
         "Couldn't open log file configuration \"" + config() + "\": No such file or directory\n");
 }
 
-TEST_F(ReteRunTest, GoesOnWithoutAnInstallationWhereTheVariablePoints) {
+TEST_F(ReteRunTest, ContinuesWhenTheInstallationDoesNotExist) {
     std::filesystem::remove_all(_home);
     expectRun(
         rete(), 0, announcement(_home) + report,
         "Couldn't open log file configuration \"" + config() + "\": No such file or directory\n");
 }
 
-TEST_F(ReteRunTest, GoesOnWhenTheConfigurationIsUnreadable) {
+TEST_F(ReteRunTest, ContinuesWhenTheConfigurationIsUnreadable) {
     writeFile(config(), "rootCategory=DEBUG\n");
     ::chmod(config().c_str(), 0000);
     // Where coverage is measured, its counters cannot be written by a user without rights.
@@ -161,7 +161,7 @@ TEST_F(ReteRunTest, RunsWithStandardOutputFull) {
 }
 
 // With the library's own random numbers. The patterns need more than four times this memory.
-TEST_F(ReteRunTest, EndsInTheAllocationExceptionWhenMemoryRunsOut) {
+TEST_F(ReteRunTest, AbortsWithBadAllocWhenMemoryRunsOut) {
     writeFile(config(), "");
     Program real(RETE);
     ProgramRun run = real.set("QUELTA_HOME", _home).memoryLimit(256UL << 20).run();

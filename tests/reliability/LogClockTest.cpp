@@ -81,7 +81,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
+TEST_F(LogClockTest, AfterStepsByHoursEveryLineIsWholeAndStampedByTheClock) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     _log._maxSize = 2000;
     _log._maxBackupIndex = 10000;
@@ -100,7 +100,7 @@ TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
 
 // A clock that was set says nothing about the time since the last check: both directions count as
 // a long one.
-TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
+TEST_F(LogClockTest, AStepByHoursCausesACheckOfTheFile) {
     for (const long long step : {HOUR, -HOUR, 12 * HOUR, -12 * HOUR, 9000 * HOUR, -9000 * HOUR}) {
         line("before", START);
         const std::string moved = _file + ".moved";
@@ -117,7 +117,7 @@ TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
 }
 
 // The C library decides when it looks at TZ; a line is stamped by the zone that it has then.
-TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
+TEST_F(LogClockTest, ATimeZoneChangeTakesEffectAsInTheCLibrary) {
     const TimeZone utc("UTC0");
     std::string expected = line("in Greenwich", START);
     EXPECT_EQ("2023-11-14 22:13:20,000 in Greenwich\n", expected);
@@ -138,7 +138,7 @@ TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogClockTest, InstantsUpToTheLastOnesAreWhole) {
+TEST_F(LogClockTest, LinesAreWholeUpToTheLastInstants) {
     const struct {
         const char* zone;
         long long seconds;

@@ -66,7 +66,7 @@ bool nothingIsReopened(const Files& before, const std::string& log) {
 
 }  // namespace
 
-TEST(LogClosedDescriptorsTest, TheStatusIsTheUsualOneAndEveryLineIsWhole) {
+TEST(LogClosedDescriptorsTest, TheExitStatusIsUnchangedAndEveryLineIsWhole) {
     for (unsigned closed = 0; closed < 8; ++closed) {
         const TempDir dir;
         writeFile(dir.file("log.cfg"),

@@ -55,7 +55,7 @@ Logger& diskLogger(const std::string& file, const std::string& reports) {
 
 }  // namespace
 
-TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
+TEST(LogDiskFullTest, LostLinesAreReportedAndLoggingContinuesWhenThereIsRoom) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -80,7 +80,7 @@ TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
+TEST(LogDiskFullTest, AnIncompleteLineCountsWithItsWrittenBytes) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -96,7 +96,7 @@ TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
+TEST(LogDiskFullTest, WithoutAnotherAppenderEachLostLineIsReportedOnStandardError) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         int err[2];  // a pipe, which the limit does not concern
@@ -122,7 +122,7 @@ TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
     EXPECT_EQ(0, run.status);
 }
 
-TEST(LogDiskFullTest, ASmallFileSystemFillsUpAndIsCleared) {
+TEST(LogDiskFullTest, LoggingContinuesWhenAFullFileSystemIsCleared) {
     const TempDir dir;
     const ChildRun run = inChild([&dir] {
         if (::unshare(CLONE_NEWNS) != 0 ||

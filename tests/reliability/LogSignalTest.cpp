@@ -112,7 +112,7 @@ TEST(LogSignalTest, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
 }
 
 // There is no reader yet, so the open itself waits while signals arrive.
-TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
+TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsRetried) {
     const TempDir dir;
     const StderrCapture err;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
@@ -141,7 +141,7 @@ TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
 }
 
 // The configuration comes through a pipe, late and in pieces, while signals interrupt the reader.
-TEST(LogSignalTest, AConfigurationThatComesSlowlyIsReadWhole) {
+TEST(LogSignalTest, AConfigurationThatArrivesSlowlyIsReadCompletely) {
     const unsigned LINES = 200;
     const TempDir dir;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
