@@ -108,7 +108,7 @@ private:
         }
     }
 
-    // The value of an option follows in the same word, or is the next word, whatever that is.
+    // The value of an option follows in the same word or is the next word, even if it is an option.
     void take(const Words& words, const std::optional<std::string>& joined,
               std::optional<std::string>& value) {
         if (joined) {
