@@ -1,8 +1,8 @@
 # quelta_test(NAME SOURCES file... [LIBS target...] [LABELS label...] [DEFINES macro...]
 #             [WRAP function...] [COUNT_ALLOCATIONS])
 #
-# One GoogleTest program per unit. Each case is discovered and runs in a process of its own, so
-# cases share no state and run in any order and in parallel. The test sees private members
+# One GoogleTest program per unit. Each case is discovered and runs in its own process, so cases
+# share no state and run in any order and in parallel. The test sees private members
 # (-fno-access-control). WRAP lists functions whose calls the linker's --wrap redirects to
 # tests/support/ScriptedLibc.h, or to a __wrap_ function that the test defines. COUNT_ALLOCATIONS
 # adds the operator new of tests/support/AllocationProbe.h.
