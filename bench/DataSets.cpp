@@ -9,7 +9,7 @@
 namespace bench {
 namespace {
 
-// The generator state that a process finds when it never seeds.
+// The initial state of random() in a process that never seeds it.
 void rewindRandom() {
     ::srandom(1);
 }
@@ -114,7 +114,7 @@ PatternSet urlSet(std::size_t count) {
     for (int term = 0; term < 64; ++term) {
         std::string base = set.patterns[pick(generator, set.patterns.size())];
         base.pop_back();
-        // Every fourth term leaves the known prefixes in its last character.
+        // Every fourth term differs from the known prefixes in its last character.
         base.back() = term % 4 == 0 ? '-' : '/';
         set.terms.push_back(base + word(generator, 4) +
                             ".html?session=" + std::to_string(pick(generator, 1000000)));
@@ -127,7 +127,7 @@ PatternSet shortTermSet(std::size_t count, std::size_t terms) {
     std::set<std::string> distinct;
     while (distinct.size() < count) {
         std::string pattern = shortPattern(generator);
-        // Two syllables run out of combinations; a third keeps the set growing.
+        // Two syllables do not give enough combinations, so some words have a third.
         if (!distinct.insert(pattern).second) {
             distinct.insert(word(generator, 1) + pattern);
         }

@@ -60,7 +60,7 @@ void fail(const std::string& message) {
 
 }  // namespace bench
 
-// The defaults of a run precede the given flags, so that those win.
+// The defaults precede the given flags, because the last value of a flag counts.
 int main(int argc, char** argv) {
     bench::programName = argv[0];
     if (const std::size_t slash = bench::programName.rfind('/'); slash != std::string::npos) {

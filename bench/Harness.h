@@ -1,19 +1,19 @@
 #ifndef QUELTA_BENCH_HARNESS_H_
 #define QUELTA_BENCH_HARNESS_H_
 
-// The frame of every benchmark program: its main, the defaults of a run and the progress line on
-// standard error.
+// What every benchmark program shares: main, the default flags and the progress line on standard
+// error.
 //
-// A program hands its registering function to a static Suite; main parses the flags and calls it.
-// The function calls add() once for each topic ("what is measured") and peer ("by whom"), so that
-// bench/report.py can compare the peers of one topic:
+// A program passes its registration function to a static Suite; main parses the flags and calls it.
+// The function calls add() once for each topic (what is measured) and peer (the implementation that
+// is measured), so that bench/report.py can compare the peers of one topic:
 //
 //     const bench::Suite suite([] {
 //         bench::add("single match", "fnmatch", [](benchmark::State& state) { ... })->Arg(100);
 //     });
 //
-// Repetitions of all peers of a program are interleaved at random, so that a slow moment of the
-// machine does not affect one of them alone.
+// Repetitions of all peers of a program are interleaved at random, so that a short slowdown of the
+// machine does not affect only one of them.
 //
 // Not thread-safe; registration and reporting run in the main thread.
 
@@ -34,14 +34,14 @@ public:
 };
 
 // Adds the benchmark "topic/peer". Times are in nanoseconds; sizes are given with Arg(), threads
-// with Threads(). A peer that takes no part says why with State::SkipWithError.
+// with Threads(). A peer that cannot run calls State::SkipWithError with the reason.
 benchmark::internal::Benchmark* add(const std::string& topic, const std::string& peer,
                                     std::function<void(benchmark::State&)> body);
 
-// Prints on standard error what runs now.
+// Prints the name of the running benchmark on standard error.
 void progress(const std::string& what);
 
-// Ends the program with a message: a wrong result must not be timed.
+// Ends the program with a message, because timing a wrong result is useless.
 [[noreturn]] void fail(const std::string& message);
 
 }  // namespace bench

@@ -1,11 +1,12 @@
 #ifndef QUELTA_BENCH_LOGPEER_H_
 #define QUELTA_BENCH_LOGPEER_H_
 
-// What every logger of the benchmarks offers: one logger named "bench" at level INFO with one file
-// that rotates at 25 MB, keeps five backups and holds each line when the call returns. Each peer is
-// one file below peers/ that adds itself to the list with a static registrar.
+// The interface of every logger in the benchmarks: one logger named "bench" at level INFO. Its one
+// file rotates at 25 MB and keeps five backups. Each line is in the file when the call returns.
+// Each peer is one file below peers/ that adds itself to the list through a static registrar.
 //
-// open and close run in one thread; lines and suppressed in any number at once between them.
+// One thread calls open and close. Between them any number of threads may call lines and
+// suppressed.
 
 #include <cstddef>
 #include <memory>
@@ -21,8 +22,8 @@ enum class Layout { PLAIN, DATE };
 constexpr long ROTATE_BYTES = 25000000;
 constexpr int BACKUPS = 5;
 
-// The message of the n-th line is "request n of client 10.0.0.7 served in 42 ms", put together by
-// the logger's own means.
+// The message of the n-th line is "request n of client 10.0.0.7 served in 42 ms", formatted with
+// the logger's own functions.
 #define QUELTA_BENCH_CLIENT "10.0.0.7"
 constexpr int BENCH_MILLISECONDS = 42;
 
@@ -30,17 +31,17 @@ class LogPeer {
 public:
     virtual ~LogPeer() = default;
 
-    // Directs the lines to directory/bench.log, appending to what is there.
+    // Appends the lines to directory/bench.log.
     virtual void open(const std::string& directory, Layout layout) = 0;
 
     // Writes the lines first, first + 1, ... (`count` of them) at level INFO.
     virtual void lines(std::size_t first, std::size_t count) = 0;
 
-    // The same call `count` times over at level DEBUG, which is below the logger's level.
-    // Returns: false when the peer has no levels.
+    // Logs `count` lines at level DEBUG, which is below the logger's level.
+    // Returns: false if the peer has no levels.
     virtual bool suppressed(std::size_t count) = 0;
 
-    // After this the file may be deleted.
+    // Afterwards the file may be deleted.
     virtual void close() = 0;
 };
 
@@ -54,7 +55,7 @@ inline std::vector<LogPeerEntry>& logPeers() {
     return list;
 }
 
-// Adds a peer at static initialization.
+// Adds a peer during static initialization.
 template <class Implementation>
 class LogRegistrar {
 public:

@@ -1,6 +1,6 @@
-// Log lines: the logger beside the libraries that a user would take instead and beside a bare
-// write of the same bytes, each with a rotating file that holds every line when the call returns.
-// Before a peer is timed, lines of one thread and of four are read back and compared.
+// Log lines: the logger compared with other logging libraries and with a bare write of the same
+// bytes. Each has a rotating file that holds every line when the call returns. Before a peer is
+// timed, lines of one thread and of four threads are read back and checked.
 
 #include <unistd.h>
 
@@ -28,42 +28,42 @@ constexpr std::size_t QUICK_LINES = 24000;
 constexpr std::size_t BATCH = 1000;
 
 // The log files of a run; deleted at the end. QUELTA_BENCH_DIR chooses another file system.
-class WorkFolder {
+class WorkDirectory {
 public:
-    WorkFolder() {
+    WorkDirectory() {
         const char* chosen = ::getenv("QUELTA_BENCH_DIR");
         const fs::path base = chosen != nullptr ? fs::path(chosen) : fs::temp_directory_path();
         _path = base / ("quelta-logbench-" + std::to_string(::getpid()));
         fs::create_directories(_path);
     }
-    WorkFolder(const WorkFolder&) = delete;
-    WorkFolder& operator=(const WorkFolder&) = delete;
-    ~WorkFolder() {
+    WorkDirectory(const WorkDirectory&) = delete;
+    WorkDirectory& operator=(const WorkDirectory&) = delete;
+    ~WorkDirectory() {
         std::error_code ignored;
         fs::remove_all(_path, ignored);
     }
 
     std::string of(const std::string& peer, Layout layout) const {
-        const fs::path folder = _path / (peer + (layout == Layout::PLAIN ? "-plain" : "-date"));
-        fs::create_directories(folder);
-        return folder;
+        const fs::path directory = _path / (peer + (layout == Layout::PLAIN ? "-plain" : "-date"));
+        fs::create_directories(directory);
+        return directory;
     }
 
 private:
     fs::path _path;
 };
 
-const WorkFolder& workFolder() {
-    static const WorkFolder folder;
-    return folder;
+const WorkDirectory& workDirectory() {
+    static const WorkDirectory directory;
+    return directory;
 }
 
 const char* nameOf(Layout layout) {
     return layout == Layout::PLAIN ? "plain" : "date";
 }
 
-void removeBackups(const std::string& folder) {
-    for (const auto& entry : fs::recursive_directory_iterator(folder)) {
+void removeBackups(const std::string& directory) {
+    for (const auto& entry : fs::recursive_directory_iterator(directory)) {
         const std::string name = entry.path().filename();
         if (entry.is_regular_file() && name.rfind("bench.log.", 0) == 0) {
             fs::remove(entry.path());
@@ -71,8 +71,8 @@ void removeBackups(const std::string& folder) {
     }
 }
 
-// The lines that were added to the file behind its first `from` bytes.
-std::vector<std::string> linesBehind(const std::string& file, std::uintmax_t from) {
+// The lines of the file after its first `from` bytes.
+std::vector<std::string> linesAfter(const std::string& file, std::uintmax_t from) {
     std::ifstream in(file);
     in.seekg(static_cast<std::streamoff>(from));
     std::vector<std::string> out;
@@ -82,7 +82,7 @@ std::vector<std::string> linesBehind(const std::string& file, std::uintmax_t fro
     return out;
 }
 
-// Every line is whole and in the form that the layout asks for.
+// Checks that every line is whole and has the form of the layout.
 void checkLines(const std::string& peer, Layout layout, const std::vector<std::string>& lines,
                 std::size_t expected) {
     if (lines.size() != expected) {
@@ -94,7 +94,7 @@ void checkLines(const std::string& peer, Layout layout, const std::vector<std::s
     const std::string date =
         "[0-9]{2}-[0-9]{2}-20[0-9]{2} [0-9]{2}:[0-9]{2}:[0-9]{2}\\.[0-9]{3,6} "
         "(INFO|info)  bench - ";
-    // The category of the plain layout does not show.
+    // The plain layout does not print the category.
     const std::regex form((layout == Layout::DATE ? date : "") + message);
     for (const std::string& line : lines) {
         if (!std::regex_match(line, form)) {
@@ -114,14 +114,14 @@ void writeFrom(LogPeer& peer, int threads, std::size_t linesEach) {
 }
 
 void check(const bench::LogPeerEntry& entry, Layout layout) {
-    const std::string folder = workFolder().of(entry.name, layout);
-    const std::string file = folder + "/bench.log";
+    const std::string directory = workDirectory().of(entry.name, layout);
+    const std::string file = directory + "/bench.log";
     const auto peer = entry.make();
-    peer->open(folder, layout);
+    peer->open(directory, layout);
     for (const int threads : {1, 4}) {
         const std::uintmax_t before = fs::exists(file) ? fs::file_size(file) : 0;
         writeFrom(*peer, threads, 500);
-        checkLines(entry.name, layout, linesBehind(file, before),
+        checkLines(entry.name, layout, linesAfter(file, before),
                    static_cast<std::size_t>(threads) * 500);
     }
     peer->suppressed(3);
@@ -133,15 +133,16 @@ void check(const bench::LogPeerEntry& entry, Layout layout) {
     peer->close();
 }
 
-// One peer object per run, made by the first thread while the others wait at the loop's start.
+// One peer object per run, constructed by the first thread while the others wait at the start of
+// the loop.
 void runLines(benchmark::State& state, const bench::LogPeerEntry& entry, Layout layout) {
     static std::unique_ptr<LogPeer> peer;
     const bool first = state.thread_index() == 0;
     if (first) {
-        const std::string folder = workFolder().of(entry.name, layout);
-        removeBackups(folder);
+        const std::string directory = workDirectory().of(entry.name, layout);
+        removeBackups(directory);
         peer = entry.make();
-        peer->open(folder, layout);
+        peer->open(directory, layout);
     }
     while (state.KeepRunningBatch(BATCH)) {
         peer->lines(1000000, BATCH);
@@ -154,14 +155,14 @@ void runLines(benchmark::State& state, const bench::LogPeerEntry& entry, Layout 
 
 void runSuppressed(benchmark::State& state, const bench::LogPeerEntry& entry) {
     const auto peer = entry.make();
-    peer->open(workFolder().of(entry.name, Layout::DATE), Layout::DATE);
+    peer->open(workDirectory().of(entry.name, Layout::DATE), Layout::DATE);
     while (state.KeepRunningBatch(BATCH)) {
         peer->suppressed(BATCH);
     }
     peer->close();
 }
 
-// The layout alone, without the file: where the time of a line goes.
+// The layout alone, without the file, to show its share of the time for a line.
 void runLayout(benchmark::State& state, const char* pattern) {
     const LogFormat layout(pattern);
     const Logger logger("bench");

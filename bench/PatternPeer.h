@@ -1,10 +1,10 @@
 #ifndef QUELTA_BENCH_PATTERNPEER_H_
 #define QUELTA_BENCH_PATTERNPEER_H_
 
-// What every matcher of the benchmarks offers: a set of `*` patterns that counts how many of them
-// match a term, and a single pattern for one text. Each peer is one file below peers/ that adds
-// itself to the lists with a static registrar, so a library that is not installed is left out by
-// not compiling its file.
+// The interface of every matcher in the benchmarks: a set of `*` patterns that counts how many of
+// them match a term, and a single pattern for one text. Each peer is one file below peers/ that
+// adds itself to the lists through a static registrar. The file of a library that is not installed
+// is not compiled.
 //
 // Not thread-safe.
 
@@ -17,7 +17,7 @@
 
 namespace bench {
 
-// Compiled patterns, asked for one term at a time. The order of calls is build, then the others.
+// Compiled patterns, searched for one term at a time. build is called first.
 class PatternSetPeer {
 public:
     virtual ~PatternSetPeer() = default;
@@ -27,17 +27,17 @@ public:
     virtual std::string build(const std::vector<std::string>& patterns) = 0;
 
     // The number of patterns that match `term`.
-    // Errors: a negative number when the peer gave up.
+    // Errors: a negative number if the peer failed.
     virtual long count(const std::string& term) = 0;
 
-    // True when a lookup leaves its matches in the peer; then forget() takes them out again, and
-    // count() without it finds them there already.
+    // True if a lookup keeps its matches in the peer. forget() removes them; count() without it
+    // finds them already there.
     virtual bool keepsMatches() const { return false; }
     virtual void forget(const std::string&) {}
 
-    // The timed span of the program: starts from an empty result and collects the matches of
-    // `term` in an ordered set.
-    // Returns: the size of that set; negative when the peer does no such thing.
+    // What the program times: clears the result, then collects the matches of `term` in an ordered
+    // set.
+    // Returns: the size of that set; negative if the peer cannot do this.
     virtual long collect(const std::string&) { return -1; }
 };
 
@@ -46,10 +46,10 @@ class SinglePeer {
 public:
     virtual ~SinglePeer() = default;
 
-    // Returns: false when the peer cannot express the pattern.
+    // Returns: false if the peer cannot express the pattern.
     virtual bool compile(const std::string& pattern) = 0;
 
-    // Matches `text` `times` times over.
+    // Matches `text` `times` times.
     // Returns: how often it matched.
     virtual std::size_t match(const std::string& text, std::size_t times) = 0;
 };
@@ -67,7 +67,7 @@ std::vector<PeerEntry<Peer>>& peerList() {
     return list;
 }
 
-// Adds a peer of the kind `Peer` at static initialization.
+// Adds a peer of the type `Peer` during static initialization.
 template <class Peer, class Implementation>
 class Registrar {
 public:
@@ -78,7 +78,7 @@ public:
     }
 };
 
-// The pattern as a regular expression: `star` for each run of stars, all else literal.
+// The pattern as a regular expression: `star` for each run of stars, everything else literal.
 std::string toRegex(const std::string& pattern, const std::string& star);
 
 }  // namespace bench

@@ -1,10 +1,10 @@
-// Sets of patterns: how build time, memory and lookup grow, for the rule network and the matchers
-// that a user would take instead.
+// Sets of patterns: build time, memory and lookup time by size, for the rule network and other
+// matchers.
 //
-// Every measurement builds its peer in a child process, so that memory is the peer's own, a set
-// that a peer cannot hold ends that child only, and no peer inherits another's heap. In the child
-// each answer is compared with a slow matcher before anything but the build is timed. A peer that
-// could not hold a set is not asked for a larger one.
+// Each measurement builds its peer in a child process. So the memory is the peer's alone, no peer
+// inherits another's heap, and a set that is too large ends only that child. The child compares
+// each answer with a slow matcher before it times a lookup. A peer that could not hold a set does
+// not get a larger one.
 
 #include <malloc.h>
 #include <signal.h>
@@ -31,25 +31,25 @@ using bench::PatternSet;
 using bench::PatternSetPeer;
 using Entry = bench::PeerEntry<PatternSetPeer>;
 
-// A child that takes longer than this is ended: the peer cannot hold the set.
+// A child that takes longer than this is killed: the peer cannot hold the set.
 constexpr unsigned CHILD_SECONDS = 60;
 
-// What a child sends back.
+// The results that a child sends to its parent.
 struct Outcome {
     double buildNs;
     double bytes;     // resident memory that the build added
     double spanNs;    // negative: not measured
-    double firstNs;   // the very first lookup, with whatever the peer puts off until then
+    double firstNs;   // the first lookup, with all work that the peer defers until then
     double lookupNs;  // per term, median
-    double missNs;    // of the term that has candidates and no match; negative: no such term
+    double missNs;    // of the term that has candidates but no match; negative: no such term
     double setResetNs;
     double matches;      // over all terms
     double differences;  // pairs of pattern and term where the usual meaning differs
-    char error[160];     // empty when all went well
+    char error[160];     // empty on success
 };
 
-// Processor time of this process in nanoseconds: every peer works in one thread and waits for
-// nothing, and what else the machine does then counts little.
+// Processor time of this process in nanoseconds. Every peer runs in one thread and never waits, so
+// this is less affected by other load than wall time.
 double now() {
     timespec time{};
     ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &time);
@@ -94,7 +94,7 @@ struct Case {
     std::shared_ptr<const Expected> expected;
 };
 
-// Runs `body` over all terms `times` times; nanoseconds per term.
+// Runs `body` over all terms `times` times; returns nanoseconds per term.
 template <class Body>
 double perTerm(const std::vector<std::string>& terms, std::size_t times, const Body& body) {
     const double start = now();
@@ -106,7 +106,7 @@ double perTerm(const std::vector<std::string>& terms, std::size_t times, const B
     return (now() - start) / static_cast<double>(times * terms.size());
 }
 
-// The median of rounds that are long enough not to measure the clock.
+// The median of several rounds, each long enough for the resolution of the clock.
 template <class Body>
 double medianPerTerm(const std::vector<std::string>& terms, const Body& body) {
     constexpr double ROUND_NS = 1e5;
@@ -143,7 +143,7 @@ std::string check(PatternSetPeer& peer, const Case& what, Meaning meaning, Outco
 
 std::string measure(const Entry& entry, const Case& what, Outcome& out) {
     const std::unique_ptr<PatternSetPeer> peer = entry.make();
-    ::malloc_trim(0);  // what the parent freed must not hold the peer unseen
+    ::malloc_trim(0);  // or the peer would use freed memory that is not counted
     const double before = residentBytes();
     double start = now();
     std::string error = peer->build(what.set.patterns);
@@ -189,7 +189,7 @@ std::string measure(const Entry& entry, const Case& what, Outcome& out) {
     return "";
 }
 
-// Four fifths of what the machine has free, so that a huge set fails here instead of swapping.
+// Four fifths of the free memory, so that a huge set fails instead of swapping.
 rlim_t memoryLimit() {
     std::ifstream info("/proc/meminfo");
     std::string key;

@@ -1,5 +1,5 @@
-// The program Rete from start to exit: wall time and peak memory, beside what its random draws
-// alone cost. The printed counts are compared with a slow count before anything is timed.
+// The program Rete from start to exit: wall time and peak memory, compared with the cost of its
+// random draws alone. The printed counts are checked against a slow count first.
 
 #include <fcntl.h>
 #include <spawn.h>
@@ -21,7 +21,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// An installation folder with a logging configuration, for as long as the benchmark runs.
+// An installation directory with a logging configuration, for as long as the benchmark runs.
 class Home {
 public:
     Home() : _path(fs::temp_directory_path() / ("quelta-bench-" + std::to_string(::getpid()))) {
@@ -86,7 +86,7 @@ Run runProgram() {
     return run;
 }
 
-// The report lines as they must be, up to the seconds.
+// The expected report lines, up to the seconds.
 std::string expectedReport() {
     const std::vector<std::string> patterns = bench::programPatterns(bench::PROGRAM_DRAWS);
     std::size_t matches = 0;

@@ -19,7 +19,8 @@ bool referenceMatch(Meaning meaning, std::string_view pattern, std::string_view 
     if (meaning == Meaning::SUFFIX_SEARCH) {
         return oracle::match(pattern, text).matched;
     }
-    // The empty pattern matches every text by the rules of this system, and usually only itself.
+    // By the rules of this system the empty pattern matches every text; usually it matches only the
+    // empty text.
     return pattern.empty() ? text.empty()
                            : oracle::match(pattern, text, oracle::LastSegment::AT_THE_END).matched;
 }

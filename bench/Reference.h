@@ -1,8 +1,8 @@
 #ifndef QUELTA_BENCH_REFERENCE_H_
 #define QUELTA_BENCH_REFERENCE_H_
 
-// The answers of the slow matcher of the tests, against which every peer is checked before it is
-// timed. The libraries give a star its usual meaning, which differs in the last segment; see
+// The results of the tests' slow matcher. Every peer is checked against them before it is timed.
+// The libraries give a star its usual meaning, which differs in the last segment; see
 // support/MatcherOracle.h.
 
 #include <string>
@@ -11,7 +11,7 @@
 
 namespace bench {
 
-// Which of the two meanings a peer has.
+// The two meanings of a star.
 enum class Meaning { SUFFIX_SEARCH, USUAL };
 
 // The literal pieces between the stars, empty ones included: "a**b" gives "a", "", "b".

@@ -1,5 +1,5 @@
-// One pattern against one text: the matcher beside the libraries, and beside what one would write
-// by hand for the form at hand. Each answer is checked against a slow matcher before it is timed.
+// One pattern against one text: the matcher compared with the libraries and with handwritten code
+// for the form of the pattern. Each answer is checked against a slow matcher before it is timed.
 
 #include "DataSets.h"
 #include "Harness.h"
@@ -16,10 +16,10 @@ struct Single {
     std::string text;
 };
 
-// Matches in batches, so that the call through the peer's interface does not count.
+// Matches in batches, so that the virtual call to the peer does not affect the result.
 constexpr std::size_t BATCH = 1000;
 
-// `length` bytes of log-like words, the same each time, that hold no '#'.
+// `length` bytes of log-like words without '#', the same each time.
 std::string line(std::size_t length) {
     const bench::PatternSet words = bench::shortTermSet(10, length);
     std::string text = "GET ";
@@ -30,7 +30,7 @@ std::string line(std::size_t length) {
     return text;
 }
 
-// The text with `piece` written over its bytes at `at`.
+// The text with its bytes at `at` overwritten by `piece`.
 std::string with(std::string text, std::size_t at, const std::string& piece) {
     return text.replace(at, piece.size(), piece);
 }

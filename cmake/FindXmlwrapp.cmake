@@ -1,7 +1,7 @@
 # Finds an installed xmlwrapp: by its own package file first, then by pkg-config.
 #
-# Sets Xmlwrapp_FOUND and Xmlwrapp_SOURCE (where it was found) and makes the imported target
-# Xmlwrapp::Xmlwrapp, which gives <xmlwrapp/node.h> and what to link with it.
+# Sets Xmlwrapp_FOUND and Xmlwrapp_SOURCE (where it was found). Defines the imported target
+# Xmlwrapp::Xmlwrapp, which provides <xmlwrapp/node.h> and the libraries to link.
 find_package(Xmlwrapp CONFIG QUIET)
 if(Xmlwrapp_FOUND)
   set(Xmlwrapp_SOURCE "${Xmlwrapp_CONFIG}")
@@ -36,4 +36,4 @@ if(NOT TARGET Xmlwrapp::Xmlwrapp)
 endif()
 include(FindPackageHandleStandardArgs)
 find_package_handle_standard_args(Xmlwrapp REQUIRED_VARS Xmlwrapp_SOURCE
-  REASON_FAILURE_MESSAGE "neither its package file nor pkg-config knows an installed xmlwrapp")
+  REASON_FAILURE_MESSAGE "neither its package file nor pkg-config finds an installed xmlwrapp")

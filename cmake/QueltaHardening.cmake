@@ -1,4 +1,4 @@
-# quelta_harden(TARGET): the checks a release carries; nothing unless QUELTA_HARDEN is on.
+# quelta_harden(TARGET): adds the hardening flags of a release build if QUELTA_HARDEN is on.
 function(quelta_harden target)
   if(NOT QUELTA_HARDEN)
     return()

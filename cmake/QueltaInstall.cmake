@@ -1,4 +1,4 @@
-# What `cmake --install` lays down, and the Debian package that `cpack` makes of it.
+# The files that `cmake --install` installs, and the Debian package that `cpack` builds from them.
 include(CMakePackageConfigHelpers)
 
 set(quelta_cmake_dir "${CMAKE_INSTALL_LIBDIR}/cmake/quelta")
@@ -39,8 +39,8 @@ endif()
 configure_file(cmake/quelta.pc.in "${PROJECT_BINARY_DIR}/quelta.pc" @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/quelta.pc" DESTINATION "${quelta_pc_dir}")
 
-# Manual pages, and an installation to start from. The prefix that a page names is known only when
-# it is installed, as `cmake --install --prefix` and CPack choose another one.
+# The manual pages and a sample installation. The pages contain the prefix. They are configured
+# during installation, because `cmake --install --prefix` and CPack may change it.
 set(sample "${CMAKE_INSTALL_DATADIR}/quelta/sample")
 set(QUELTA_SAMPLE "${CMAKE_INSTALL_PREFIX}/${sample}")
 install(CODE "
@@ -57,7 +57,7 @@ endforeach()
 install(DIRECTORY sample/ DESTINATION "${sample}")
 install(DIRECTORY DESTINATION "${sample}/etc/myinstall")
 install(DIRECTORY DESTINATION "${sample}/var/log")
-# The README, and what it links to.
+# The README and the files that it links to.
 install(FILES README.md CHANGELOG.md CONTRIBUTING.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs examples DESTINATION "${CMAKE_INSTALL_DOCDIR}"
   FILES_MATCHING REGEX "\\.(md|svg|cpp|cfg|txt)$" PATTERN "CMakeLists.txt" EXCLUDE)
@@ -72,6 +72,6 @@ set(CPACK_STRIP_FILES ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_SECTION utils)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
-# For building against the libraries; the program needs none of them.
+# Needed to build against the libraries, not to run the program.
 set(CPACK_DEBIAN_PACKAGE_SUGGESTS "libpopt-dev, libxml2-dev, pkg-config")
 include(CPack)

@@ -1,4 +1,4 @@
-# quelta_sanitize(TARGET): instruments the target as QUELTA_SANITIZE says; nothing when it is empty.
+# quelta_sanitize(TARGET): adds the sanitizers in QUELTA_SANITIZE to the target, if any.
 function(quelta_sanitize target)
   if(NOT QUELTA_SANITIZE)
     return()

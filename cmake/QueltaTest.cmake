@@ -1,11 +1,11 @@
 # quelta_test(NAME SOURCES file... [LIBS target...] [LABELS label...] [DEFINES macro...]
 #             [WRAP function...] [COUNT_ALLOCATIONS])
 #
-# One GoogleTest program per unit. Each case is discovered and runs in a process of its own, so
-# cases share no state and run in any order and in parallel. The test sees private members
-# (-fno-access-control). WRAP names the functions that go through the linker's --wrap to
-# tests/support/ScriptedLibc.h, or to a __wrap_ function of the test's own. COUNT_ALLOCATIONS adds
-# the operator new of tests/support/AllocationProbe.h.
+# One GoogleTest program per unit. Each case is discovered and runs in its own process, so cases
+# share no state and run in any order and in parallel. The test sees private members
+# (-fno-access-control). WRAP lists functions whose calls the linker's --wrap redirects to
+# tests/support/ScriptedLibc.h, or to a __wrap_ function that the test defines. COUNT_ALLOCATIONS
+# adds the operator new of tests/support/AllocationProbe.h.
 find_package(GTest REQUIRED)
 include(GoogleTest)
 
@@ -24,9 +24,9 @@ function(quelta_test_flags name optimized)
   quelta_sanitize(${name})
 endfunction()
 
-# Half of the time to build the tests would be spent on GoogleTest's headers, so they are
-# precompiled once for each set of flags. The owners are programs because only programs are compiled
-# as position-independent executables, like the tests.
+# GoogleTest's headers would take half of the time to build the tests, so they are precompiled once
+# for each set of flags. The owners are programs because only programs are compiled as
+# position-independent executables, like the tests.
 foreach(variant quick optimized)
   file(CONFIGURE OUTPUT test_headers_${variant}.cpp CONTENT "")
   add_executable(test_headers_${variant} ${CMAKE_CURRENT_BINARY_DIR}/test_headers_${variant}.cpp)
@@ -37,7 +37,7 @@ endforeach()
 quelta_test_flags(test_headers_quick FALSE)
 quelta_test_flags(test_headers_optimized TRUE)
 
-# Without quelta_sanitize: see the source.
+# Not instrumented by a sanitizer; the comment in the source says why.
 add_library(scripted_libc OBJECT ${PROJECT_SOURCE_DIR}/tests/support/ScriptedLibc.cpp)
 set_property(TARGET scripted_libc PROPERTY POSITION_INDEPENDENT_CODE ON)
 target_include_directories(scripted_libc PRIVATE ${PROJECT_SOURCE_DIR}/tests)

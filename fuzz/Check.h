@@ -1,8 +1,8 @@
 #ifndef QUELTA_FUZZ_CHECK_H_
 #define QUELTA_FUZZ_CHECK_H_
 
-// What a fuzz target asserts. A failed check prints both sides with their bytes escaped and aborts,
-// which the fuzzer, and the replay of a corpus, take as a finding.
+// The assertions of a fuzz target. A failed check prints both values with their bytes escaped and
+// aborts, which the fuzzer and the replay program report as a finding.
 // Safe from any thread.
 
 #include <cstdio>
@@ -14,7 +14,7 @@
 
 namespace fuzz {
 
-// Printable characters as they are, everything else as \xHH.
+// Returns the text with everything except printable characters as \xHH.
 inline std::string described(std::string_view text) {
     std::string result = "\"";
     for (const char c : text) {

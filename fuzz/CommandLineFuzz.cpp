@@ -108,7 +108,7 @@ private:
         }
     }
 
-    // A value follows its option in the same word, or is the next word, whatever that is.
+    // The value of an option follows in the same word or is the next word, even if it is an option.
     void take(const Words& words, const std::optional<std::string>& joined,
               std::optional<std::string>& value) {
         if (joined) {
@@ -139,7 +139,7 @@ private:
     std::string _messages;
 };
 
-// Parses the words. Returns: what went to standard error.
+// Parses the words. Returns: what was written to standard error.
 std::string parsed(LoaderInfo& info, const Words& words) {
     std::vector<const char*> argv = {"program"};
     for (const std::string& word : words) {
@@ -160,7 +160,7 @@ std::string parsed(LoaderInfo& info, const Words& words) {
     return messages;
 }
 
-// Frees what a record never frees.
+// Frees the memory that a record never frees.
 void release(LoaderInfo& info) {
     ::poptFreeContext(info._poptContext);
     for (char* const value : {info._poptCommonConfigPath, info._poptHost, info._poptInstallName,

@@ -15,10 +15,10 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     fuzz::FuzzInput input(data, size);
     const fuzz::Stamped stamped(input);
     std::string format = fuzz::withSmallNumbers(input.restOfText()).substr(0, 256);
-    // A brace would end the argument of the layout that the slow renderer is given.
+    // A brace would end the date format in the layout for the slow renderer.
     std::replace(format.begin(), format.end(), '}', ')');
 
-    // Exactly as long as it is, with nothing behind it that a scan too far would find harmless.
+    // An exact-size copy, so that reading past the end is detected.
     const std::vector<char> exact(format.begin(), format.end());
     const LogFormattedDate date(exact.empty() ? nullptr : exact.data(), exact.size());
     CachedTm tm;

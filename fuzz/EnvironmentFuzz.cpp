@@ -20,7 +20,7 @@ namespace {
 
 using fuzz::checkEqual;
 
-// The variables set here. setenv would leak every former value.
+// The variables that this target sets. setenv would leak each previous value.
 std::map<std::string, std::string>& entries() {
     static std::map<std::string, std::string> map;
     return map;
@@ -65,7 +65,7 @@ std::string substituteSlowly(const std::string& text) {
 
 unsigned writtenBack = 0;
 
-// Sets or unsets a variable. Returns: the path that results.
+// Sets or unsets a variable. Returns: the resulting path.
 std::string given(const char* name, const std::string& value) {
     if (value.substr(0, 1) == "!") {
         ::unsetenv(name);

@@ -1,8 +1,8 @@
 #ifndef QUELTA_FUZZ_FUZZINPUT_H_
 #define QUELTA_FUZZ_FUZZINPUT_H_
 
-// The bytes of one input, taken apart into fields. Fields are lines, so that a corpus can be read
-// and written by hand; the last field takes everything that is left, line feeds included.
+// The bytes of one input, split into fields. Fields are lines, so that a corpus can be read and
+// written by hand. The last field is the rest of the input, newlines included.
 // Not thread-safe; one thread at a time per object.
 
 #include <algorithm>
@@ -19,7 +19,7 @@ public:
 
     bool atEnd() const { return _next >= _bytes.size(); }
 
-    // The next line, without its line feed; empty at the end.
+    // The next line, without its newline; empty at the end.
     std::string line() {
         const std::size_t end = std::min(_bytes.find('\n', _next), _bytes.size());
         std::string result = _bytes.substr(std::min(_next, end), end - std::min(_next, end));
@@ -30,7 +30,7 @@ public:
     // The same up to its first NUL, for functions that take NUL-terminated strings.
     std::string lineOfText() { return text(line()); }
 
-    // Everything that is left.
+    // The rest of the input.
     std::string rest() {
         std::string result = _bytes.substr(std::min(_next, _bytes.size()));
         _next = _bytes.size();
@@ -38,8 +38,7 @@ public:
     }
     std::string restOfText() { return text(rest()); }
 
-    // A line as a whole number of either sign within [least, most]: what is no number is `least`,
-    // what lies outside is brought in.
+    // The next line as an integer, clamped to [least, most]; `least` if it is not a number.
     long long lineAsNumber(long long least, long long most) {
         long long number = least;
         try {
@@ -57,7 +56,7 @@ private:
     std::size_t _next = 0;
 };
 
-// Cuts every run of digits to four, so that a width cannot ask for gigabytes.
+// Truncates every run of digits to four, so that a width cannot require gigabytes.
 inline std::string withSmallNumbers(const std::string& pattern) {
     std::string result;
     std::size_t run = 0;

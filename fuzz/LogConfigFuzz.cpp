@@ -1,8 +1,8 @@
 // Logging configurations against the slow reader: the input is the file.
 //
-// In this process the lines are read, and the values of channels applied to channels of its own.
-// The replay also starts logging from the file, in a child, because that happens once per process
-// and opens the files that the configuration names.
+// This process reads the lines and applies the values of channels to separate channels. The replay
+// program also starts logging from the file. It does so in a child, because logging starts once per
+// process and opens the files that the configuration names.
 
 #include <cstdio>
 #include <functional>
@@ -28,8 +28,8 @@ using fuzz::checkEqual;
 
 const char* const HOME = "/home/quelta";
 
-// The layouts of one input. The library keeps every layout that was ever configured, which in a
-// fuzzer would be millions; see the wrapped function below.
+// The layouts of one input. The library keeps every layout that it configures, which would be
+// millions in a fuzzer; see the wrapped function below.
 std::list<LogFormat>& layouts() {
     static std::list<LogFormat> list;
     return list;
@@ -89,7 +89,7 @@ void checkAppenders(const SlowConfig& slow) {
 void checkChannel(const SlowConfig& slow, const std::string& value) {
     LogChannel channel;
     channel.minlevel = NOTICE;
-    channel._appenders = {nullptr};  // what it had before, told from everything that has a name
+    channel._appenders = {nullptr};  // the previous list, which contains no named appender
     const SlowChannel expected = readChannelSlowly(slow, value, NOTICE);
     checkEqual("setConfig", expected.accepted, channel.setConfig(value.c_str()));
     checkEqual("level", expected.level, static_cast<int>(channel.minlevel));
@@ -115,7 +115,7 @@ void checkReader(const SlowConfig& slow, const ConfigReader& reader) {
 }  // namespace
 
 // LogAppender::setAttribute(const std::string&, const char*, const Pathname&) as the linker names
-// it, behind the prefixes of the real and of the wrapped function.
+// it, after the prefix of the real or the wrapped function.
 // clang-format off
 #define QUELTA_SET_ATTRIBUTE(prefix) \
     prefix##__ZN11LogAppender12setAttributeERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEPKcRK8Pathname

@@ -68,7 +68,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     checkMatch(copy, expected, text);
     WildcardMatcher moved(std::move(copy));
     checkMatch(moved, expected, text);
-    copy = matcher;  // the one assignment that starts from nothing: to a matcher moved from
+    copy = matcher;  // assigns to a moved-from matcher
     checkMatch(copy, expected, text);
     checkCompiledForm(copy, pattern);
     return 0;

@@ -1,7 +1,7 @@
-// The rule network against a model that keeps flags and counts in plain maps and looks at every
+// The rule network against a model that keeps flags and counts in plain maps and tries every
 // pattern for every term. Each line is a step: "+Dkeyword" adds a condition to operator D, a digit
-// (a new one unless there are that many), "=term" sets and "-term" resets, '!' resets all, '0'
-// resets, 'x' clears the rules; other lines are nothing.
+// (a new operator if that one does not exist), "=term" sets a term, "-term" resets it, '!' calls
+// resetAll, '0' calls reset and 'x' clears the rules. Other lines are ignored.
 
 #include <algorithm>
 #include <cstdint>
@@ -39,7 +39,7 @@ struct Model {
     };
     struct Condition {
         bool isSet = false;
-        std::vector<std::size_t> operators;  // each once
+        std::vector<std::size_t> operators;  // without duplicates
     };
 
     void add(const std::string& keyword, std::size_t op) {
@@ -70,7 +70,7 @@ struct Model {
         condition.isSet = state;
     }
 
-    // Returns: whether there was a condition to change.
+    // Returns: whether any condition matched.
     bool change(bool state, const std::string& term) {
         bool met = false;
         for (auto& [keyword, condition] : conditions) {
@@ -91,7 +91,7 @@ struct Model {
         }
     }
 
-    // The patterns whose beginning the term begins with, shorter beginnings first.
+    // The patterns whose literal prefix is a prefix of the term, shorter prefixes first.
     Names candidates(const std::string& term) const {
         Names found;
         for (std::size_t length = 0; length <= term.size(); ++length) {
@@ -106,7 +106,7 @@ struct Model {
 
     std::vector<Operator> operators;
     std::map<std::string, Condition> conditions;
-    Names patterns;  // in the order of adding, repeated ones too
+    Names patterns;  // in the order in which they were added, with duplicates
     StringSet everSet;
     StringSet implied;
 };
@@ -151,7 +151,7 @@ private:
         const std::size_t wanted = static_cast<unsigned char>(text[0]) - std::size_t{'0'};
         const std::size_t index = std::min(wanted, _operators.size());
         std::unique_ptr<AndOperator> fresh;
-        std::string implication = "i" + std::to_string(_made);
+        std::string implication = "i" + std::to_string(_created);
         if (index == _operators.size()) {
             fresh = std::make_unique<AndOperator>(nullptr, implication);
         }
@@ -167,7 +167,7 @@ private:
         if (fresh != nullptr) {
             _operators.push_back(fresh.release());
             _model.operators.push_back({implication});
-            ++_made;
+            ++_created;
         }
         _model.add(keyword, index);
     }
@@ -186,7 +186,7 @@ private:
         checkEqual("candidates", _model.candidates(term), patterns);
     }
 
-    // The caller's implications stay.
+    // Keeps the caller's implications.
     void clear() {
         _network.clearRules();
         _operators.clear();
@@ -215,7 +215,7 @@ private:
     RuleSystem::Candidates _candidates;
     StringSet _implied;
     std::vector<AndOperator*> _operators;  // owned by the network
-    unsigned _made = 0;                    // operators ever made; each implies a string of its own
+    unsigned _created = 0;                 // operators created so far; each implies its own string
     Model _model;
 };
 

@@ -1,5 +1,5 @@
 // Numbers and truth values as text: ltoa, getLong, getDouble, toBool and bool2str, against versions
-// that count in 128 bits or work differently.
+// that use 128 bits or another method.
 
 #include <algorithm>
 #include <cctype>
@@ -72,8 +72,8 @@ void checkLtoa(long value) {
     checkLong(expected);
 }
 
-// Whether the text is an optional '-', digits, a fraction and an exponent, which strtod and
-// from_chars read in the same way.
+// Whether the text is an optional '-', digits, a fraction and an exponent. strtod and from_chars
+// read such a text in the same way.
 bool isPlainNumber(const std::string& text) {
     std::size_t at = text.substr(0, 1) == "-" ? 1 : 0;
     const auto digits = [&] {

@@ -1,4 +1,4 @@
-// Path editing against the slow versions: the first line is the path, the rest an element to join.
+// Path editing against the slow versions. The first line is the path, the rest an element to join.
 
 #include <string>
 #include <vector>
@@ -50,7 +50,7 @@ void checkParts(const std::string& path) {
     checkEqual("containsSep", path_oracle::pieces(path).size() > 1, pathname.containsSep());
 }
 
-// The pieces of a list, by the oracle that cuts paths.
+// The pieces of a list, split by the oracle that splits paths.
 void checkList(const std::string& list) {
     std::vector<std::string> expected;
     for (const std::string& piece : path_oracle::pieces(fuzz::FuzzInput::text(list))) {

@@ -1,8 +1,8 @@
-// Runs a fuzz target over the files of a corpus, with any compiler and without a fuzzer.
+// Runs a fuzz target on the files of a corpus, with any compiler and without a fuzzer.
 //
-//     MatcherReplay CORPUS...      files, or folders whose files are taken in name order
+//     MatcherReplay CORPUS...      files, or directories whose files are run in name order
 //
-// A finding ends the process by a signal, behind the name of the file; so does nothing else.
+// Prints the name of each file; only a finding ends the process by a signal.
 
 #include <algorithm>
 #include <cstdint>

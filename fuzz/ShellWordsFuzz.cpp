@@ -1,4 +1,4 @@
-// Shell words: the input as a line to split, and as a path to quote and get back.
+// Shell words: splits the input as a line; quotes it as a path and splits the result again.
 
 #include <string>
 

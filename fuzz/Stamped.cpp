@@ -10,7 +10,7 @@
 #include "util/Logger.h"
 #include "util/internal/LogGlobals.h"
 
-// Processor time stands still, so that "%u" can be compared.
+// Processor time is constant, so that "%u" can be compared.
 extern "C" std::clock_t __wrap_clock();
 extern "C" std::clock_t __wrap_clock() {
     return 123456;

@@ -1,7 +1,7 @@
 #ifndef QUELTA_FUZZ_STAMPED_H_
 #define QUELTA_FUZZ_STAMPED_H_
 
-// A message's level and stamp out of an input, and the line that the slow renderer makes of it.
+// A message's level and stamp, read from an input, and the line that the slow renderer produces.
 // Immutable after construction; safe to share.
 
 #include <optional>
@@ -14,13 +14,13 @@ namespace fuzz {
 
 class Stamped {
 public:
-    // Takes three lines: level, one beyond the last included; seconds, of a signed 32-bit clock;
-    // microseconds. The first object fixes time zone, logging epoch and processor time.
+    // Reads three lines: the level, which may be one past the last; seconds of a signed 32-bit
+    // clock; microseconds. The first object sets the time zone, logging epoch and processor time.
     explicit Stamped(FuzzInput& input);
 
     LogMsgMetadata metadata() const;
 
-    // Returns: nothing when a date is too long for the slow renderer.
+    // Returns: nullopt if a date is too long for the slow renderer.
     std::optional<std::string> rendered(const std::string& pattern,
                                         const std::string& message) const;
 

@@ -7,48 +7,26 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <vector>
 
 #include "Check.h"
 #include "support/SlowConfig.h"
+#include "support/TempDir.h"
 #include "util/LogAppender.h"
 #include "util/LogChannel.h"
 #include "util/Logger.h"
 #include "util/Pathname.h"
 #include "util/internal/LogGlobals.h"
 
-namespace fs = std::filesystem;
-
 namespace {
 
 using fuzz::checkEqual;
 
-class Folder {
-public:
-    Folder() : _path((fs::temp_directory_path() / "quelta-XXXXXX").string()) {
-        fuzz::check("mkdtemp", ::mkdtemp(_path.data()) != nullptr);
-    }
-    ~Folder() {
-        std::error_code ignored;
-        fs::remove_all(_path, ignored);
-    }
-    Folder(const Folder&) = delete;
-    Folder& operator=(const Folder&) = delete;
-
-    const std::string& path() const { return _path; }
-
-private:
-    std::string _path;
-};
-
-bool staysInside(const SlowConfig& slow, const std::string& folder) {
+bool staysInside(const SlowConfig& slow, const std::string& directory) {
     return std::all_of(slow.appenders.begin(), slow.appenders.end(), [&](const auto& entry) {
         const std::string& name = entry.second.fileName;
         return name.empty() ||
-               (name.starts_with(folder + '/') && name.find("..") == std::string::npos);
+               (name.starts_with(directory + '/') && name.find("..") == std::string::npos);
     });
 }
 
@@ -70,7 +48,7 @@ void checkChannel(const SlowChannel& expected, const SlowChannel& inherited,
                std::vector<const void*>(channel._appenders.begin(), channel._appenders.end()));
 }
 
-// What is reported when the file has been read, on the way to standard error.
+// The expected reports on standard error after the file has been read.
 std::string reports(const SlowConfig& slow, const std::string& cfg) {
     std::string all;
     const auto parseError = [&](const SlowConfig::Line& line) {
@@ -97,7 +75,7 @@ std::string reports(const SlowConfig& slow, const std::string& cfg) {
     return all;
 }
 
-// Whether reports reach standard error as bare lines.
+// Whether standard error receives the reports as bare lines.
 bool reportsArePlain(const SlowConfig& slow, const SlowChannel& root) {
     return root.level <= WARN && root.appenders.empty() &&
            slow.appenders.count("rootAppender") == 0 &&
@@ -105,16 +83,12 @@ bool reportsArePlain(const SlowConfig& slow, const SlowChannel& root) {
                         [](const auto& line) { return channelName(line.text) == "Logger"; });
 }
 
-std::string textOf(const std::string& file) {
-    std::ifstream in(file, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), {});
-}
-
-[[noreturn]] void child(const SlowConfig& slow, const std::string& folder, const std::string& cfg) {
+[[noreturn]] void child(const SlowConfig& slow, const std::string& directory,
+                        const std::string& cfg) {
     const int usual = ::dup(STDERR_FILENO);
-    const int err = ::open((folder + "/stderr").c_str(), O_RDWR | O_CREAT | O_APPEND, 0600);
+    const int err = ::open((directory + "/stderr").c_str(), O_RDWR | O_CREAT | O_APPEND, 0600);
     ::dup2(err, STDERR_FILENO);
-    const bool complete = Logger::initialize(Pathname(cfg), Pathname(folder));
+    const bool complete = Logger::initialize(Pathname(cfg), Pathname(directory));
     ::dup2(usual, STDERR_FILENO);
 
     checkEqual("initialize", slow.openComment == 0, complete);
@@ -135,7 +109,7 @@ std::string textOf(const std::string& file) {
     }
     if (reportsArePlain(slow, root)) {
         const std::string expected = reports(slow, cfg);
-        const std::string actual = textOf(folder + "/stderr");
+        const std::string actual = readFile(directory + "/stderr");
         const std::size_t tail = actual.size() - std::min(actual.size(), expected.size());
         checkEqual("reports", expected, actual.substr(tail));
     }
@@ -148,17 +122,17 @@ std::string textOf(const std::string& file) {
 namespace fuzz {
 
 void startLogging(const std::string& contents) {
-    const Folder folder;
-    const SlowConfig slow = readConfigSlowly(contents, folder.path());
-    if (!staysInside(slow, folder.path())) {
+    const TempDir directory;
+    const SlowConfig slow = readConfigSlowly(contents, directory.path());
+    if (!staysInside(slow, directory.path())) {
         return;
     }
-    const std::string cfg = folder.path() + "/log.cfg";
-    std::ofstream(cfg, std::ios::binary) << contents;
+    const std::string cfg = directory.file("log.cfg");
+    writeFile(cfg, contents);
     std::fflush(nullptr);
     const pid_t pid = ::fork();
     if (pid == 0) {
-        child(slow, folder.path(), cfg);
+        child(slow, directory.path(), cfg);
     }
     int status = -1;
     checkEqual("waitpid", pid, ::waitpid(pid, &status, 0));

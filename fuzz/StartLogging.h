@@ -5,9 +5,9 @@
 
 namespace fuzz {
 
-// Starts logging from a configuration, in a child with a folder of its own as the installation, and
+// Starts logging from a configuration, in a child whose installation is a temporary directory, and
 // checks result, channels and reports against the slow reader. A configuration that names a file
-// outside of that folder is left alone.
+// outside this directory is skipped.
 void startLogging(const std::string& contents);
 
 }  // namespace fuzz

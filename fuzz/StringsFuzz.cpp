@@ -1,5 +1,5 @@
-// The string helpers against slow versions. Lines: a text to find, one to replace it; the rest is
-// the text that is searched.
+// The string helpers against slow versions. Lines: the text to find, its replacement; the rest is
+// the text to search.
 
 #include <algorithm>
 #include <cstdio>
@@ -119,8 +119,8 @@ void checkLines(std::string bytes, std::size_t bufSize) {
         ::fmemopen(bytes.data(), bytes.size(), "r"), &std::fclose);
     std::vector<char> buf(bufSize);
     for (std::size_t at = 0; at < bytes.size();) {
-        const std::size_t feed = bytes.find('\n', at);
-        const std::size_t end = feed == std::string::npos ? bytes.size() : feed + 1;
+        const std::size_t newline = bytes.find('\n', at);
+        const std::size_t end = newline == std::string::npos ? bytes.size() : newline + 1;
         const std::string expected = bytes.substr(at, std::min(end - at, bufSize - 2));
         fuzz::check("readLine", readLine(file.get(), buf.data(), static_cast<int>(bufSize)));
         checkEqual("line", expected + std::string(bufSize - expected.size(), '\0'),
@@ -147,7 +147,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     std::string out = "kept";
     getPunct(bytes, out, limit);
     checkEqual("getPunct", "kept" + punctSlowly(bytes, limit), out);
-    // A NUL at the end of the buffer looks like a line that fits, so lines with a NUL are left out.
+    // A NUL at the end of the buffer looks like a line that fits, so lines with a NUL are skipped.
     checkLines(text, 3 + find.size());
     checkEqual("pad", std::string(4 * find.size(), ' '), pad(static_cast<unsigned>(find.size())));
     return 0;

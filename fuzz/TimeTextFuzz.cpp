@@ -12,7 +12,7 @@ namespace {
 
 using fuzz::checkEqual;
 
-// What a conversion stores, written as convertSlowly does.
+// The result of a conversion in the form that convertSlowly returns.
 std::string convert(const std::string& text) {
     unsigned long long msecs = 77;
     unsigned long charCount = 77;

@@ -1,6 +1,6 @@
-// write(2) of the same bytes, ready made: what the system asks for at least. The file rotates like
-// the others', so that it meets the same disk; the descriptor's number never changes, and no lock
-// is taken for a line.
+// write(2) of the same bytes, formatted in advance: the least that the system calls cost. The file
+// rotates like the others', so that the disk load is the same. The descriptor's number never
+// changes, and no lock is taken for a line.
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -32,7 +32,7 @@ public:
                 std::perror("write");
             }
             const long size = _size.fetch_add(length, std::memory_order_relaxed) + length;
-            // Only the line that crosses the limit rotates.
+            // Only the line that crosses the limit rotates the file.
             if (size > bench::ROTATE_BYTES && size - length <= bench::ROTATE_BYTES) {
                 rotate();
             }

@@ -1,4 +1,4 @@
-// fnmatch(3) of the C library: nothing is compiled, each lookup walks all patterns.
+// fnmatch(3) of the C library: nothing is compiled; each lookup tries all patterns.
 
 #include <benchmark/benchmark.h>
 #include <fnmatch.h>

@@ -1,6 +1,6 @@
-// A linear walk with the matching rules of this system over compact storage: every pattern lies in
-// one array of bytes, in order, and each lookup reads the array from end to end. It is what a walk
-// over all patterns can reach at best.
+// A linear walk with the matching rules of this system over compact storage: all patterns are
+// stored in order in one array of bytes, and each lookup reads the whole array. This is the fastest
+// that a walk over all patterns can be.
 
 #include <algorithm>
 #include <cstring>
@@ -33,7 +33,7 @@ public:
     }
 
     long collect(const std::string& term) override {
-        // Two ordered sets, as the network keeps the set conditions and the implications.
+        // Two ordered sets, like those of the network for the set conditions and the implications.
         std::set<std::string> names;
         std::set<std::string> implications;
         walk(term, [&](std::size_t index) {
@@ -79,7 +79,7 @@ private:
         }
     }
 
-    // Matches the pattern at `at` and moves `at` behind it.
+    // Matches the pattern at `at` and moves `at` past it.
     static bool matches(const unsigned char*& at, const char* text, const char* end) {
         const unsigned flags = at[0];
         unsigned segments = at[1];

@@ -28,7 +28,7 @@ public:
         return _code != nullptr && pcre2_jit_compile(_code, PCRE2_JIT_COMPLETE) == 0;
     }
 
-    // The short way past the option checks, which the JIT code offers.
+    // The direct entry to the JIT code, which skips the option checks.
     bool matches(const char* text, std::size_t length, pcre2_match_data* data) const {
         return pcre2_jit_match(_code, reinterpret_cast<PCRE2_SPTR>(text), length, 0, 0, data,
                                nullptr) >= 0;

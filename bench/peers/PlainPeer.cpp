@@ -1,5 +1,5 @@
-// What a program would write by hand when it needs one pattern of one known form: strstr for
-// "*middle*", a comparison of the end for "*end". Other patterns are not expressed.
+// Handwritten code for one pattern of a known form: strstr for "*middle*", a comparison of the end
+// for "*end". It cannot express other patterns.
 
 #include <benchmark/benchmark.h>
 
@@ -33,7 +33,7 @@ private:
     std::string _middle;
 };
 
-// Takes a text without its length, as the matcher does.
+// Takes a NUL-terminated text, as the matcher does.
 class SuffixSingle : public bench::SinglePeer {
 public:
     bool compile(const std::string& pattern) override {

@@ -1,6 +1,6 @@
 // This system's logger, configured from a file as in the program. Logging is configured once in a
-// process, so both layouts are set up by the first open(); the directories are those of the driver:
-// one folder with "plain" or "date" at its end.
+// process, so the first open() sets up both layouts. Their directories are those of
+// LoggerBench.cpp, whose names differ only in the "plain" or "date" at their end.
 
 #include <unistd.h>
 
@@ -19,7 +19,7 @@ namespace {
 Logger plainLogger("bench.plain");
 Logger dateLogger("bench");
 
-// Directory of a layout, and whether it was given already.
+// Configures logging with one appender and one logger for each layout.
 void configure(const std::string& plain, const std::string& date) {
     std::filesystem::create_directories(plain);
     std::filesystem::create_directories(date);

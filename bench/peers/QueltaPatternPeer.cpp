@@ -11,7 +11,7 @@ namespace {
 
 using Pair = std::pair<WildcardMatcher, Conditional*>;
 
-// Each pattern is a condition behind an operator of its own, as in the program.
+// Each pattern is a condition that feeds an operator of its own, as in the program.
 class NetworkSet : public bench::PatternSetPeer {
 public:
     std::string build(const std::vector<std::string>& patterns) override {
@@ -43,7 +43,7 @@ private:
     StringSet _implications;
 };
 
-// The two steps of a lookup without the network behind them: candidates by prefix, then the match.
+// The two steps of a lookup without the network: candidates by prefix, then the match.
 class TrieSet : public bench::PatternSetPeer {
 public:
     std::string build(const std::vector<std::string>& patterns) override {

@@ -8,7 +8,7 @@
 
 namespace {
 
-// What one set may use for its automaton; the default of 8 MB holds next to nothing here.
+// Memory limit in bytes for the automaton of one set; the default of 8 MB is far too small.
 constexpr std::int64_t SET_MEMORY = std::int64_t{1} << 30;
 
 RE2::Options options() {

@@ -15,7 +15,7 @@ const std::string project = PROJECT;
 const std::string sampleRules = project + "/examples/rules.txt";
 const std::string sampleConfig = project + "/examples/own_log.cfg";
 
-// Whether README.md has this text, indented by four spaces like all its input and output.
+// Whether README.md contains this text, indented by four spaces like all its input and output.
 testing::AssertionResult readmeShows(const std::string& text) {
     std::string indented;
     std::istringstream lines(text);

@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: deb_test.sh BUILD-TREE UNIFORM-RANDOM-LIBRARY
-# Makes the Debian package, and installs, runs and removes it under dpkg in a scratch root. Without
-# root's rights it uses fakeroot.
+# Builds the Debian package, then installs, runs and removes it with dpkg in a scratch root. Uses
+# fakeroot when not run as root.
 set -eu
 here=$(CDPATH= cd -- "$(dirname -- "$0")" && pwd)
 build=$1
@@ -25,8 +25,8 @@ set -- "$scratch"/package/quelta_*.deb
 [ $# -eq 1 ] && [ -f "$1" ] || fail "not one package: $*"
 deb=$1
 
-# The scratch root has this machine's list of packages, so that dependencies are checked. It has no
-# file lists, so dpkg warns, which is harmless.
+# The scratch root has this machine's package list, so that dpkg checks dependencies. It has no file
+# lists, so dpkg prints harmless warnings.
 mkdir -p "$root/var/lib/dpkg/info" "$root/var/lib/dpkg/updates"
 cp /var/lib/dpkg/status "$root/var/lib/dpkg/status"
 in_root() {
@@ -49,13 +49,13 @@ home=$scratch/home
 cp -r "$root/usr/share/quelta/sample" "$home"
 status=0
 out=$(env -u QUELTA_HOME "$root/usr/bin/Rete") || status=$?
-[ "$status" -eq 255 ] || fail "Rete ended with $status"
-[ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete said: $out"
+[ "$status" -eq 255 ] || fail "Rete exited with $status"
+[ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete printed: $out"
 # With a random() that always returns 0, a run is short. The library gets a name without blanks,
-# because LD_PRELOAD separates its names by them.
+# because blanks separate the names in LD_PRELOAD.
 ln -s "$uniform_random" "$scratch/random.so"
 out=$(LD_PRELOAD="$scratch/random.so" QUELTA_HOME="$home" "$root/usr/bin/Rete") ||
-    fail "Rete ended with $?"
+    fail "Rete exited with $?"
 expected="Using logging configuration at $home/etc/log-cmdline.cfg.
 1 conditions
 \[\]
@@ -63,7 +63,7 @@ expected="Using logging configuration at $home/etc/log-cmdline.cfg.
 TIME = [01]"
 case $out in
 $expected) ;;
-*) fail "Rete said: $out" ;;
+*) fail "Rete printed: $out" ;;
 esac
 
 grep -q "^cp -r /usr/share/quelta/sample " "$root/usr/share/man/man1/Rete.1" ||

@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: install_test.sh BUILD-TREE CXX [compiler flags]
-# Installs the build tree into a scratch prefix, builds and runs a program with it by CMake and by
-# pkg-config, and configures a project that has the sources in a subdirectory.
+# Installs the build tree under a scratch prefix, builds and runs a program against it with CMake
+# and with pkg-config, and configures a project that includes the sources as a subdirectory.
 set -eu
 build=$1
 cxx=$2
@@ -29,7 +29,7 @@ for link in $(grep -o ']([^)]*)' "$prefix/share/doc/quelta/README.md" | tr -d ']
     [ -e "$prefix/share/doc/quelta/$link" ] || fail "the README links to $link"
 done
 [ ! -d "$here/../../build/docs/html" ] || [ -s "$prefix/share/doc/quelta/api/index.html" ] ||
-    fail "the API reference is built and not installed"
+    fail "the API reference is built but not installed"
 for directory in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
     [ -d "$prefix/$directory" ] || fail "missing: $directory"
 done
@@ -37,28 +37,28 @@ done
 grep -q "^cp -r $prefix/share/quelta/sample " "$prefix/share/man/man1/Rete.1" ||
     fail "Rete(1) does not name the installed sample"
 
-# What is installed does not depend on the source or the build tree.
+# The installed files must not refer to the source or the build tree.
 source=$(CDPATH= cd -- "$here/../.." && pwd)
 if grep -rIl -e "$source" -e "$build" "$prefix"; then
-    fail "these files name the source or the build tree"
+    fail "these files refer to the source or the build tree"
 fi
 
 status=0
 out=$(env -u QUELTA_HOME "$prefix/bin/Rete") || status=$?
-[ "$status" -eq 255 ] || fail "Rete ended with $status"
-[ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete said: $out"
+[ "$status" -eq 255 ] || fail "Rete exited with $status"
+[ "$out" = "QUELTA_HOME must be set.  Stopping." ] || fail "Rete printed: $out"
 
 expect_consumer() {
     home=$scratch/home-$1
     cp -r "$prefix/share/quelta/sample" "$home"
     echo "category.Consumer=INFO" >>"$home/etc/log-cmdline.cfg"
-    out=$(QUELTA_HOME=$home "$2" -n consumer) || fail "the program built by $1 ended with $?"
+    out=$(QUELTA_HOME=$home "$2" -n consumer) || fail "the program built with $1 exited with $?"
     expected="Using logging configuration at $home/etc/log-cmdline.cfg.
 consumer settings
 it fired"
-    [ "$out" = "$expected" ] || fail "the program built by $1 said: $out"
+    [ "$out" = "$expected" ] || fail "the program built with $1 printed: $out"
     grep -q 'INFO  Consumer - logged by consumer$' "$home/var/log/cmdline.log" ||
-        fail "the program built by $1 did not log"
+        fail "the program built with $1 did not log"
 }
 
 cmake -S "$here/consumer" -B "$scratch/consumer" -DCMAKE_PREFIX_PATH="$prefix" \
@@ -82,7 +82,7 @@ add_subdirectory("$source" quelta)
 add_executable(consumer "$here/consumer/consumer.cpp")
 target_link_libraries(consumer PRIVATE quelta::rete quelta::loader quelta::util)
 if(TARGET rule_console OR TARGET ReteTest)
-  message(FATAL_ERROR "a parent is made to build examples or tests")
+  message(FATAL_ERROR "examples or tests are built for a parent project")
 endif()
 END
 cmake -S "$scratch/parent" -B "$scratch/parent/build" -DCMAKE_CXX_COMPILER="$cxx" \

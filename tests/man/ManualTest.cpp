@@ -1,5 +1,5 @@
-// The examples in the manual page of the configuration file: each part of a file is read without a
-// report, each pattern prints what the page shows, and so does the file with mistakes.
+// The examples in the manual page of the configuration file. Each part of a file is read without a
+// report. Each pattern and the file with mistakes print what the page shows.
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -32,8 +32,8 @@ std::string replaced(std::string text, const std::string& what, const std::strin
     return text;
 }
 
-// The text between each `begin` line and the next `end` line, with the escapes that it needs in the
-// page's source undone.
+// The text between each `begin` line and the next `end` line, without the escapes of the page's
+// source.
 std::vector<std::string> blocks(const std::string& begin, const std::string& end) {
     std::istringstream page(readFile(MANUAL));
     std::vector<std::string> found;
@@ -51,7 +51,7 @@ std::vector<std::string> blocks(const std::string& begin, const std::string& end
     return found;
 }
 
-// An example is lines of the file, or "PATTERN   OUTPUT".
+// An example is either lines of the file or "PATTERN OUTPUT".
 bool showsPattern(const std::string& line) {
     return line.find('%') < line.find('=');
 }
@@ -118,7 +118,7 @@ TEST(ManualTest, ExamplesOfPatternsRenderAsShown) {
     EXPECT_LE(20U, examples.size());
 }
 
-TEST(ManualTest, ExamplesOfTheFileAreReadWithoutComplaint) {
+TEST(ManualTest, ExamplesOfTheFileAreReadWithoutAReport) {
     std::string all;
     for (const std::string& block : configurations()) {
         all += block;
@@ -167,7 +167,7 @@ TEST(ManualTest, BadFileIsReportedAsShown) {
     EXPECT_EQ(shown[1], run.err);
 }
 
-TEST(ManualTest, SampleConfigurationIsReadWithoutComplaint) {
+TEST(ManualTest, SampleConfigurationIsReadWithoutAReport) {
     const TempDir home;
     std::filesystem::create_directories(home.file("var/log"));
     const ChildRun run = inChild([&] {

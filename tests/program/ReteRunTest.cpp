@@ -1,5 +1,5 @@
-// The built program from start-up to its exit status. A random() that draws nothing but 0 makes all
-// of its patterns the same, so a whole run takes a moment and always reports the same.
+// The built program from start-up to its exit status. A random() that always returns 0 makes all
+// patterns equal, so that a run is short and its report is always the same.
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -21,7 +21,7 @@ std::string announcement(const std::string& home) {
     return "Using logging configuration at " + home + "/etc/log-cmdline.cfg.\n";
 }
 
-// The seconds may turn in the very moment of the timed span.
+// The clock may tick over during the timed span.
 std::string withoutTime(std::string output) {
     const std::size_t time = output.rfind("TIME = 1\n");
     return time == std::string::npos ? output : output.replace(time, 9, "TIME = 0\n");
@@ -32,7 +32,7 @@ protected:
     ReteRunTest() : _home(_dir.file("home")) {
         std::filesystem::create_directories(_home + "/etc");
         std::filesystem::permissions(_dir.path(), std::filesystem::perms{0755});
-        // Beside the test, where a user without rights can load it.
+        // In the test's directory, where an unprivileged user can load it.
         std::filesystem::copy(UNIFORM_RANDOM, _dir.file("random.so"));
     }
 
@@ -49,7 +49,7 @@ protected:
     std::string config() const { return _home + "/etc/log-cmdline.cfg"; }
     std::string log() const { return _home + "/log"; }
 
-    // Compares all that a run left with what it ought to leave.
+    // Compares the exit status and both outputs of a run with the expected ones.
     static void expectRun(const Program& program, int status, const std::string& out,
                           const std::string& err) {
         const ProgramRun run = program.run();
@@ -74,45 +74,45 @@ TEST_F(ReteRunTest, AnnouncesItsConfigurationAndReports) {
     EXPECT_EQ("", readFile(log()));
 }
 
-// Instrumented, a run takes half a minute; there the one above has to do.
+// With a sanitizer a run takes half a minute, so only the cases above run then.
 #ifndef QUELTA_SANITIZED
 
-TEST_F(ReteRunTest, TakesARelativeInstallationFromWhereItRuns) {
+TEST_F(ReteRunTest, ARelativeInstallationIsBelowTheWorkingDirectory) {
     writeFile(config(), "rootCategory=A\nappender.A.fileName=${QUELTA_HOME}/log\nbad\n");
     expectRun(reteWithoutHome().set("QUELTA_HOME", "home").in(_dir.path()), 0,
               announcement("home") + report, "");
     EXPECT_EQ("home/etc/log-cmdline.cfg:3: Parse error at \"bad\"\n", readFile(log()));
 }
 
-TEST_F(ReteRunTest, CleansDoubledAndTrailingSeparators) {
+TEST_F(ReteRunTest, RemovesDoubledAndTrailingSeparators) {
     writeFile(config(), "");
     const std::string untidy = '/' + _dir.path() + "//home///";
     expectRun(reteWithoutHome().set("QUELTA_HOME", untidy), 0, announcement(_home) + report, "");
 }
 
-TEST_F(ReteRunTest, LooksAtNoArguments) {
+TEST_F(ReteRunTest, IgnoresItsArguments) {
     writeFile(config(), "");
     expectRun(rete().arg("--help").arg("--unknown").arg("-c").arg("other").arg("-p").arg("x"), 0,
               announcement(_home) + report, "");
 }
 
-TEST_F(ReteRunTest, GoesOnWithoutConfiguration) {
+TEST_F(ReteRunTest, ContinuesWithoutConfiguration) {
     expectRun(
         rete(), 0, announcement(_home) + report,
         "Couldn't open log file configuration \"" + config() + "\": No such file or directory\n");
 }
 
-TEST_F(ReteRunTest, GoesOnWithoutAnInstallationWhereTheVariablePoints) {
+TEST_F(ReteRunTest, ContinuesWhenTheInstallationDoesNotExist) {
     std::filesystem::remove_all(_home);
     expectRun(
         rete(), 0, announcement(_home) + report,
         "Couldn't open log file configuration \"" + config() + "\": No such file or directory\n");
 }
 
-TEST_F(ReteRunTest, GoesOnWhenTheConfigurationIsUnreadable) {
+TEST_F(ReteRunTest, ContinuesWhenTheConfigurationIsUnreadable) {
     writeFile(config(), "rootCategory=DEBUG\n");
     ::chmod(config().c_str(), 0000);
-    // Where coverage is measured, its counters cannot be written by a user without rights.
+    // In a coverage build, an unprivileged user cannot write the usual counter files.
     std::filesystem::create_directory(_dir.file("counters"));
     ::chmod(_dir.file("counters").c_str(), 0777);
     expectRun(rete().set("GCOV_PREFIX", _dir.file("counters")).withoutRights(), 0,
@@ -144,9 +144,9 @@ TEST_F(ReteRunTest, ReportsEachBadLineOfTheConfiguration) {
 }
 
 TEST_F(ReteRunTest, ReportsALogFileThatCannotBeOpened) {
-    writeFile(config(), "rootCategory=WARN,A\nappender.A.fileName=${QUELTA_HOME}/gone/log\n");
+    writeFile(config(), "rootCategory=WARN,A\nappender.A.fileName=${QUELTA_HOME}/missing/log\n");
     expectRun(rete(), 0, announcement(_home) + report,
-              "ERROR - Error opening \"" + _home + "/gone/log\": No such file or directory\n");
+              "ERROR - Error opening \"" + _home + "/missing/log\": No such file or directory\n");
 }
 
 TEST_F(ReteRunTest, RunsWithStandardOutputClosed) {
@@ -161,14 +161,14 @@ TEST_F(ReteRunTest, RunsWithStandardOutputFull) {
 }
 
 // With the library's own random numbers. The patterns need more than four times this memory.
-TEST_F(ReteRunTest, EndsInTheAllocationExceptionWhenMemoryRunsOut) {
+TEST_F(ReteRunTest, AbortsWithBadAllocWhenMemoryRunsOut) {
     writeFile(config(), "");
     Program real(RETE);
     ProgramRun run = real.set("QUELTA_HOME", _home).memoryLimit(256UL << 20).run();
     EXPECT_EQ(128 + SIGABRT, run.status);
-    // What was not written out yet is lost in the abort.
+    // abort() does not flush the buffered output.
     EXPECT_EQ("", run.out);
-    // Too little may be left to write the name of the exception out.
+    // There may be too little memory left to demangle the name of the exception.
     const std::size_t mangled = run.err.find("St9bad_alloc");
     if (mangled != std::string::npos) {
         run.err.replace(mangled, 12, "std::bad_alloc");

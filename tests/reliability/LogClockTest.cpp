@@ -1,4 +1,4 @@
-// Clocks that are set while a process logs, time zones that change, and instants far away.
+// Clock and time zone changes while a process logs, and extreme times.
 
 #include <gtest/gtest.h>
 #include <sys/time.h>
@@ -24,7 +24,7 @@ namespace {
 constexpr long long HOUR = 3600;
 constexpr long long START = 1700000000;
 
-// What the clock of this process shows.
+// The time that the replaced clock returns.
 struct timeval clockShows {};
 
 void setClock(long long seconds, long microseconds = 0) {
@@ -43,7 +43,7 @@ std::string localTime() {
     return text;
 }
 
-// A logger whose lines, dated by the clock, go to a file.
+// A logger that writes lines with the date to a file.
 class LogClockTest : public testing::Test {
 protected:
     const Replacement<std::function<int(struct timeval*, void*)>> _clock{
@@ -61,8 +61,8 @@ protected:
         _logger._channel = &_channel;
     }
 
-    // Logs a line at a moment.
-    // Returns: what it has to be in the file.
+    // Logs a line at the given time.
+    // Returns: the expected line in the file.
     std::string line(const std::string& text, long long seconds, long microseconds = 0) {
         setClock(seconds, microseconds);
         const std::string expected = localTime() + " " + text + "\n";
@@ -81,7 +81,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
+TEST_F(LogClockTest, AfterStepsByHoursEveryLineIsWholeAndStampedByTheClock) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     _log._maxSize = 2000;
     _log._maxBackupIndex = 10000;
@@ -98,9 +98,9 @@ TEST_F(LogClockTest, StepsByHoursLeaveEveryLineWholeAndStampedByTheClock) {
     EXPECT_EQ("", _err.text());
 }
 
-// A clock that was set says nothing about the time since the last check: both directions count as
-// a long one.
-TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
+// After a clock step the time since the last check is unknown, so a step in either direction causes
+// a check.
+TEST_F(LogClockTest, AStepByHoursCausesACheckOfTheFile) {
     for (const long long step : {HOUR, -HOUR, 12 * HOUR, -12 * HOUR, 9000 * HOUR, -9000 * HOUR}) {
         line("before", START);
         const std::string moved = _file + ".moved";
@@ -116,8 +116,8 @@ TEST_F(LogClockTest, AStepByHoursLeadsToACheckOfTheFile) {
     EXPECT_EQ("", _err.text());
 }
 
-// The C library decides when it looks at TZ; a line is stamped by the zone that it has then.
-TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
+// The C library decides when it reads TZ; a line is stamped in the zone that the library uses then.
+TEST_F(LogClockTest, ATimeZoneChangeTakesEffectAsInTheCLibrary) {
     const TimeZone utc("UTC0");
     std::string expected = line("in Greenwich", START);
     EXPECT_EQ("2023-11-14 22:13:20,000 in Greenwich\n", expected);
@@ -138,7 +138,7 @@ TEST_F(LogClockTest, AZoneThatChangesIsFollowedAsTheLibraryDoes) {
     EXPECT_EQ("", _err.text());
 }
 
-TEST_F(LogClockTest, InstantsUpToTheLastOnesAreWhole) {
+TEST_F(LogClockTest, LinesAreWholeUpToTheLastInstants) {
     const struct {
         const char* zone;
         long long seconds;

@@ -1,4 +1,4 @@
-// Descriptors 0, 1 and 2 closed at the start, in every combination.
+// Logging in a process that starts with any of the descriptors 0, 1 and 2 closed.
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -32,8 +32,8 @@ Files filesOfStandardDescriptors() {
     return files;
 }
 
-// Whether descriptors that were open are as they were, and of those that were closed at most the
-// first has come into use, for the log: nothing is opened in their place.
+// Whether open descriptors are unchanged and closed ones are still closed, except that the first of
+// them may now be the log file.
 bool nothingIsReopened(const Files& before, const std::string& log) {
     const Files now = filesOfStandardDescriptors();
     Files expected = before;
@@ -45,7 +45,7 @@ bool nothingIsReopened(const Files& before, const std::string& log) {
     return now == expected;
 }
 
-// What a program does: configure, log, say something to people, end.
+// Does what a typical program does: configures logging, logs lines and exits.
 [[noreturn]] void runProgram(const TempDir& dir, unsigned closed) {
     for (int fd = 0; fd < 3; ++fd) {
         if ((closed >> fd & 1U) != 0) {
@@ -66,7 +66,7 @@ bool nothingIsReopened(const Files& before, const std::string& log) {
 
 }  // namespace
 
-TEST(LogClosedDescriptorsTest, TheStatusIsTheUsualOneAndEveryLineIsWhole) {
+TEST(LogClosedDescriptorsTest, TheExitStatusIsUnchangedAndEveryLineIsWhole) {
     for (unsigned closed = 0; closed < 8; ++closed) {
         const TempDir dir;
         writeFile(dir.file("log.cfg"),

@@ -1,7 +1,7 @@
-// A process that logs is killed at random moments: QUELTA_KILLS asks for more of them.
+// Kills a logging process at random moments. QUELTA_KILLS sets the number of kills.
 //
-// The child acknowledges each line on a pipe after the call has returned. What was acknowledged
-// must be on disk, once; the line that was under way may be there, whole or in part.
+// The child acknowledges each line on a pipe after the call has returned. Each acknowledged line
+// must be in the file exactly once. The next line may be there too, whole or in part.
 
 #include <gtest/gtest.h>
 #include <sys/wait.h>
@@ -20,7 +20,7 @@
 namespace {
 
 constexpr long long MAX_SIZE = 20000;
-constexpr unsigned KILLS_PER_FOLDER = 20;
+constexpr unsigned KILLS_PER_DIRECTORY = 20;
 
 [[noreturn]] void logUntilKilled(const std::string& file, unsigned round, int acknowledgements) {
     FileAppender log(file, MAX_SIZE, 100000);
@@ -32,8 +32,8 @@ constexpr unsigned KILLS_PER_FOLDER = 20;
     }
 }
 
-// Counts what the child acknowledged; waits for the first one.
-// Returns: false at the end of the pipe.
+// Adds the number of acknowledgements to `count`; waits for at least one.
+// Returns: false at end of file.
 bool readAcknowledgements(int pipe, unsigned& count) {
     char buf[4096];
     const ssize_t got = ::read(pipe, buf, sizeof buf);
@@ -42,7 +42,7 @@ bool readAcknowledgements(int pipe, unsigned& count) {
 }
 
 // Runs one child and kills it `delay` microseconds after its first line.
-// Returns: how many lines it acknowledged.
+// Returns: the number of lines that it acknowledged.
 unsigned linesBeforeTheKill(const std::string& file, unsigned round, unsigned delay) {
     int ends[2];
     EXPECT_EQ(0, ::pipe(ends));
@@ -64,18 +64,19 @@ unsigned linesBeforeTheKill(const std::string& file, unsigned round, unsigned de
     return count;
 }
 
-// Takes the acknowledged lines of a round off the text, then what there is of the next one.
-void takeRound(std::string& text, unsigned round, unsigned acknowledged) {
+// Removes the acknowledged lines of a round from the text, then the next line as far as it was
+// written.
+void removeRound(std::string& text, unsigned round, unsigned acknowledged) {
     std::string expected;
     for (unsigned number = 0; number < acknowledged; ++number) {
         expected += numberedLine(round, number) + "\n";
     }
     ASSERT_EQ(expected, text.substr(0, expected.size())) << "round " << round;
     text.erase(0, expected.size());
-    const std::string under_way = numberedLine(round, acknowledged) + "\n";
+    const std::string interrupted = numberedLine(round, acknowledged) + "\n";
     const std::string following = numberedLine(round + 1, 0) + "\n";
-    std::size_t part = std::min(under_way.size(), text.size());
-    while (part > 0 && !(text.starts_with(under_way.substr(0, part)) &&
+    std::size_t part = std::min(interrupted.size(), text.size());
+    while (part > 0 && !(text.starts_with(interrupted.substr(0, part)) &&
                          (text.size() == part || text.substr(part).starts_with(following)))) {
         --part;
     }
@@ -93,11 +94,11 @@ void killRepeatedly(unsigned kills, std::mt19937& random) {
     std::string text = textOfGenerations(file);
     for (unsigned round = 0; round < kills; ++round) {
         ASSERT_GT(acknowledged[round], 0U);
-        takeRound(text, round, acknowledged[round]);
+        removeRound(text, round, acknowledged[round]);
     }
     EXPECT_EQ("", text);
-    // Each start counted on from the size that it found: no file is beyond its limit by more than
-    // the last line of each of two processes.
+    // Each process starts with the current size of the file, so no file exceeds the limit by more
+    // than the last line of each of two processes.
     for (const std::string& path : generationsOf(file)) {
         EXPECT_LE(std::filesystem::file_size(path), MAX_SIZE + 2 * 120U) << path;
     }
@@ -108,8 +109,8 @@ void killRepeatedly(unsigned kills, std::mt19937& random) {
 TEST(LogCrashTest, AcknowledgedLinesAreOnDiskOnce) {
     std::mt19937 random(20240229);
     const unsigned kills = scaled("QUELTA_KILLS", 20);
-    for (unsigned done = 0; done < kills; done += KILLS_PER_FOLDER) {
-        killRepeatedly(std::min(KILLS_PER_FOLDER, kills - done), random);
+    for (unsigned done = 0; done < kills; done += KILLS_PER_DIRECTORY) {
+        killRepeatedly(std::min(KILLS_PER_DIRECTORY, kills - done), random);
         ASSERT_FALSE(HasFailure()) << "after " << done << " kills";
     }
 }

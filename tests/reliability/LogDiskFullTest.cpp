@@ -1,4 +1,4 @@
-// A full disk, and room again.
+// Logging to a full disk, and after space is available again.
 
 #include <gtest/gtest.h>
 #include <sched.h>
@@ -20,10 +20,10 @@
 
 namespace {
 
-// Ten bytes with its newline.
+// Ten bytes with the newline.
 const std::string LINE = "123456789";
 
-// No file of this process may grow beyond that many bytes.
+// Limits the size of the files that this process writes.
 void limitFileSize(rlim_t bytes) {
     rlimit limit{};
     ASSERT_EQ(0, ::getrlimit(RLIMIT_FSIZE, &limit));
@@ -39,7 +39,7 @@ std::string repeated(const std::string& text, unsigned times) {
     return all;
 }
 
-// The loggers "Disk" and "Logger" on an appender each, in the given files.
+// Configures an appender for each file. "Disk" logs to the first, "Logger" to both. Returns "Disk".
 Logger& diskLogger(const std::string& file, const std::string& reports) {
     for (const auto& [name, path] : {std::pair("disk", file), std::pair("reports", reports)}) {
         LogAppender& appender = *LogAppender::find(name, true);
@@ -55,7 +55,7 @@ Logger& diskLogger(const std::string& file, const std::string& reports) {
 
 }  // namespace
 
-TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
+TEST(LogDiskFullTest, LostLinesAreReportedAndLoggingContinuesWhenThereIsRoom) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -80,7 +80,7 @@ TEST(LogDiskFullTest, LostLinesAreReportedAndTheNextOneGoesOutWhenThereIsRoom) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
+TEST(LogDiskFullTest, AnIncompleteLineCountsWithItsWrittenBytes) {
     const ChildRun run = inChild([] {
         const TempDir dir;
         ::signal(SIGXFSZ, SIG_IGN);
@@ -96,10 +96,10 @@ TEST(LogDiskFullTest, ALineCutShortCountsWithTheBytesThatWentOut) {
     EXPECT_EQ("", run.err);
 }
 
-TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
+TEST(LogDiskFullTest, WithoutAnotherAppenderEachLostLineIsReportedOnStandardError) {
     const ChildRun run = inChild([] {
         const TempDir dir;
-        int err[2];  // a pipe, which the limit does not concern
+        int err[2];  // a pipe, because the limit does not apply to pipes
         ASSERT_EQ(0, ::pipe(err));
         ::dup2(err[1], STDERR_FILENO);
         ::signal(SIGXFSZ, SIG_IGN);
@@ -112,23 +112,23 @@ TEST(LogDiskFullTest, WithoutAnotherAppenderStandardErrorTellsOfEachLostLine) {
         limitFileSize(20);
         log.line(LINE);
         EXPECT_EQ(LINE + "\n" + LINE + "\n", readFile(dir.file("app.log")));
-        char told[1000];
-        const ssize_t length = ::read(err[0], told, sizeof told);
+        char reported[1000];
+        const ssize_t length = ::read(err[0], reported, sizeof reported);
         ASSERT_GT(length, 0);
         const std::string report =
             "Error writing to \"" + dir.file("app.log") + "\": File too large\n";
-        EXPECT_EQ(repeated(report, 2), std::string(told, static_cast<std::size_t>(length)));
+        EXPECT_EQ(repeated(report, 2), std::string(reported, static_cast<std::size_t>(length)));
     });
     EXPECT_EQ(0, run.status);
 }
 
-TEST(LogDiskFullTest, ASmallFileSystemFillsUpAndIsCleared) {
+TEST(LogDiskFullTest, LoggingContinuesWhenAFullFileSystemIsCleared) {
     const TempDir dir;
     const ChildRun run = inChild([&dir] {
         if (::unshare(CLONE_NEWNS) != 0 ||
             ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
             ::mount("none", dir.path().c_str(), "tmpfs", 0, "size=64k") != 0) {
-            GTEST_SKIP() << "mounting is not allowed here; the limit on file sizes stands in";
+            GTEST_SKIP() << "mounting is not allowed here; the cases with a file size limit remain";
         }
         writeFile(dir.file("ballast"), std::string(40000, 'x'));
         FileAppender log(dir.file("app.log"), 8000, 100);

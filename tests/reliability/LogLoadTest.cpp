@@ -1,4 +1,4 @@
-// Many threads, many lines: QUELTA_LOAD_LINES asks for more lines for each thread.
+// Many threads log many lines. QUELTA_LOAD_LINES sets the number of lines for each thread.
 
 #include <gtest/gtest.h>
 

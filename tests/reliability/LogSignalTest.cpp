@@ -1,4 +1,4 @@
-// Signals that interrupt system calls all the time.
+// Logging while signals keep interrupting system calls.
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -26,7 +26,8 @@ void countSignal(int) {
     ++signals;
 }
 
-// SIGALRM every fifty microseconds while the object lives; calls that it meets fail with EINTR.
+// Sends SIGALRM every fifty microseconds while the object exists. Interrupted calls fail with
+// EINTR.
 class SignalStorm {
 public:
     SignalStorm() {
@@ -50,7 +51,7 @@ private:
     }
 };
 
-// Signals are for the other thread.
+// Blocks signals in this thread, so that the other thread receives them.
 void blockSignals() {
     sigset_t all;
     sigfillset(&all);
@@ -111,8 +112,8 @@ TEST(LogSignalTest, LongLinesPassWholeThroughAPipeThatIsAlmostAlwaysFull) {
     EXPECT_EQ("", err.text());
 }
 
-// There is no reader yet, so the open itself waits while signals arrive.
-TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
+// There is no reader yet, so open() waits while signals arrive.
+TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsRetried) {
     const TempDir dir;
     const StderrCapture err;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
@@ -140,12 +141,12 @@ TEST(LogSignalTest, AnOpenThatWaitsForAReaderIsNotGivenUp) {
     EXPECT_EQ("", err.text());
 }
 
-// The configuration comes through a pipe, late and in pieces, while signals interrupt the reader.
-TEST(LogSignalTest, AConfigurationThatComesSlowlyIsReadWhole) {
+// The configuration arrives through a pipe, late and in pieces, while signals interrupt the reader.
+TEST(LogSignalTest, AConfigurationThatArrivesSlowlyIsReadCompletely) {
     const unsigned LINES = 200;
     const TempDir dir;
     ASSERT_EQ(0, ::mkfifo(dir.file("pipe").c_str(), 0600));
-    // Some names are longer than what is read at once.
+    // Some names are longer than one read.
     const auto nameOf = [](unsigned i) {
         return std::string(i % 10 * 20, 'n') + std::to_string(i);
     };

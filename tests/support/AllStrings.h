@@ -6,9 +6,9 @@
 #include <cstddef>
 #include <string>
 
-// Calls `visit(text)` for each string of at most `maxLength` characters of the alphabet, each once,
-// the empty one first.
-// Returns: how many there were.
+// Calls `visit(text)` once for each string of at most `maxLength` characters of the alphabet, the
+// empty one first.
+// Returns: the number of strings.
 template <typename Visit>
 std::size_t forEachString(const std::string& alphabet, std::size_t maxLength, Visit visit,
                           const std::string& prefix = std::string()) {

@@ -1,16 +1,15 @@
 #ifndef QUELTA_TESTS_SUPPORT_ALLOCATIONPROBE_H_
 #define QUELTA_TESTS_SUPPORT_ALLOCATIONPROBE_H_
 
-// Counts the allocations that the current thread makes through operator new while a probe lives,
-// and makes a chosen one fail, or all that are too large. A program that uses it has
-// COUNT_ALLOCATIONS in its quelta_test.
+// Counts the calls of operator new by the current thread while a probe exists. It can make one of
+// them fail, or all above a size. A program that uses it has COUNT_ALLOCATIONS in its quelta_test.
 //
 //     REQUIRE_ALLOCATION_PROBE();  // first in the case
-//     AllocationProbe probe(3);    // the third allocation from here on throws std::bad_alloc
+//     AllocationProbe probe(3);    // the third allocation from now on throws std::bad_alloc
 //     ...
 //     EXPECT_EQ(0, probe.live());
 //
-// Not thread-safe; one probe at a time, used by the thread that made it.
+// Not thread-safe; one probe at a time, used by the thread that constructed it.
 
 #include <gtest/gtest.h>
 
@@ -19,7 +18,7 @@
 
 class AllocationProbe {
 public:
-    // Counts; the `failing`th allocation, counted from 1, fails. 0: none does.
+    // Starts counting. The `failing`th allocation, counted from 1, fails; 0: none.
     explicit AllocationProbe(std::size_t failing = 0);
     ~AllocationProbe();
     AllocationProbe(const AllocationProbe&) = delete;
@@ -27,18 +26,18 @@ public:
 
     // Makes every allocation of more than `bytes` bytes fail, too.
     void refuseBeyond(std::size_t bytes);
-    // Returns: the allocations tried so far, failed ones included.
+    // Returns: the number of allocations so far, including failed ones.
     std::size_t count() const;
-    // Returns: allocations less releases, which is what has leaked once everything is destroyed.
+    // Returns: allocations minus deallocations: the number of leaks once everything is destroyed.
     long live() const;
-    // Stops counting and failing.
+    // Stops counting; allocations no longer fail.
     void stop();
 
-    // False if a program cannot replace operator new: clang's thread sanitizer brings its own.
+    // False if a program cannot replace operator new, because clang's thread sanitizer has its own.
     static bool available();
 };
 
-// What an operation did while one of its allocations failed.
+// The result of an operation during which one allocation failed.
 struct FailedAllocation {
     bool reached = false;  // the operation made that allocation
     bool thrown = false;   // the operation threw std::bad_alloc

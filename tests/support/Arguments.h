@@ -5,7 +5,7 @@
 #include <utility>
 #include <vector>
 
-// The command line of a program called "program". Not copyable: popt keeps a pointer to it.
+// The command line of a program called "program". Not copyable, because popt keeps a pointer to it.
 class Arguments {
 public:
     explicit Arguments(std::vector<std::string> words = {}) : _words(std::move(words)) {

@@ -1,7 +1,7 @@
 #ifndef QUELTA_TESTS_SUPPORT_EXAMPLES_H_
 #define QUELTA_TESTS_SUPPORT_EXAMPLES_H_
 
-// Tables of texts and results, several to a line.
+// Tables of texts and results, several on a line.
 //
 //     expectEach(lowerCase, {"Ab > ab", "x > x"});
 
@@ -12,7 +12,7 @@
 
 using Examples = std::initializer_list<std::string>;
 
-// Each example is an argument of `function` and its result, as texts.
+// Each example is "ARGUMENT > RESULT" of `function`.
 template <typename Function>
 void expectEach(Function function, Examples examples) {
     for (const std::string& example : examples) {

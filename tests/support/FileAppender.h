@@ -1,7 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_FILEAPPENDER_H_
 #define QUELTA_TESTS_SUPPORT_FILEAPPENDER_H_
 
-// An appender for one file, set up as the configuration sets it up, with messages at chosen times.
+// An appender for one file, set up through the same calls as the configuration makes, with messages
+// at chosen times.
 //
 //     FileAppender log(dir.file("app.log"), 100, 2);
 //     log.line("text", 1000);
@@ -16,7 +17,7 @@
 #include "util/Logger.h"
 #include "util/Pathname.h"
 
-// Metadata of a message of the logger "Test" at a number of seconds since the epoch.
+// Metadata of a message of the logger "Test" at a time in seconds since the epoch.
 inline LogMsgMetadata stampedAt(long long seconds, LogLevel level = INFO) {
     static Logger logger("Test");
     LogMsgMetadata mdata(&logger, level);
@@ -38,7 +39,7 @@ public:
     FileAppender(const FileAppender&) = delete;
     FileAppender& operator=(const FileAppender&) = delete;
 
-    // Writes one line, `text` and a newline, at a time in seconds.
+    // Writes `text` and a newline at a time in seconds since the epoch.
     void line(const std::string& text, long long seconds = 1000) {
         write(stampedAt(seconds), text);
     }

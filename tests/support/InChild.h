@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_INCHILD_H_
 #define QUELTA_TESTS_SUPPORT_INCHILD_H_
 
-// Runs the body of a case in a child process, for what can happen only once per process. The child
-// calls exit, so destructors of static objects and leak checks run as in a program.
+// Runs the body of a case in a child process, for operations that work only once per process. The
+// child calls exit, so destructors of static objects and leak checks run as in a program.
 //
 //     const ChildRun run = inChild([&] { EXPECT_TRUE(once()); });
 //     EXPECT_EQ(0, run.status);     // 1: an expectation failed in the child
@@ -21,7 +21,7 @@
 
 struct ChildRun {
     int status = -1;  // exit status; -1 if a signal killed the child
-    std::string err;  // what it wrote to standard error
+    std::string err;  // the text that it wrote to standard error
 };
 
 template <typename Body>

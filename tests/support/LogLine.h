@@ -1,14 +1,14 @@
 #ifndef QUELTA_TESTS_SUPPORT_LOGLINE_H_
 #define QUELTA_TESTS_SUPPORT_LOGLINE_H_
 
-// One line of a layout, for a message with a chosen stamp.
+// One line of a layout for a message with a chosen stamp.
 
 #include <string>
 
 #include "util/LogFormat.h"
 #include "util/LogMsgMetadata.h"
 
-// Metadata stamped at a chosen instant instead of now.
+// Metadata stamped with a chosen time instead of the current one.
 inline LogMsgMetadata stampedAt(const Logger& logger, LogLevel level, long long sec,
                                 long long usec = 0) {
     LogMsgMetadata mdata(&logger, level);

@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_MATCHERORACLE_H_
 #define QUELTA_TESTS_SUPPORT_MATCHERORACLE_H_
 
-// A slow matcher, written from the rules of matching, that tests, fuzz targets and benchmarks
-// compare with. It shares no code and no technique with the real one.
+// A slow matcher, written from the rules of matching, for comparison in tests, fuzz targets and
+// benchmarks. It shares neither code nor algorithm with the real one.
 
 #include <cstddef>
 #include <string>
@@ -16,9 +16,9 @@ struct Match {
     std::vector<std::string> parts;
 };
 
-// Where a last segment that no star follows must be: found by searching from left to right without
-// overlap, which is the rule of this system, or simply at the end of the text, which is the usual
-// meaning of a star. "*aa" does not match "aaa" by the first and does by the second.
+// How to place a last segment that no star follows. By the rule of this system it is searched from
+// left to right without overlap, so "*aa" does not match "aaa". By the usual meaning of a star it
+// must be at the end of the text, so "*aa" matches "aaa".
 enum class LastSegment { SEARCHED, AT_THE_END };
 
 // The literal segments between the stars of a pattern, without the empty ones.

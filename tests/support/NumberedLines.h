@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_NUMBEREDLINES_H_
 #define QUELTA_TESTS_SUPPORT_NUMBEREDLINES_H_
 
-// Lines that show whether they are torn, lost or doubled, and the generations of a log file that
-// should contain them. `scaled` lets a longer run ask for more of them.
+// Numbered lines, to detect torn, lost and duplicated ones, and the generations of the log file
+// that should contain them. `scaled` sets their number for longer runs.
 
 #include <gtest/gtest.h>
 
@@ -16,19 +16,19 @@
 
 #include "support/TempDir.h"
 
-// The number in an environment variable, or the usual one.
+// The number in an environment variable, or the default.
 inline unsigned scaled(const char* variable, unsigned usual) {
     const char* const value = std::getenv(variable);
     return value != nullptr ? static_cast<unsigned>(std::strtoul(value, nullptr, 10)) : usual;
 }
 
-// Text, without a newline, that is computed from its numbers; up to some 110 characters.
+// Text computed from its numbers, without a newline; at most about 110 characters.
 inline std::string numberedLine(unsigned series, unsigned number) {
     return std::to_string(series) + " " + std::to_string(number) + " " +
            std::string(number * 7 % 90, static_cast<char>('a' + series % 26)) + ".";
 }
 
-// The generations of a log file, oldest first; the numbers may have gaps.
+// The generations of a log file, oldest first; their numbers may have gaps.
 inline std::vector<std::string> generationsOf(const std::string& file) {
     const std::filesystem::path base(file);
     std::map<unsigned long, std::string, std::greater<>> found;
@@ -57,7 +57,7 @@ inline std::string textOfGenerations(const std::string& file) {
     return all;
 }
 
-// Expects `count` whole lines of each series, in their order, none missing and none twice.
+// Expects `count` whole lines of each series in order, without gaps and duplicates.
 inline void expectEveryLine(const std::string& text, unsigned series, unsigned count) {
     std::vector<unsigned> next(series, 0);
     std::istringstream in(text);

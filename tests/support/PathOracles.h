@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_PATHORACLES_H_
 #define QUELTA_TESTS_SUPPORT_PATHORACLES_H_
 
-// Slow versions of the path operations, written from their rules one step at a time and without
-// the library, to compare with.
+// Slow versions of the path operations for comparison, written step by step from their rules
+// without the library.
 
 #include <cstddef>
 #include <string>
@@ -136,7 +136,7 @@ inline std::string removeDoubleSeps(std::string path) {
     return path;
 }
 
-// Splits one shell word off: one character at a time, a branch for each state.
+// Removes the first shell word, one character at a time, with a branch for each state.
 inline bool splitArg(const std::string& input, std::string& word, std::string& rest) {
     word.clear();
     std::string line = input;
@@ -177,7 +177,7 @@ inline bool splitArg(const std::string& input, std::string& word, std::string& r
     return true;
 }
 
-// Quotes by trying the ways in turn, each over the whole path.
+// Quotes by trying each way in turn on the whole path.
 inline std::string shellQuoted(const std::string& path) {
     const auto has = [&path](const std::string& characters) {
         return path.find_first_of(characters) != std::string::npos;

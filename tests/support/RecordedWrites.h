@@ -1,17 +1,17 @@
 #ifndef QUELTA_TESTS_SUPPORT_RECORDEDWRITES_H_
 #define QUELTA_TESTS_SUPPORT_RECORDEDWRITES_H_
 
-// Takes the place of LogAppender::write, so that a test sees what reaches which appender, and
-// decides what happens there. The test program wraps the function:
+// Replaces LogAppender::write, so that a test can check which message reaches which appender and
+// run an action for each. The test program wraps the function:
 //     WRAP ${APPENDER_WRITE}       (in its quelta_test)
-// While no object lives, appenders write as they always do.
+// While no object exists, appenders write as usual.
 //
 //     RecordedWrites writes;
 //     logger.info("text");
 //     EXPECT_EQ("INFO Name text\n", writes.text());
 //
-// Included by one source of a program. Not thread-safe to make and destroy; writes may come from
-// any thread, serialised by `_mutex`.
+// Include it in one source of a program. Not thread-safe to construct and destroy; writes may come
+// from any thread, serialised by `_mutex`.
 
 #include <functional>
 #include <mutex>
@@ -34,7 +34,7 @@ public:
     };
     using Action = std::function<void(const Message&)>;
 
-    // `action` runs for each message, after it has been recorded and outside the lock.
+    // Calls `action` for each message after it has been recorded, without holding the lock.
     explicit RecordedWrites(Action action = {}) : _action(std::move(action)) { s_current = this; }
     ~RecordedWrites() { s_current = nullptr; }
     RecordedWrites(const RecordedWrites&) = delete;
@@ -55,7 +55,7 @@ public:
         }
         return result;
     }
-    // The appenders of the messages, in their order.
+    // The appenders of the messages, in order.
     std::vector<const LogAppender*> appenders() const {
         std::vector<const LogAppender*> result;
         for (const Message& message : messages()) {
@@ -74,7 +74,7 @@ public:
         }
     }
 
-    static inline RecordedWrites* s_current = nullptr;  // the one object that lives
+    static inline RecordedWrites* s_current = nullptr;  // the only existing object; null if none
 
 private:
     const Action _action;
@@ -83,7 +83,7 @@ private:
 };
 
 // LogAppender::write(const LogMsgMetadata&, std::string_view) as the linker names it, after the
-// prefixes of the real and of the wrapped function.
+// prefix of the real or the wrapped function.
 // clang-format off
 #define QUELTA_APPENDER_WRITE(prefix) \
     prefix##__ZN11LogAppender5writeERK14LogMsgMetadataSt17basic_string_viewIcSt11char_traitsIcEE

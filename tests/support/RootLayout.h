@@ -1,11 +1,11 @@
 #ifndef QUELTA_TESTS_SUPPORT_ROOTLAYOUT_H_
 #define QUELTA_TESTS_SUPPORT_ROOTLAYOUT_H_
 
-// Gives the root appender another layout while the object lives, so that a message on standard
-// error shows more than its bare text.
+// Gives the root appender another layout while the object exists, so that standard error shows more
+// than the text of a message.
 //
 //     const RootLayout layout("%p %c %m%n");  // WARN Logger text
-// Appenders that are set up meanwhile take the layout over and must not outlive it.
+// Appenders that are set up in the meantime use the same layout and must not outlive it.
 // Configured before other threads start; safe from any thread afterwards.
 
 #include "util/LogAppender.h"

@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_RUNPROGRAM_H_
 #define QUELTA_TESTS_SUPPORT_RUNPROGRAM_H_
 
-// Runs a built program in an environment that the test chooses, and returns its status and both its
-// outputs.
+// Runs a built program in an environment that the test chooses, and returns its exit status and
+// both outputs.
 //
 //     Program program(path);
 //     program.set("QUELTA_HOME", dir.path()).input("a term\n");
@@ -20,7 +20,7 @@
 #include <vector>
 
 struct ProgramRun {
-    int status = -1;  // exit status; 128 and the number of the signal that ended it, as in a shell
+    int status = -1;  // exit status; 128 plus the number of the signal that ended it, as in a shell
     std::string out;
     std::string err;
 };
@@ -33,19 +33,19 @@ public:
     Program& set(const std::string& name, const std::string& value);
     Program& input(const std::string& text);
 
-    // The directory that it runs in; this process's own unless set.
+    // Sets its working directory; the default is that of this process.
     Program& in(const std::string& directory);
     // Writes standard output to this file, or closes it, instead of collecting it.
     Program& outputTo(const std::string& path);
     Program& closeOutput();
 
-    // Limits its address space, in bytes; 0 for no limit.
+    // Limits its address space to a number of bytes; 0: no limit.
     Program& memoryLimit(unsigned long bytes);
-    // Drops root's privileges, if there are any. The program is opened before, so it may be where
-    // that user has no access.
+    // Drops root privileges, if it has them. The program file is opened first, so the unprivileged
+    // user needs no access to it.
     Program& withoutRights();
 
-    // Returns: how it ended. The test fails if it could not be started.
+    // Returns: the result of the run. The test fails if the program could not be started.
     ProgramRun run() const;
 
 private:

@@ -1,12 +1,14 @@
 #ifndef QUELTA_TESTS_SUPPORT_SCRIPTEDCALLS_H_
 #define QUELTA_TESTS_SUPPORT_SCRIPTEDCALLS_H_
 
-// Scripts for wrapped functions: what the n-th call of a function does, by the function's name.
+// Scripts for wrapped functions. A script has the name of a function and a step for each of its
+// calls.
 //
 //     ScriptedCalls writes("write");
 //     writes.pass().fail(EINTR).limit(3).fail(ENOSPC);
-// While the object lives, each call takes the next step; calls after the last step are real ones.
-// The latest script for a function wins. support/ScriptedLibc.h has the stubs that take the steps.
+// While the object exists, each call takes the next step; later calls are real. If a function has
+// several scripts, the latest one is used. support/ScriptedLibc.h has the stubs that take the
+// steps.
 // Safe from any thread; serialised by one spin lock, because a script may replace a mutex.
 
 #include <cerrno>
@@ -19,10 +21,10 @@ public:
     struct Step {
         Kind kind = PASS;
         long long value = 0;  // FAIL: errno; LIMIT: bytes; GIVE: the result
-        unsigned calls = 0;   // how many calls take this step
+        unsigned calls = 0;   // the number of calls that take this step
     };
 
-    // Counts the calls of `function`, which is real until there are steps.
+    // Counts the calls of `function`, which are real unless there are steps.
     explicit ScriptedCalls(const char* function);
     ~ScriptedCalls();
     ScriptedCalls(const ScriptedCalls&) = delete;
@@ -30,7 +32,7 @@ public:
 
     // Each appends a step for the next `calls` calls; at most MAX_STEPS in all. `pass` makes the
     // real call, `limit` makes it with at most `bytes` bytes. `fail` returns -1 (or null) and sets
-    // errno; `give` returns `result`, which suits functions that return their error.
+    // errno; `give` returns `result`, for functions that return an error number.
     ScriptedCalls& pass(unsigned calls = 1) { return add({PASS, 0, calls}); }
     ScriptedCalls& fail(int error, unsigned calls = 1) { return add({FAIL, error, calls}); }
     ScriptedCalls& limit(std::size_t bytes, unsigned calls = 1) {
@@ -38,7 +40,7 @@ public:
     }
     ScriptedCalls& give(long long result, unsigned calls = 1) { return add({GIVE, result, calls}); }
 
-    // Returns: the calls so far.
+    // Returns: the number of calls so far.
     unsigned calls() const;
 
     // Takes the next step of the latest script for `function`; PASS if there is none.
@@ -50,14 +52,14 @@ private:
     ScriptedCalls& add(Step step);
 
     const char* const _function;
-    ScriptedCalls* _next = nullptr;  // the script made before this one
+    ScriptedCalls* _next = nullptr;  // the script created before this one
     Step _steps[MAX_STEPS];
     std::size_t _stepCount = 0;
     unsigned _calls = 0;
 };
 
-// The body of a wrapped function: takes the next step. `real` makes the call with at most as many
-// bytes as its argument says.
+// The body of a wrapped function: takes the next step. `real` makes the call with at most the
+// number of bytes in its argument.
 template <typename Real>
 auto scriptedCall(const char* function, std::size_t size, Real real) {
     using Result = decltype(real(size));
@@ -79,7 +81,7 @@ auto scriptedCall(const char* function, std::size_t size, Real real) {
     return real(step.kind == ScriptedCalls::LIMIT && most < size ? most : size);
 }
 
-// The same for a function without a size.
+// The same for a function without a size argument.
 template <typename Real>
 auto scriptedCall(const char* function, Real real) {
     return scriptedCall(function, 0, [&real](std::size_t) { return real(); });

@@ -1,5 +1,5 @@
-// No code here is instrumented by a sanitizer: a sanitizer's runtime that is linked in statically
-// has its calls wrapped too, and makes some of them before instrumented code can run.
+// This file is not instrumented by a sanitizer. The calls of a statically linked sanitizer runtime
+// are wrapped too, and it makes some of them before instrumented code can run.
 
 #include "support/ScriptedLibc.h"
 
@@ -106,36 +106,36 @@ void record(const char* function, Arguments... arguments) {
     recorder = current;
 }
 
-#define DEFINE_SLOT(result, name, parameters, arguments, noted) \
+#define DEFINE_SLOT(result, name, parameters, arguments, recorded) \
     constinit std::function<result parameters>* name = nullptr;
 
 namespace replacement {
 SCRIPTED_LIBC(DEFINE_SLOT, DEFINE_SLOT, DEFINE_SLOT)
 }
 
-// The first argument of record, and the others if there are any.
+// The first argument of record, then the others, if any.
 #define NAMED(name, ...) (#name __VA_OPT__(, ) __VA_ARGS__)
-#define NOTED(...) __VA_ARGS__
+#define RECORDED(...) __VA_ARGS__
 
-#define STUB_BODY(name, arguments, noted, declaredSize, ...)                           \
-    record NAMED(name, NOTED noted);                                                   \
+#define STUB_BODY(name, arguments, recorded, declaredSize, ...)                        \
+    record NAMED(name, RECORDED recorded);                                             \
     return scriptedCall(#name, declaredSize, [&]([[maybe_unused]] std::size_t limit) { \
         __VA_ARGS__                                                                    \
         return replacement::name != nullptr ? (*replacement::name)arguments            \
                                             : __real_##name arguments;                 \
     });
 
-#define DEFINE_STUB(result, name, parameters, arguments, noted) \
-    __attribute__((weak)) result __wrap_##name parameters;      \
-    result __wrap_##name parameters {                           \
-        STUB_BODY(name, arguments, noted, 0)                    \
+#define DEFINE_STUB(result, name, parameters, arguments, recorded) \
+    __attribute__((weak)) result __wrap_##name parameters;         \
+    result __wrap_##name parameters {                              \
+        STUB_BODY(name, arguments, recorded, 0)                    \
     }
-#define DEFINE_TRANSFER(result, name, parameters, arguments, noted) \
-    __attribute__((weak)) result __wrap_##name parameters;          \
-    result __wrap_##name parameters {                               \
-        STUB_BODY(name, arguments, noted, size, size = limit;)      \
+#define DEFINE_TRANSFER(result, name, parameters, arguments, recorded) \
+    __attribute__((weak)) result __wrap_##name parameters;             \
+    result __wrap_##name parameters {                                  \
+        STUB_BODY(name, arguments, recorded, size, size = limit;)      \
     }
-#define DEFINE_NOTHING(result, name, parameters, arguments, noted)
+#define DEFINE_NOTHING(result, name, parameters, arguments, recorded)
 
 extern "C" {
 SCRIPTED_LIBC(DEFINE_STUB, DEFINE_TRANSFER, DEFINE_NOTHING)

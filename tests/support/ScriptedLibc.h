@@ -1,11 +1,11 @@
 #ifndef QUELTA_TESTS_SUPPORT_SCRIPTEDLIBC_H_
 #define QUELTA_TESTS_SUPPORT_SCRIPTEDLIBC_H_
 
-// A C library that a test controls. The test program names the functions that it wraps:
+// A C library that a test controls. The test program lists the functions that it wraps:
 //     quelta_test(XTest SOURCES XTest.cpp WRAP open write)
-// and each call of one of them from the program's own objects (not from within the C library) then
-//   1. is noted by the RecordedCalls of its thread, if there is one;
-//   2. takes the next step of its ScriptedCalls, if there is one: fails, returns a value...;
+// Each call of one of them from the program's own objects (not from within the C library)
+//   1. is recorded by the RecordedCalls of its thread, if there is one;
+//   2. takes the next step of its ScriptedCalls, if there is one, which may end the call;
 //   3. calls the Replacement of the function, if there is one, and the real function otherwise.
 //
 //     ScriptedCalls opens("open");
@@ -14,8 +14,8 @@
 //     const Replacement clock(replacement::gettimeofday,
 //                             [](struct timeval* now, void*) { *now = {7, 0}; return 0; });
 //
-// A new function is one line of the table below. __real_NAME is the function itself. All stubs are
-// weak: a test may define __wrap_NAME for itself.
+// To add a function, add a row to the table below. __real_NAME is the function itself. All stubs
+// are weak, so a test may define its own __wrap_NAME.
 
 #include <pthread.h>
 #include <sys/stat.h>
@@ -37,7 +37,7 @@
 struct poptContext_s;
 struct poptOption;
 
-// Each row: result, name, parameters, arguments, and the arguments that RecordedCalls notes. A
+// Each row: result, name, parameters, arguments, and the arguments that RecordedCalls records. A
 // TRANSFER obeys ScriptedCalls::limit by its argument `size`. __xpg_strerror_r is the strerror_r
 // that returns an error number.
 // clang-format off
@@ -101,8 +101,8 @@ struct poptOption;
         (number, buf, size), (size))
 // clang-format on
 
-// The calls of wrapped functions that this thread makes while the object lives: each as the name
-// and the noted arguments, separated by blanks. A mode is octal, every other number decimal.
+// The calls of wrapped functions by this thread while the object exists, each as the name and the
+// recorded arguments, separated by blanks. A mode is octal, every other number decimal.
 // Not thread-safe; one object at a time per thread.
 class RecordedCalls {
 public:
@@ -121,13 +121,13 @@ private:
     std::vector<std::string> _calls;
 };
 
-#define DECLARE_SLOT(result, name, parameters, arguments, noted) \
+#define DECLARE_SLOT(result, name, parameters, arguments, recorded) \
     extern std::function<result parameters>* name;
-#define DECLARE_REAL(result, name, parameters, arguments, noted) \
+#define DECLARE_REAL(result, name, parameters, arguments, recorded) \
     __attribute__((weak)) result __real_##name parameters;
-#define DECLARE_NOTHING(result, name, parameters, arguments, noted)
+#define DECLARE_NOTHING(result, name, parameters, arguments, recorded)
 
-// What Replacement sets; null for the real function.
+// The functions that Replacement sets; null: the real function.
 namespace replacement {
 SCRIPTED_LIBC(DECLARE_SLOT, DECLARE_SLOT, DECLARE_SLOT)
 }
@@ -137,7 +137,8 @@ __attribute__((weak)) int __real_open(const char* path, int flags, ...);
 __attribute__((weak)) int __real_fcntl(int fd, int command, ...);
 }
 
-// Calls `body` in place of a function while the object lives. Not thread-safe to make and destroy.
+// Calls `body` instead of a function while the object exists. Not thread-safe to construct and
+// destroy.
 template <typename Body>
 class Replacement {
 public:

@@ -32,7 +32,7 @@ __attribute__((init_priority(101))) Start atStart;
 
 }  // namespace
 
-// Defines __wrap_FUNCTION: notes what the call was given, and then takes the script's next step or
+// Defines __wrap_FUNCTION, which records the arguments, then takes the next step of the script or
 // calls the real function.
 #define SCRIPTED(function, parameters, arguments, note)                          \
     int __real_##function parameters;                                            \

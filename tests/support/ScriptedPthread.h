@@ -17,18 +17,18 @@
 #include "support/ScriptedCalls.h"
 #include "util/Mutex.h"
 
-// What the latest calls on this thread were given.
+// The arguments of the latest calls on this thread.
 struct SeenByPthread {
     clockid_t clock = -1;       // of the latest timed wait
     timespec deadline = {};     // of the latest timed wait
-    std::size_t stackSize = 0;  // of the latest thread created
+    std::size_t stackSize = 0;  // of the last created thread
 };
 extern thread_local SeenByPthread seenByPthread;
 
-// Called with the name of the function at the beginning of every wrapped call, unless null.
+// If not null, called at the start of every wrapped call with the name of the function.
 extern std::atomic<void (*)(const char* function)> onPthreadCall;
 
-// The text of a call that failed with `error` on a thread of that name.
+// The text for a call that failed with `error` on a thread with that name.
 inline std::string pthreadFailure(const std::string& function, int error,
                                   const std::string& threadName = "Main Thread") {
     return threadName + ": about to throw a PthreadException: " + function + ": " +
@@ -46,7 +46,7 @@ std::string thrownBy(Act act) {
     return "";
 }
 
-// Matches all that a failed assertion prints.
+// Matches the whole output of a failed assertion.
 inline testing::Matcher<const std::string&> failedAssertion(const std::string& file,
                                                             const std::string& expression) {
     return testing::AllOf(testing::StartsWith(file + ":"),

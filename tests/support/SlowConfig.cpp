@@ -36,7 +36,7 @@ std::string trimmed(std::string text) {
     return withoutLeading(text);
 }
 
-// Takes everything in front of the first of `ends` off the text.
+// Removes and returns the text before the first of `ends`.
 std::string take(std::string& text, const std::string& ends) {
     const std::size_t end = std::min(text.find_first_of(ends), text.size());
     const std::string taken = text.substr(0, end);
@@ -53,7 +53,7 @@ bool takeEquals(std::string& text) {
     return true;
 }
 
-// A plain decimal number of at most `most`.
+// A decimal number of at most `most`.
 bool number(const std::string& text, unsigned long long most, unsigned long long& result) {
     const std::string largest = std::to_string(most);
     if (text.empty() || text.find_first_not_of("0123456789") != NPOS ||
@@ -132,7 +132,7 @@ bool readLine(SlowConfig& config, const SlowConfig::Line& line, const std::strin
 }
 
 // Removes "#" and XML comments from a line. `next` is the number of lines read so far.
-// Returns: false when a comment has no end, its line in `config`.
+// Returns: false if a comment has no end; `config` then has its line.
 bool dropComments(SlowConfig& config, const Words& lines, std::size_t& next, std::string& line) {
     for (;;) {
         line = line.substr(0, line.find('#'));
@@ -141,15 +141,15 @@ bool dropComments(SlowConfig& config, const Words& lines, std::size_t& next, std
             return true;
         }
         const auto startedAt = static_cast<unsigned>(next);
-        std::string behind = line.substr(start + 4);
-        while (behind.find("-->") == NPOS) {
+        std::string rest = line.substr(start + 4);
+        while (rest.find("-->") == NPOS) {
             if (next == lines.size()) {
                 config.openComment = startedAt;
                 return false;
             }
-            behind = lines[next++];
+            rest = lines[next++];
         }
-        line = line.substr(0, start) + behind.substr(behind.find("-->") + 3);
+        line = line.substr(0, start) + rest.substr(rest.find("-->") + 3);
     }
 }
 

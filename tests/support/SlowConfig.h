@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_SLOWCONFIG_H_
 #define QUELTA_TESTS_SUPPORT_SLOWCONFIG_H_
 
-// A reader of logging configurations kept only to compare with: it holds the whole text, joins and
-// rereads lines as the rules say, and shares no code with the real one.
+// A slow reader of logging configurations, for comparison. It reads the whole text, joins lines by
+// the rules, and shares no code with the real reader.
 
 #include <map>
 #include <string>
@@ -27,13 +27,13 @@ struct SlowConfig {
     std::map<std::string, Appender> appenders;  // "rootAppender" too, when a line names it
 };
 
-// What reading `contents` means, for an installation in `home`.
+// The result of reading `contents` for an installation in `home`.
 SlowConfig readConfigSlowly(const std::string& contents, const std::string& home);
 
-// What a channel's value means: the words are levels, names out of `config` and others.
+// The result of a channel's value, whose words are levels, appenders of `config` or unknown.
 struct SlowChannel {
-    int level;                           // the level, or `level` as it was
-    std::vector<std::string> appenders;  // empty: as they were
+    int level;                           // the new level; `level` if the value has none
+    std::vector<std::string> appenders;  // empty: unchanged
     bool accepted;                       // whether every word was known
 };
 SlowChannel readChannelSlowly(const SlowConfig& config, const std::string& value, int level);

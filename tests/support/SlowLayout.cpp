@@ -9,7 +9,7 @@
 
 namespace {
 
-// Takes the leading characters that are among `letters`, at most `limit` of them.
+// Removes and returns the leading characters that are in `letters`, at most `limit` of them.
 std::string take(std::string& rest, const char* letters, std::size_t limit = std::string::npos) {
     const std::size_t run = std::min(rest.find_first_not_of(letters), rest.size());
     const std::string taken = rest.substr(0, std::min(run, limit));
@@ -31,7 +31,7 @@ bool isAmPm(std::string piece) {
     return true;
 }
 
-// The patterns are made at run time: no compiler can check them.
+// The formats are built at run time, so the compiler cannot check them.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
 // strftime with enough room. The sentinel before the text distinguishes an empty text from one that
@@ -43,7 +43,7 @@ std::string strftimeOf(const std::string& piece, const struct tm& local) {
         throw std::length_error("date too long for the slow renderer");
     }
     const std::string text(buf.data() + 1, len - 1);
-    // What may be without text is not tried again when it does not fit.
+    // The real renderer does not repeat a "%p" that does not fit its first buffer.
     return text.size() >= 64 && isAmPm(piece) ? "" : text;
 }
 #pragma GCC diagnostic pop
@@ -109,8 +109,8 @@ Widths takeWidths(std::string& rest) {
     return widths;
 }
 
-// Widths stay small enough here that a number of more than nine digits can only mean one that does
-// not fit 32 bits, and is ignored.
+// The inputs have only small widths and widths that do not fit in 32 bits. So a number of more than
+// nine digits does not fit and is ignored.
 std::size_t widthOf(const std::string& digits, std::size_t none) {
     return digits.empty() || digits.size() > 9 ? none : std::stoul(digits);
 }

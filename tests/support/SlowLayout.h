@@ -1,13 +1,13 @@
 #ifndef QUELTA_TESTS_SUPPORT_SLOWLAYOUT_H_
 #define QUELTA_TESTS_SUPPORT_SLOWLAYOUT_H_
 
-// A renderer of log layouts kept only to compare with: it reads the pattern again for each line,
-// one character at a time, and shares no code with the compiled layouts.
+// A slow renderer of log layouts, for comparison. It parses the pattern again for each line, one
+// character at a time, and shares no code with the compiled layouts.
 
 #include <ctime>
 #include <string>
 
-// What one line is made of, each part already in words.
+// The parts of one line, already as text.
 struct SlowLine {
     std::string message;
     std::string category;

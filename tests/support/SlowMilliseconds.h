@@ -1,7 +1,7 @@
 #ifndef QUELTA_TESTS_SUPPORT_SLOWMILLISECONDS_H_
 #define QUELTA_TESTS_SUPPORT_SLOWMILLISECONDS_H_
 
-// A slow convert_string_to_milliseconds, to compare with: it collects the digits as text and counts
+// A slow convert_string_to_milliseconds, for comparison. It collects the digits as text and counts
 // tenths of milliseconds in 128 bits.
 
 #include <algorithm>

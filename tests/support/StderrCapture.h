@@ -1,12 +1,12 @@
 #ifndef QUELTA_TESTS_SUPPORT_STDERRCAPTURE_H_
 #define QUELTA_TESTS_SUPPORT_STDERRCAPTURE_H_
 
-// Collects everything written to descriptor 2 while the object lives.
+// Collects everything written to descriptor 2 while the object exists.
 //
 //     StderrCapture err;
 //     ...
 //     EXPECT_EQ("text\n", err.text());
-// Not thread-safe to construct and destroy; other threads may write while it lives.
+// Not thread-safe to construct and destroy; other threads may write while it exists.
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -17,7 +17,7 @@
 class StderrCapture {
 public:
     StderrCapture() : _file(std::tmpfile()), _stderr(::dup(STDERR_FILENO)) {
-        // Appending, so that several descriptors of the same file do not overwrite each other.
+        // O_APPEND, so that several descriptors of the same file do not overwrite each other.
         ::fcntl(::fileno(_file), F_SETFL, O_APPEND);
         ::dup2(::fileno(_file), STDERR_FILENO);
     }
@@ -29,7 +29,7 @@ public:
     StderrCapture(const StderrCapture&) = delete;
     StderrCapture& operator=(const StderrCapture&) = delete;
 
-    // Returns: everything written so far, by child processes too.
+    // Returns: everything written so far, also by child processes.
     std::string text() const {
         std::string all;
         char buf[4096];

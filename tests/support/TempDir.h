@@ -1,8 +1,8 @@
 #ifndef QUELTA_TESTS_SUPPORT_TEMPDIR_H_
 #define QUELTA_TESTS_SUPPORT_TEMPDIR_H_
 
-// A new directory that is removed at the end of the scope with everything in it; and whole files as
-// strings. A failure throws.
+// A new directory that is removed with its contents at the end of the scope, and functions that
+// read and write whole files. A failure throws.
 //
 //     TempDir dir;
 //     writeFile(dir.file("a.cfg"), "x=1\n");
@@ -30,7 +30,7 @@ public:
     TempDir(const TempDir&) = delete;
     TempDir& operator=(const TempDir&) = delete;
 
-    // The directory, absolute, without a '/' at its end.
+    // The absolute path of the directory, without a '/' at the end.
     const std::string& path() const { return _path; }
     // The path of an entry in it, which need not exist.
     std::string file(const std::string& name) const { return _path + '/' + name; }

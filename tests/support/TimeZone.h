@@ -1,7 +1,7 @@
 #ifndef QUELTA_TESTS_SUPPORT_TIMEZONE_H_
 #define QUELTA_TESTS_SUPPORT_TIMEZONE_H_
 
-// The time zone of the process, for the life of an object.
+// Sets the time zone of the process while the object exists.
 // Not thread-safe; one thread at a time per process.
 
 #include <cstdlib>

@@ -27,14 +27,14 @@ private:
     std::function<void()> _body;
 };
 
-// Runs `body` on a worker and waits for its end.
+// Runs `body` on a worker and waits for the worker to end.
 inline void runWorker(const char* name, std::function<void()> body) {
     Worker worker(name, std::move(body));
     worker.go();
     worker.join();
 }
 
-// Waits, busily, until the condition holds.
+// Waits in a busy loop until the condition holds.
 template <typename Condition>
 void waitUntil(Condition condition) {
     while (!condition()) {

@@ -1,5 +1,5 @@
-// A program outside the project, built with the installed libraries: it starts up, logs a line and
-// uses a network of one rule.
+// A program outside the project, built with the installed libraries. It initializes logging, logs a
+// line and uses a network of one rule.
 
 #include <cstdio>
 #include <string>

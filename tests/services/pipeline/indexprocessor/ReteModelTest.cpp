@@ -1,5 +1,5 @@
-// The network compared with two models: one that recounts everything from facts after each step,
-// and one that follows the rules of propagation literally, by recursion.
+// Compares the network with two models: one recounts everything from facts after each step, the
+// other follows the rules of propagation literally, by recursion.
 
 #include <algorithm>
 #include <functional>
@@ -26,12 +26,12 @@ bool isPattern(const std::string& keyword) {
     return keyword.find('*') != std::string::npos;
 }
 
-// The keywords whose condition a term touches, once for the name and once for the pattern.
-bool meets(const std::string& keyword, const std::string& term) {
+// Whether a term matches the condition of a keyword, by its name or as a pattern.
+bool matches(const std::string& keyword, const std::string& term) {
     return keyword == term || (isPattern(keyword) && oracle::match(keyword, term).matched);
 }
 
-// What the network under test is made of, so that both models can read its outcome.
+// The network under test, with access to the state that both models compare.
 struct Network {
     AndOperator* add(BoolOperator* parent, const std::string& implication) {
         std::string text = implication;
@@ -48,7 +48,7 @@ struct Network {
 };
 
 // Facts: which conditions are set and which links to operators exist. Counts, firing and
-// implications are computed anew from them.
+// implications are recomputed from them.
 class RecountModel {
 public:
     struct Operator {
@@ -67,7 +67,7 @@ public:
     void change(bool state, const std::string& term) {
         std::set<int> touched;
         for (auto& [keyword, set] : conditions) {
-            if (meets(keyword, term)) {
+            if (matches(keyword, term)) {
                 changeOne(state, keyword, set, touched);
             }
         }
@@ -122,7 +122,8 @@ private:
         }
     }
 
-    // Everything below what was touched fires as its count says; the rest stays as it is.
+    // Recomputes whether the touched operators and their descendants fire; the others do not
+    // change.
     void settle(std::set<int> touched) {
         for (std::size_t i = 0; i < operators.size(); ++i) {
             Operator& op = operators[i];
@@ -197,7 +198,8 @@ public:
     int firings() const { return static_cast<int>(network.implied.size()); }
 
 private:
-    // Each operator may have up to two parents among the earlier ones, and needs their firing.
+    // Each operator may have up to two parents among the earlier ones and needs all of them to
+    // fire.
     void makeOperators() {
         for (int i = 0; i < 8; ++i) {
             RecountModel::Operator op;
@@ -208,17 +210,17 @@ private:
                 parent = network.operators[static_cast<std::size_t>(first)];
                 op.parents.push_back(first);
             }
-            AndOperator* const made = network.add(parent, op.implication);
+            AndOperator* const added = network.add(parent, op.implication);
             const int second = i == 0 ? 0 : static_cast<int>(draw() % static_cast<unsigned>(i));
             if (i > 0 && draw() % 3 == 0 && (op.parents.empty() || op.parents[0] != second)) {
-                network.operators[static_cast<std::size_t>(second)]->addChild(*made);
-                made->incNeedMatch();
+                network.operators[static_cast<std::size_t>(second)]->addChild(*added);
+                added->incNeedMatch();
                 op.parents.push_back(second);
             }
             op.need = static_cast<int>(op.parents.size());
             model.operators.push_back(op);
         }
-        // Without a condition an operator would fire from its parents' first update, or never.
+        // An operator without a condition would fire on its parents' first update, or never.
         for (int i = 0; i < 8; ++i) {
             addTo(i);
         }
@@ -226,8 +228,8 @@ private:
 
     void add() { addTo(static_cast<int>(draw() % 8)); }
 
-    // A condition that is set would take a match that it never gave from its new operator when it
-    // is reset; facts do not tell that, so it is reset first.
+    // Resetting a condition that was set before the operator was added would remove a match it
+    // never gave. The model cannot express that, so reset it first.
     void addTo(int op) {
         const std::string keyword = KEYWORDS[draw() % std::size(KEYWORDS)];
         if (model.conditions[keyword]) {
@@ -243,7 +245,7 @@ private:
     RecountModel model;
 };
 
-TEST(ReteModelTest, AgreesWithRecountingEverything) {
+TEST(ReteModelTest, AgreesWithAModelThatRecountsEverything) {
     int firings = 0;
     for (unsigned seed = 1; seed <= 3000; ++seed) {
         SCOPED_TRACE("seed " + std::to_string(seed));
@@ -258,8 +260,8 @@ TEST(ReteModelTest, AgreesWithRecountingEverything) {
     EXPECT_GT(firings, 10000);
 }
 
-// Follows the rules word by word, with shared implications, children whose need nobody raised, and
-// counts that run into their bounds.
+// Follows the rules literally. Covers shared implications, children whose need was not raised, and
+// counts that reach their bounds.
 class LiteralModel {
 public:
     struct Operator {
@@ -267,7 +269,7 @@ public:
         int count = 0;
         bool fired = false;
         std::set<std::string> implications;
-        std::vector<int> children;  // in the network's order of visiting
+        std::vector<int> children;  // in the order in which the network visits them
     };
     struct Condition {
         bool set = false;
@@ -312,7 +314,8 @@ public:
         }
     }
 
-    // Candidates come by growing prefix, within a prefix in the order of adding.
+    // Candidates are ordered by growing prefix, and for one prefix in the order in which they were
+    // added.
     void change(bool state, const std::string& term) {
         if (conditions.count(term) != 0) {
             changeOne(state, term);
@@ -386,15 +389,15 @@ private:
         LiteralModel::Operator op;
         const std::string implication = "i" + std::to_string(draw() % 4);
         op.implications = {implication, "own" + std::to_string(i)};
-        AndOperator* const made = network.add(nullptr, implication);
-        made->addImplication("own" + std::to_string(i));
+        AndOperator* const added = network.add(nullptr, implication);
+        added->addImplication("own" + std::to_string(i));
         for (int parent = 0; parent < i; ++parent) {
             if (draw() % 3 == 0) {
-                network.operators[static_cast<std::size_t>(parent)]->addChild(*made);
+                network.operators[static_cast<std::size_t>(parent)]->addChild(*added);
                 model.at(parent).children.push_back(i);
                 inPointerOrder(model.at(parent).children);
                 if (draw() % 3 != 0) {
-                    made->incNeedMatch();
+                    added->incNeedMatch();
                     ++op.need;
                 }
             }
@@ -430,7 +433,7 @@ private:
     LiteralModel model;
 };
 
-TEST(ReteModelTest, AgreesWithTheRulesTakenLiterally) {
+TEST(ReteModelTest, AgreesWithALiteralModelOfTheRules) {
     for (unsigned seed = 1; seed <= 3000; ++seed) {
         SCOPED_TRACE("seed " + std::to_string(seed));
         LiteralRun run(seed);

@@ -1,4 +1,5 @@
-// The order in which a change reaches operators, and what each of them sees when it is asked.
+// The order in which a change reaches operators, and the count that each has when shouldFire is
+// called.
 
 #include "services/pipeline/indexprocessor/Rete.h"
 
@@ -14,44 +15,44 @@ namespace {
 
 using testing::ElementsAre;
 
-// An operator's name and the count that it had, for each time that one was asked.
-using Asked = std::vector<std::string>;
+// The operator's name and its count for each call of shouldFire.
+using Calls = std::vector<std::string>;
 
 class RecordingOperator : public BoolOperator {
 public:
-    RecordingOperator(std::string& implication, Asked& asked)
-        : BoolOperator(nullptr, implication), _asked(asked) {}
+    RecordingOperator(std::string& implication, Calls& calls)
+        : BoolOperator(nullptr, implication), _calls(calls) {}
 
     std::string name;
 
 protected:
     bool shouldFire() override {
-        _asked.push_back(name + std::to_string(_matchCount));
+        _calls.push_back(name + std::to_string(_matchCount));
         return _matchCount >= _needMatch;
     }
 
 private:
-    Asked& _asked;
+    Calls& _calls;
 };
 
 class ReteOrderTest : public testing::Test {
 protected:
-    // Operators that are called "a", "b", "c" and so on in the order of their addresses.
+    // Operators named "a", "b", "c" and so on in the order of their addresses.
     std::vector<RecordingOperator*> makeOperators(std::size_t count) {
         std::string implication = "i";
-        std::vector<RecordingOperator*> made;
+        std::vector<RecordingOperator*> operators;
         for (std::size_t i = 0; i < count; ++i) {
-            made.push_back(new RecordingOperator(implication, asked));
-            rs.addOperator(*made.back());
+            operators.push_back(new RecordingOperator(implication, calls));
+            rs.addOperator(*operators.back());
         }
-        std::sort(made.begin(), made.end(), std::less<>());
+        std::sort(operators.begin(), operators.end(), std::less<>());
         for (std::size_t i = 0; i < count; ++i) {
-            made[i]->name = static_cast<char>('a' + i);
+            operators[i]->name = static_cast<char>('a' + i);
         }
-        return made;
+        return operators;
     }
 
-    Asked asked;
+    Calls calls;
     RuleSystem rs;
     StringSet implied;
     RuleSystem::Candidates scratch;
@@ -63,10 +64,10 @@ TEST_F(ReteOrderTest, AConditionUpdatesItsOperatorsInTheOrderOfTheirAddresses) {
         rs.addCondition("x", *operators[i]);
     }
     rs.setCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("a1", "b1", "c1", "d1"));
-    asked.clear();
+    EXPECT_THAT(calls, ElementsAre("a1", "b1", "c1", "d1"));
+    calls.clear();
     rs.resetCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("a0", "b0", "c0", "d0"));
+    EXPECT_THAT(calls, ElementsAre("a0", "b0", "c0", "d0"));
 }
 
 TEST_F(ReteOrderTest, ChildrenFollowTheirParentDepthFirstInTheOrderOfTheirAddresses) {
@@ -79,10 +80,10 @@ TEST_F(ReteOrderTest, ChildrenFollowTheirParentDepthFirstInTheOrderOfTheirAddres
     operators[0]->addChild(*operators[3]);
     operators[3]->incNeedMatch();
     rs.setCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("c1", "a1", "d1", "b1", "e1"));
+    EXPECT_THAT(calls, ElementsAre("c1", "a1", "d1", "b1", "e1"));
 }
 
-// The second operator is a child of the first and fed by the same condition.
+// The second operator is a child of the first and belongs to the same condition.
 TEST_F(ReteOrderTest, AllCountsChangeBeforeTheFirstUpdate) {
     const auto operators = makeOperators(2);
     operators[0]->addChild(*operators[1]);
@@ -90,36 +91,36 @@ TEST_F(ReteOrderTest, AllCountsChangeBeforeTheFirstUpdate) {
     rs.addCondition("x", *operators[0]);
     rs.addCondition("x", *operators[1]);
     rs.setCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("a1", "b2", "b2"));
-    asked.clear();
+    EXPECT_THAT(calls, ElementsAre("a1", "b2", "b2"));
+    calls.clear();
     rs.resetCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("a0", "b0", "b0"));
+    EXPECT_THAT(calls, ElementsAre("a0", "b0", "b0"));
 }
 
-TEST_F(ReteOrderTest, OperatorsOfOtherConditionsAreLeftAlone) {
+TEST_F(ReteOrderTest, OperatorsOfOtherConditionsAreNotUpdated) {
     const auto operators = makeOperators(4);
     const char* const keywords[] = {"x", "y", "x*", "*y"};
     for (std::size_t i = 0; i < operators.size(); ++i) {
         rs.addCondition(keywords[i], *operators[i]);
     }
     rs.setCondition("x", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("a1", "c1"));
-    asked.clear();
+    EXPECT_THAT(calls, ElementsAre("a1", "c1"));
+    calls.clear();
     rs.resetCondition("xy", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("d0", "c0"));
-    asked.clear();
+    EXPECT_THAT(calls, ElementsAre("d0", "c0"));
+    calls.clear();
     rs.setCondition("z", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre());
+    EXPECT_THAT(calls, ElementsAre());
 }
 
-TEST_F(ReteOrderTest, ATermMeetsItsNameThenPatternsByGrowingPrefix) {
+TEST_F(ReteOrderTest, ATermUpdatesItsNameThenPatternsByGrowingPrefix) {
     const auto operators = makeOperators(6);
     const char* const keywords[] = {"xy*", "x*y*", "xyz", "*", "x*", "**"};
     for (std::size_t i = 0; i < operators.size(); ++i) {
         rs.addCondition(keywords[i], *operators[i]);
     }
     rs.setCondition("xyz", scratch, implied);
-    EXPECT_THAT(asked, ElementsAre("c1", "d1", "f1", "b1", "e1", "a1"));
+    EXPECT_THAT(calls, ElementsAre("c1", "d1", "f1", "b1", "e1", "a1"));
 }
 
 TEST_F(ReteOrderTest, ResettingAllGoesByTheNamesOfTheConditionsAndSetsTheMetaTermLast) {
@@ -129,9 +130,9 @@ TEST_F(ReteOrderTest, ResettingAllGoesByTheNamesOfTheConditionsAndSetsTheMetaTer
         rs.addCondition(keywords[i], *operators[i]);
     }
     rs.setCondition("z", scratch, implied);
-    asked.clear();
+    calls.clear();
     rs.resetAll(implied);
-    EXPECT_THAT(asked, ElementsAre("d0", "c0", "b0", "a0", "b1"));
+    EXPECT_THAT(calls, ElementsAre("d0", "c0", "b0", "a0", "b1"));
 }
 
 }  // namespace

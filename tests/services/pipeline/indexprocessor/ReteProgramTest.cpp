@@ -1,6 +1,6 @@
-// The functions of the program, linked with its main under another name. random() is replaced by a
-// counting stand-in, or served from a list; time() is a clock that only the cases move; the matcher
-// can be made to fail the program's self-check.
+// The functions of the program, linked with its main under another name. random() counts its calls
+// and can return values from a list. time() is a clock that only the cases advance. The matcher can
+// be made to fail the program's self-check.
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -31,7 +31,7 @@ int rete_main(int argc, char** argv, char** envp);
 extern "C" long __real_random();
 extern "C" std::time_t __wrap_time(std::time_t* out);
 extern "C" long __wrap_random();
-// WildcardMatcher::isMatch without capture, under the linker's name for it.
+// WildcardMatcher::isMatch without capture, by its mangled name.
 extern "C" bool __real__ZNK15WildcardMatcher7isMatchEPKc(const WildcardMatcher*, const char*);
 extern "C" bool __wrap__ZNK15WildcardMatcher7isMatchEPKc(const WildcardMatcher*, const char*);
 
@@ -109,7 +109,7 @@ std::string print(StringSet implications) {
     return printed([&] { printImplications(implications); });
 }
 
-// The set of patterns that a sequence of draws gives, by plain string handling.
+// The set of patterns for a sequence of draws, built with plain string operations.
 std::set<std::string> patternsFrom(const std::vector<long>& values, int testcount) {
     std::size_t at = 0;
     const auto draw = [&](long min, long max) { return min + values.at(at++) % (max - min + 1); };
@@ -179,7 +179,7 @@ TEST_F(ReteProgramDeathTest, AnEmptyRangeIsAsserted) {
     EXPECT_DEATH(randint(1, 0), "RandomPatterns.cpp:[0-9]+: failed assertion `range != 0'");
 }
 
-// Runs the program up to its first draw, where it ends with status 7.
+// Runs the program until its first draw, then exits with status 7.
 [[noreturn]] void runToTheFirstDraw(const TempDir& home) {
     ::dup2(STDERR_FILENO, STDOUT_FILENO);
     ::setenv("QUELTA_HOME", home.path().c_str(), 1);
@@ -195,7 +195,7 @@ TEST_F(ReteProgramDeathTest, AnEmptyRangeIsAsserted) {
     ::_exit(rete_main(1, argv, envp));
 }
 
-TEST_F(ReteProgramDeathTest, ReportsAFaultyMatcherAndCarriesOn) {
+TEST_F(ReteProgramDeathTest, ReportsAFaultyMatcherAndContinues) {
     const TempDir home;
     const std::string announcement =
         "Using logging configuration at " + home.path() + "/etc/log-cmdline.cfg.\n";
@@ -204,7 +204,7 @@ TEST_F(ReteProgramDeathTest, ReportsAFaultyMatcherAndCarriesOn) {
     EXPECT_EXIT(runToTheFirstDraw(home), testing::ExitedWithCode(7), testing::Eq(announcement));
 }
 
-TEST_F(ReteProgramTest, NobodySeedsTheGenerator) {
+TEST_F(ReteProgramTest, TheGeneratorIsNotSeeded) {
     srandom(4711);
     std::vector<long> values;
     recorded = &values;
@@ -225,7 +225,7 @@ TEST_F(ReteProgramTest, PrintsImplications) {
     EXPECT_EQ("Implications: a, b, \n", print({"b", "a"}));
     EXPECT_EQ("Implications: , \n", print({""}));
     EXPECT_EQ("Implications: %s, 100%\n, \n", print({"%s", "100%\n"}));
-    // Printed as C strings, an embedded NUL ends them.
+    // They are printed as C strings, so an embedded NUL ends them.
     EXPECT_EQ("Implications: a, \n", print({std::string("a\0b", 3)}));
 }
 
@@ -275,10 +275,10 @@ TEST_F(ReteProgramTest, GeneratesTextsFromScriptedDraws) {
     } cases[] = {
         {{0, 0}, false, "100 "},
         {{0, 182}, true, "wsserverimpl "},
-        // Draws beyond the number of choices begin anew: four lengths, 183 words, twenty gaps.
+        // Larger draws wrap around: there are four lengths, 183 words and twenty gaps.
         {{4, 184}, false, "202 "},
         {{2, 0, 1, 2}, false, "100 202 206 "},
-        // A query draws an operator for each gap: the word, then the gap behind it.
+        // A query draws an operator for each gap: the word, then the gap after it.
         {{1, 0, 3, 1}, true, "100 AND 202 "},
         {{1, 0, 20, 1}, true, "100 AND 202 "},
         {{1, 0, 4, 1}, true, "100 OR 202 "},
@@ -316,7 +316,7 @@ TEST_F(ReteProgramTest, PrintsTheSecondsBetweenTwoReadings) {
     RuleSystem rs;
     EXPECT_EQ("0 conditions\n[]\n0 implications\nTIME = 7\n",
               printed([&] { testWildCards(&rs, 0); }));
-    EXPECT_EQ(before + 14, now) << "read once before and once after";
+    EXPECT_EQ(before + 14, now) << "not read once before and once after";
     secondsPerReading = 5000000000;
     EXPECT_EQ("0 conditions\n[]\n0 implications\nTIME = 5000000000\n",
               printed([&] { testWildCards(&rs, 0); }));
@@ -325,7 +325,7 @@ TEST_F(ReteProgramTest, PrintsTheSecondsBetweenTwoReadings) {
               printed([&] { testWildCards(&rs, 0); }));
 }
 
-// The span begins behind the line of conditions and ends behind the line of implications.
+// The measured time begins after the line of conditions and ends after the line of implications.
 TEST_F(ReteProgramTest, ReadsTheClockAroundResetAndMatch) {
     static std::vector<long> printedSoFar;
     printedSoFar.clear();
@@ -338,11 +338,11 @@ TEST_F(ReteProgramTest, ReadsTheClockAroundResetAndMatch) {
     EXPECT_THAT(printedSoFar, ElementsAre(output.find("conditions\n") + 11, output.find("TIME")));
 }
 
-// Each draw is made in its place: counts and output follow from the sequence alone.
-TEST_F(ReteProgramTest, CutsPatternsAsTheDrawsSay) {
+// The order of the draws is fixed: counts and output depend only on the sequence.
+TEST_F(ReteProgramTest, CutsPatternsAccordingToTheDraws) {
     RuleSystem rs;
-    // Two cuts, [3, 5) of 26 letters, then [1, 1) of the 25 that are left; one cut of everything
-    // in front of the last letter.
+    // First pattern: two cuts, [3, 5) of 26 letters, then [1, 1) of the remaining 25. Second
+    // pattern: one cut of everything before the last letter.
     scripted = {1, 3, 2, 1, 0, 0, 0, 25};
     EXPECT_EQ("2 conditions\n[]\n1 implications\nTIME = 0\n",
               printed([&] { testWildCards(&rs, 2); }));
@@ -387,7 +387,7 @@ TEST_F(ReteProgramTest, EachPatternFeedsItsOwnOperatorThatImpliesIt) {
     }
 }
 
-TEST_F(ReteProgramTest, LeavesTheSystemFilledAndReset) {
+TEST_F(ReteProgramTest, KeepsTheRulesAndResetsTheConditions) {
     RuleSystem rs;
     printed([&] { testWildCards(&rs, 500); });
     EXPECT_GT(rs._conditions.size(), 100u);
@@ -404,7 +404,7 @@ TEST_F(ReteProgramTest, TheTestTermMissesPatternsThatNameItsFourteenthLetter) {
     EXPECT_FALSE(WildcardMatcher("abcdefghijklmn*z").isMatch(term));
 }
 
-TEST_F(ReteProgramTest, RepeatsItself) {
+TEST_F(ReteProgramTest, TheSameSeedGivesTheSameOutput) {
     std::vector<std::string> outputs;
     for (int run = 0; run < 2; ++run) {
         srandom(1);

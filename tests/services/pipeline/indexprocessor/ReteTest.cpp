@@ -25,7 +25,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-// How callers see the network.
+// The public types and signatures.
 template <typename Class, typename Result, typename... Arguments>
 using Method = Result (Class::*)(Arguments...);
 using Scratch = std::vector<std::pair<WildcardMatcher, Conditional*>*>;
@@ -81,7 +81,7 @@ static_assert(std::is_same_v<decltype(&RuleSystem::reset), Method<RuleSystem, vo
 static_assert(std::is_same_v<decltype(&RuleSystem::clearRules), Method<RuleSystem, void>>);
 static_assert(std::is_same_v<decltype(&RuleSystem::toString), Method<RuleSystem, std::string>>);
 
-// A network with its caller's set and scratch space.
+// A network with the caller's implications and scratch space.
 class ReteTest : public testing::Test {
 protected:
     AndOperator& makeOperator(std::string implication, BoolOperator* parent = nullptr) {
@@ -104,7 +104,7 @@ protected:
     RuleSystem::Candidates scratch;
 };
 
-// Fires while any match is present; counts how often it is asked and destroyed.
+// Fires while it has any match. Counts the calls of shouldFire and of the destructor.
 class OrOperator : public BoolOperator {
 public:
     OrOperator(BoolOperator* parent, std::string& implication, int* destroyed = nullptr)
@@ -116,11 +116,11 @@ public:
         }
     }
 
-    int asked = 0;
+    int calls = 0;
 
 protected:
     bool shouldFire() override {
-        ++asked;
+        ++calls;
         return _matchCount > 0;
     }
 
@@ -128,7 +128,7 @@ private:
     int* _destroyed;
 };
 
-TEST_F(ReteTest, HasItsConstants) {
+TEST_F(ReteTest, ConstantsHaveTheirValues) {
     EXPECT_STREQ("AND", AND_OPERATOR);
     EXPECT_EQ("meta::all", META_ALL);
 }
@@ -194,7 +194,7 @@ TEST_F(ReteTest, AnAndOperatorComparesCountsWithTheirSign) {
     EXPECT_EQ(-1, op._matchCount);
 }
 
-TEST_F(ReteTest, CountsStayBetweenNoneAndTheNeed) {
+TEST_F(ReteTest, CountsStayBetweenZeroAndTheNeed) {
     std::string implication = "i";
     AndOperator op(nullptr, implication);
     op.incCount();
@@ -248,7 +248,7 @@ TEST_F(ReteTest, FiringImpliesAllStringsOnce) {
     EXPECT_THAT(implied, IsEmpty());
 }
 
-TEST_F(ReteTest, OneConditionFiresAndUnfires) {
+TEST_F(ReteTest, AnOperatorFiresAndStopsFiringWithItsCondition) {
     AndOperator& op = rule("a", "i");
     EXPECT_EQ(1, op._needMatch);
     EXPECT_TRUE(set("a"));
@@ -292,14 +292,14 @@ TEST_F(ReteTest, UpdatesOperatorsEvenWhenNothingChanged) {
     auto* const op = new OrOperator(nullptr, implication);
     rs.addCondition("a", *op);
     reset("a");
-    EXPECT_EQ(1, op->asked);
+    EXPECT_EQ(1, op->calls);
     set("a");
     set("a");
-    EXPECT_EQ(3, op->asked);
+    EXPECT_EQ(3, op->calls);
     EXPECT_THAT(implied, ElementsAre("i"));
 }
 
-// A set that already fires does not put back what the caller took out.
+// If the operator already fires, setting again does not restore what the caller removed.
 TEST_F(ReteTest, SettingAgainDoesNotFireAgain) {
     rule("a", "i");
     set("a");
@@ -326,9 +326,9 @@ TEST_F(ReteTest, AConditionThatIsSetAlreadyCountsOnlyAfterResetAndSet) {
     EXPECT_TRUE(first.hasFired());
 }
 
-// Deliberate: a reset is counted by all operators of the condition, the set was not by those that
-// came later; such an operator loses a match that another condition gave.
-TEST_F(ReteTest, AConditionThatWasSetBeforeRegistrationTakesAMatchWithIt) {
+// Deliberate: a reset counts for all operators of the condition, but an earlier set did not count
+// for operators that were added later. Such an operator loses a match that another condition gave.
+TEST_F(ReteTest, ResettingAConditionSetBeforeRegistrationRemovesAMatch) {
     rule("a", "i");
     AndOperator& op = rule("b", "j");
     set("a");
@@ -340,7 +340,7 @@ TEST_F(ReteTest, AConditionThatWasSetBeforeRegistrationTakesAMatchWithIt) {
     EXPECT_THAT(implied, IsEmpty());
 }
 
-// Deliberate: the need counts registrations, the match counts conditions.
+// Deliberate: the need counts registrations, the match count counts conditions.
 TEST_F(ReteTest, RegisteringTwiceOnOneConditionNeedsTwoMatches) {
     AndOperator& op = rule("a", "i");
     rs.addCondition("a", op);
@@ -351,7 +351,7 @@ TEST_F(ReteTest, RegisteringTwiceOnOneConditionNeedsTwoMatches) {
     EXPECT_THAT(implied, IsEmpty());
 }
 
-TEST_F(ReteTest, LiteralsLiveInTheMapAlonePatternsInTheTrieToo) {
+TEST_F(ReteTest, LiteralsAreOnlyInTheMapPatternsAlsoInTheTrie) {
     AndOperator& op = rule("abc", "i");
     rs.addCondition("ab*c", op);
     rs.addCondition("*x", op);
@@ -371,7 +371,7 @@ TEST_F(ReteTest, LiteralsLiveInTheMapAlonePatternsInTheTrieToo) {
     EXPECT_EQ(3, op._needMatch);
 }
 
-TEST_F(ReteTest, ATermMeetsOnlyPatternsWhosePrefixItBeginsWith) {
+TEST_F(ReteTest, CandidatesAreThePatternsWhosePrefixTheTermBeginsWith) {
     for (const char* const pattern : {"*z", "a*", "ab*", "abc*", "b*", "ab*z", "*"}) {
         rule(pattern, pattern);
     }
@@ -384,7 +384,7 @@ TEST_F(ReteTest, ATermMeetsOnlyPatternsWhosePrefixItBeginsWith) {
     EXPECT_THAT(implied, ElementsAre("*", "a*", "ab*"));
 }
 
-TEST_F(ReteTest, AResetLeavesItsCandidatesLikeASet) {
+TEST_F(ReteTest, AResetReturnsItsCandidatesLikeASet) {
     rule("a*", "i");
     rule("*b", "j");
     rule("b*", "k");
@@ -396,10 +396,10 @@ TEST_F(ReteTest, AResetLeavesItsCandidatesLikeASet) {
     EXPECT_EQ(rs._conditions.at("a*"), scratch[1]->second);
     const RuleSystem::Candidates before = scratch;
     rs.resetAll(implied);
-    EXPECT_EQ(before, scratch) << "it looks up with scratch space of its own";
+    EXPECT_EQ(before, scratch) << "resetAll uses its own scratch space";
 }
 
-TEST_F(ReteTest, AnEmptyTermMeetsThePatternsAtTheRoot) {
+TEST_F(ReteTest, TheCandidatesOfAnEmptyTermAreThePatternsAtTheRoot) {
     rule("*", "all");
     rule("*a", "a");
     rule("", "empty");
@@ -408,7 +408,7 @@ TEST_F(ReteTest, AnEmptyTermMeetsThePatternsAtTheRoot) {
     EXPECT_EQ(2u, scratch.size());
 }
 
-TEST_F(ReteTest, TellsWhetherATermMetAnything) {
+TEST_F(ReteTest, SetConditionReturnsWhetherAnyConditionMatched) {
     rule("a", "i");
     rule("b*", "j");
     EXPECT_TRUE(set("a"));
@@ -435,7 +435,7 @@ TEST_F(ReteTest, APatternsOwnTextSetsItThroughItsNameAndAsACandidate) {
     auto* const op = new OrOperator(nullptr, implication);
     rs.addCondition("*a", *op);
     EXPECT_TRUE(set("*a"));
-    EXPECT_EQ(2, op->asked);
+    EXPECT_EQ(2, op->calls);
     EXPECT_THAT(implied, ElementsAre("i"));
 }
 
@@ -452,7 +452,7 @@ TEST_F(ReteTest, APatternsOwnTextSetsItEvenIfTheMatcherDoesNotMatch) {
     EXPECT_THAT(implied, ElementsAre("i"));
 }
 
-TEST_F(ReteTest, TermsWithBytesFrom128) {
+TEST_F(ReteTest, TermsMayHaveBytesFrom128) {
     rule("\xe4*\xff", "i");
     EXPECT_TRUE(set("\xe4\x80\xff"));
     EXPECT_THAT(implied, ElementsAre("i"));
@@ -471,8 +471,8 @@ TEST_F(ReteTest, SettingAgainRecordsTheNameAgain) {
     EXPECT_THAT(rs._setConditions, ElementsAre("a"));
 }
 
-// Only what the rule system sets is recorded.
-TEST_F(ReteTest, AConditionThatIsSetByItselfIsNotRecorded) {
+// Only conditions that the rule system sets are recorded.
+TEST_F(ReteTest, AConditionThatIsSetDirectlyIsNotRecorded) {
     rule("a", "i");
     rs._conditions.at("a")->set(implied);
     EXPECT_THAT(implied, ElementsAre("i"));
@@ -552,7 +552,7 @@ TEST_F(ReteTest, ChildrenCountTheirParentsFiring) {
     EXPECT_EQ(1, child._matchCount);
 }
 
-TEST_F(ReteTest, AddChildLeavesTheChildsNeedAlone) {
+TEST_F(ReteTest, AddChildDoesNotChangeTheChildsNeed) {
     AndOperator& parent = rule("a", "parent");
     AndOperator& child = makeOperator("child");
     parent.addChild(child);
@@ -561,7 +561,7 @@ TEST_F(ReteTest, AddChildLeavesTheChildsNeedAlone) {
     EXPECT_EQ(0, child._matchCount);
     EXPECT_THAT(implied, ElementsAre("child", "parent"));
     reset("a");
-    EXPECT_THAT(implied, ElementsAre("child")) << "without a need it goes on firing";
+    EXPECT_THAT(implied, ElementsAre("child")) << "without a need it keeps firing";
 }
 
 TEST_F(ReteTest, ASharedChildIsUpdatedOncePerPath) {
@@ -574,15 +574,15 @@ TEST_F(ReteTest, ASharedChildIsUpdatedOncePerPath) {
     right.addChild(*shared);
     shared->incNeedMatch();
     set("a");
-    EXPECT_EQ(2, shared->asked);
+    EXPECT_EQ(2, shared->calls);
     EXPECT_THAT(implied, ElementsAre("left", "right", "shared", "top"));
     reset("a");
-    EXPECT_EQ(4, shared->asked);
+    EXPECT_EQ(4, shared->calls);
     EXPECT_THAT(implied, IsEmpty());
 }
 
 // Deliberate: implications have no owner.
-TEST_F(ReteTest, ASharedImplicationLeavesWithTheFirstThatCeasesToFire) {
+TEST_F(ReteTest, ASharedImplicationIsRemovedWhenTheFirstOperatorStopsFiring) {
     rule("a", "same");
     AndOperator& second = rule("b", "same");
     set("a");
@@ -593,8 +593,8 @@ TEST_F(ReteTest, ASharedImplicationLeavesWithTheFirstThatCeasesToFire) {
     EXPECT_TRUE(second.hasFired());
 }
 
-// The set lies at the end of the memory, so that looking at what would be its first element traps.
-TEST_F(ReteTest, TheSecondOfTwoOperatorsFindsItsImplicationGone) {
+// The set is at the end of accessible memory, so that reading its nonexistent first element traps.
+TEST_F(ReteTest, ASharedImplicationMayAlreadyBeRemoved) {
     const auto page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
     void* const memory =
         ::mmap(nullptr, 2 * page, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
@@ -618,7 +618,7 @@ TEST_F(ReteTest, TheSecondOfTwoOperatorsFindsItsImplicationGone) {
     ::munmap(memory, 2 * page);
 }
 
-TEST_F(ReteTest, ATermMayBelongToTheImplicationsItTakesOut) {
+TEST_F(ReteTest, ATermMayBeAnElementOfTheImplicationsThatItRemoves) {
     rule("a", "a");
     rule("a*", "a pattern on the same term");
     set("a");
@@ -627,7 +627,7 @@ TEST_F(ReteTest, ATermMayBelongToTheImplicationsItTakesOut) {
     EXPECT_THAT(implied, IsEmpty());
 }
 
-TEST_F(ReteTest, ClearRulesDeletesEverythingAndStartsAfresh) {
+TEST_F(ReteTest, ClearRulesDeletesEverythingAndNewRulesWork) {
     int destroyed = 0;
     std::string implication = "i";
     auto* const op = new OrOperator(nullptr, implication, &destroyed);
@@ -641,7 +641,7 @@ TEST_F(ReteTest, ClearRulesDeletesEverythingAndStartsAfresh) {
     EXPECT_TRUE(rs._conditions.empty());
     EXPECT_TRUE(rs._wildcardTrie._dataList.empty());
     EXPECT_EQ(nullptr, rs._wildcardTrie._children[int{'a'}]);
-    EXPECT_THAT(implied, ElementsAre("i")) << "the caller's set is the caller's";
+    EXPECT_THAT(implied, ElementsAre("i")) << "clearRules does not change the caller's set";
     implied.clear();
     EXPECT_FALSE(set("a"));
     EXPECT_THAT(scratch, IsEmpty());
@@ -662,7 +662,7 @@ TEST_F(ReteTest, DestructionDeletesOperatorsThroughTheirDestructor) {
     EXPECT_EQ(2, destroyed);
 }
 
-TEST_F(ReteTest, CopiesOfOperatorsAndConditionsStandAlone) {
+TEST_F(ReteTest, CopiesOfOperatorsAndConditionsAreIndependent) {
     std::string implication = "i";
     AndOperator child(nullptr, implication);
     auto original = std::make_unique<AndOperator>(nullptr, implication);
@@ -707,7 +707,7 @@ TEST_F(ReteDeathTest, CopyingASystemWithOperatorsIsAsserted) {
     EXPECT_DEATH(RuleSystem copy(rs), "failed assertion `_allOperators.empty\\(\\)'");
 }
 
-TEST_F(ReteTest, ARefusedPatternChangesNothing) {
+TEST_F(ReteTest, ARejectedPatternChangesNothing) {
     std::string pattern = "a";
     for (int i = 0; i < 256; ++i) {
         pattern += "*a";
@@ -733,7 +733,7 @@ TEST_F(ReteTest, PatternsOfStarsAreStoredAndMatchEveryTerm) {
     EXPECT_THAT(implied, ElementsAre("i"));
 }
 
-TEST_F(ReteTest, DescribesItself) {
+TEST_F(ReteTest, ToStringDescribesTheObject) {
     AndOperator& op = rule("a", "i");
     op.addImplication("j");
     EXPECT_EQ("AND 0/1 idle [i, j]", op.toString());
