@@ -63,6 +63,6 @@ expect_header "$prefix/include"
 unset PKG_CONFIG_PATH
 if ! pkg-config --exists xmlwrapp; then
     expect "none installed" 0 "xmlwrapp: substitute"
-    expect "none installed, one wanted" 1 "neither its package file nor pkg-config knows" \
+    expect "none installed, one wanted" 1 "neither its package file nor pkg-config finds" \
         -DQUELTA_XMLWRAPP=system
 fi
