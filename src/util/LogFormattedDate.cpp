@@ -70,7 +70,8 @@ void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsg
     char first[64];
     std::string larger;
     char* buf = first;
-    for (std::size_t size = sizeof(first);; size *= 2) {
+    std::size_t size = sizeof(first);
+    for (;;) {
         const std::size_t len = tm.ftime(buf, size, piece, mdata);
         if (len > 0 && len < size) {
             out.append(buf, len);
@@ -80,7 +81,8 @@ void appendPiece(std::string& out, CachedTm& tm, const char* piece, const LogMsg
             size >= std::max(MIN_BUFFER_CAP, CAP_PER_CHARACTER * std::strlen(piece))) {
             return;
         }
-        larger.resize(2 * size);
+        size *= 2;
+        larger.resize(size);
         buf = larger.data();
     }
 }

@@ -29,16 +29,17 @@ __attribute__((format(printf, 1, 0))) void formatText(const char* fmt, std::va_l
         va_copy(pass, ap);
         const int length = std::vsnprintf(buf, size, fmt, pass);
         va_end(pass);
-        if (length >= 0 && static_cast<std::size_t>(length) < size) {
+        const bool failed = length < 0;
+        if (!failed && static_cast<std::size_t>(length) < size) {
             use(std::string_view(buf, static_cast<std::size_t>(length)));
             return;
         }
-        // A negative length may mean that the buffer is too small. Doubling it until memory is
-        // exhausted would end in the same exception.
-        if (length < 0 && size >= MAX_GUESSED_SIZE) {
+        // A failure may mean that the buffer is too small. Doubling it until memory is exhausted
+        // would end in the same exception.
+        if (failed && size >= MAX_GUESSED_SIZE) {
             throw std::bad_alloc();
         }
-        size = length < 0 ? 2 * size : static_cast<std::size_t>(length) + 1;
+        size = failed ? 2 * size : static_cast<std::size_t>(length) + 1;
         larger.reset(new char[size]);
         buf = larger.get();
     }
