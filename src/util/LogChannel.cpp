@@ -54,8 +54,7 @@ LogChannel* LogChannel::find(const char* name, bool create) {
 
 bool LogChannel::changeLevel(const std::string& word) {
     for (int level = DEBUG; level <= EMERG; ++level) {
-        std::size_t length = 0;
-        if (word == loglevel2str(&length, static_cast<LogLevel>(level))) {
+        if (word == levelName(static_cast<LogLevel>(level))) {
             minlevel = static_cast<LogLevel>(level);
             return true;
         }

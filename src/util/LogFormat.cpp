@@ -169,12 +169,9 @@ void LogFormat::apply(std::string& out, const LogMsgMetadata& mdata, std::string
             case Atom::CATEGORY:
                 out.append(mdata.category->_channel_name, mdata.category->_channel_name_len);
                 break;
-            case Atom::LEVEL: {
-                std::size_t len = 0;
-                const char* const name = loglevel2str(&len, mdata.level);
-                out.append(name, len);
+            case Atom::LEVEL:
+                out.append(levelName(mdata.level));
                 break;
-            }
             case Atom::THREADNAME:
                 out.append(Thread::currentName());
                 break;

@@ -27,13 +27,17 @@ enum LogLevel : std::int32_t {
     EMERG = 8    // useful as a minimum, to discard everything; Logger has no entry point for it
 };
 
-// Returns: the name of a level, not padded; "???" for any other value. The text is a constant. Its
-// length in bytes replaces *slenp.
-// Requires: `slenp` is not null.
-inline const char* loglevel2str(std::size_t* slenp, LogLevel level) {
+// Returns: the name of a level, not padded; "???" for any other value. The text is a constant.
+inline std::string_view levelName(LogLevel level) {
     static constexpr std::string_view NAMES[] = {"DEBUG", "INFO",  "NOTICE", "WARN", "ERROR",
                                                  "CRIT",  "ALERT", "FATAL",  "EMERG"};
-    const std::string_view name = level >= DEBUG && level <= EMERG ? NAMES[level] : "???";
+    return level >= DEBUG && level <= EMERG ? NAMES[level] : "???";
+}
+
+// Returns: the name of a level as a NUL-terminated constant. Its length in bytes replaces *slenp.
+// Requires: `slenp` is not null.
+inline const char* loglevel2str(std::size_t* slenp, LogLevel level) {
+    const std::string_view name = levelName(level);
     *slenp = name.size();
     return name.data();
 }

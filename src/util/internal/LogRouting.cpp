@@ -18,8 +18,7 @@ namespace {
 
 // fallback_to_stderr without a string for the message.
 void writeToStderr(LogLevel level, std::string_view msg) noexcept try {
-    std::size_t length = 0;
-    std::string line = loglevel2str(&length, level);
+    std::string line(levelName(level));
     line.append(" - ").append(msg).append("\n");
     // One write, so that lines of several threads or processes do not mix.
     [[maybe_unused]] const ssize_t ignored = ::write(STDERR_FILENO, line.data(), line.size());
