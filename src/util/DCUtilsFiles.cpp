@@ -3,6 +3,7 @@
 #include <cstring>
 #include <memory>
 #include <new>
+#include <span>
 #include <utility>
 
 #include "util/DCUtils.h"
@@ -63,7 +64,7 @@ char* readText(const Pathname& filename) {
             std::copy_n(text.get(), used, larger.get());
             text = std::move(larger);
         }
-        text[used++] = static_cast<char>(c);
+        std::span(text.get(), capacity)[used++] = static_cast<char>(c);
     }
     text[used] = '\0';
     return text.release();
