@@ -1,6 +1,6 @@
 # Chooses the xmlwrapp to build with, and reports it. QUELTA_XMLWRAPP is
 #   auto        an installed xmlwrapp if there is one, otherwise the substitute (the default)
-#   system      an installed xmlwrapp; configuring fails if there is none
+#   system      an installed xmlwrapp; configuring fails without it
 #   substitute  src/xmlwrapp-substitute/
 # Either way the target is quelta::xmlwrapp and the include <xmlwrapp/node.h>.
 # Sets QUELTA_XMLWRAPP_CHOICE to system or substitute.

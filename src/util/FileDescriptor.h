@@ -91,7 +91,7 @@ public:
     // Requires: it is not the file that is read.
     bool copyTo(const Pathname& dest) const;
 
-    // Closes the descriptor; does nothing and returns true if there is none.
+    // Closes the descriptor; does nothing and returns true if it is negative.
     // Returns: whether the call returned 0. The descriptor is -1 afterwards in any case, because
     // the system releases it even if the call is interrupted.
     bool close();

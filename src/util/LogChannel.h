@@ -51,7 +51,7 @@ public:
     // Applies a configuration value: words separated by spaces, tabs and commas. All are applied,
     // even if one is rejected. The last level wins.
     // Requires: `value` is not null.
-    // Returns: true if every word was accepted, also if there is none.
+    // Returns: true if every word was accepted; true for an empty value.
     bool setConfig(const char* value);
 
     // Writes a message to the appenders, in the order of the list; does not test the level.

@@ -87,7 +87,7 @@ public:
     // empty.
     [[nodiscard]] Pathname toLeaf() const;
 
-    // Returns: the text after the last dot of the last element; empty if there is none, or if the
+    // Returns: the text after the last dot of the last element; empty without a dot, or if the
     // path ends in a dot or '/'.
     // Deliberate: a name's first dot counts (".bashrc" has the extension "bashrc"), though
     // basenameWithoutExt does not cut there.

@@ -140,7 +140,7 @@ bool WildcardMatcher::matches(const char* text, const char* end) const {
     if (_subStringCount > 0 && _subStrings[0] == nullptr) {
         return false;
     }
-    // Test the suffix first: it rejects most texts at once.
+    // Test the suffix first: it rejects most texts.
     const int last = _hardEnd ? _subStringCount - 1 : _subStringCount;
     std::size_t lastLength = 0;
     if (_hardEnd) {

@@ -43,7 +43,7 @@ public:
     // Returns: the number of calls so far.
     unsigned calls() const;
 
-    // Takes the next step of the latest script for `function`; PASS if there is none.
+    // Takes the next step of the latest script for `function`; PASS without one.
     static Step next(const char* function);
 
 private:

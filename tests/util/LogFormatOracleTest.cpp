@@ -21,7 +21,7 @@
 
 namespace {
 
-// Processor time stands still, so that "%u" can be compared.
+// The processor time is fixed, so that "%u" can be compared.
 const Replacement clockStandsStill(replacement::clock, [] { return std::clock_t{123456}; });
 
 constexpr long long EPOCH = 981000000;

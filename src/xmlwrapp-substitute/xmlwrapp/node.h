@@ -1,7 +1,7 @@
 #ifndef QUELTA_XMLWRAPP_SUBSTITUTE_XMLWRAPP_NODE_H_
 #define QUELTA_XMLWRAPP_SUBSTITUTE_XMLWRAPP_NODE_H_
 
-// The substitute for the xmlwrapp library where none is installed: one XML element with a name and
+// A substitute for the xmlwrapp library on systems without it: one XML element with a name and
 // text, held as a libxml2 tree.
 //
 //     xml::node element("component");
