@@ -1,6 +1,6 @@
 // Log lines: the logger compared with other logging libraries and with a bare write of the same
 // bytes. Each has a rotating file that holds every line when the call returns. Before a peer is
-// timed, lines of one thread and of four threads are read back and checked.
+// timed, the lines of one, four and sixteen threads are read back and checked.
 
 #include <unistd.h>
 
@@ -26,6 +26,7 @@ namespace fs = std::filesystem;
 constexpr std::size_t LINES = 720000;
 constexpr std::size_t QUICK_LINES = 24000;
 constexpr std::size_t BATCH = 1000;
+constexpr int THREADS[] = {1, 4, 16};
 
 // The log files of a run; deleted at the end. QUELTA_BENCH_DIR chooses another file system.
 class WorkDirectory {
@@ -118,7 +119,7 @@ void check(const bench::LogPeerEntry& entry, Layout layout) {
     const std::string file = directory + "/bench.log";
     const auto peer = entry.make();
     peer->open(directory, layout);
-    for (const int threads : {1, 4}) {
+    for (const int threads : THREADS) {
         const std::uintmax_t before = fs::exists(file) ? fs::file_size(file) : 0;
         writeFrom(*peer, threads, 500);
         checkLines(entry.name, layout, linesAfter(file, before),
@@ -181,7 +182,7 @@ void addPeer(const bench::LogPeerEntry& entry) {
     for (const Layout layout : {Layout::PLAIN, Layout::DATE}) {
         bench::progress("checking " + entry.name);
         check(entry, layout);
-        for (const int threads : {1, 4}) {
+        for (const int threads : THREADS) {
             bench::add(
                 std::string("log line ") + nameOf(layout), entry.name,
                 [&entry, layout](benchmark::State& state) { runLines(state, entry, layout); })
