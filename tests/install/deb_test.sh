@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: deb_test.sh BUILD-TREE UNIFORM-RANDOM-LIBRARY
-# Builds the Debian package, then installs, runs and removes it with dpkg in a scratch root. Uses
-# fakeroot when not run as root.
+# Builds the Debian packages, then installs, runs and removes them with dpkg in a scratch root. Uses
+# fakeroot when not run as root. Runs lintian if it is installed.
 set -eu
 here=$(CDPATH= cd -- "$(dirname -- "$0")" && pwd)
 build=$1
@@ -21,29 +21,56 @@ fail() {
 
 cpack --config "$build/CPackConfig.cmake" -B "$scratch/package" >"$scratch/cpack.log" 2>&1 ||
     fail "$(cat "$scratch/cpack.log")"
-set -- "$scratch"/package/quelta_*.deb
-[ $# -eq 1 ] && [ -f "$1" ] || fail "not one package: $*"
-deb=$1
+set -- "$scratch"/package/*.deb
+[ "$(for deb; do dpkg-deb --field "$deb" Package; done | xargs)" = "libquelta-dev libquelta1 quelta" ] ||
+    fail "other packages than the three: $*"
+
+if command -v lintian >/dev/null; then
+    lintian --allow-root --fail-on error "$@" >&2 ||
+        fail "lintian finds errors"
+fi
 
 # The scratch root has this machine's package list, so that dpkg checks dependencies. It has no file
-# lists, so dpkg prints harmless warnings.
+# lists, so dpkg prints harmless warnings. It has no shell, so the scripts that update the cache of
+# shared libraries run outside, with another ldconfig.
 mkdir -p "$root/var/lib/dpkg/info" "$root/var/lib/dpkg/updates"
 cp /var/lib/dpkg/status "$root/var/lib/dpkg/status"
+mkdir "$scratch/tools"
+printf '#!/bin/sh\necho called >>"%s"\n' "$scratch/ldconfig.log" >"$scratch/tools/ldconfig"
+chmod +x "$scratch/tools/ldconfig"
 in_root() {
-    dpkg --root="$root" --force-not-root "$@" >"$scratch/dpkg.log" 2>&1 ||
+    PATH=$scratch/tools:$PATH dpkg --root="$root" --force-not-root --force-script-chrootless "$@" >"$scratch/dpkg.log" 2>&1 ||
         fail "dpkg $*: $(grep -v 'files list file for package' "$scratch/dpkg.log")"
 }
 files_below() {
     (cd "$root" && find . -path ./var/lib/dpkg -prune -o ! -type d -print)
 }
 
-for library in libpopt0 libxml2 libstdc++6 libc6; do
-    dpkg-deb --field "$deb" Depends | grep -qF "$library (>=" || fail "does not depend on $library"
-done
+# expect_depends PACKAGE DEPENDENCY...
+expect_depends() {
+    depends=$(dpkg-deb --field "$scratch/package/$1"_*.deb Depends)
+    package=$1
+    shift
+    for dependency; do
+        case "$depends, " in
+        *"$dependency"[,\ ]*) ;;
+        *) fail "$package does not depend on $dependency but on $depends" ;;
+        esac
+    done
+}
+version=$(dpkg-deb --field "$1" Version)
+expect_depends quelta "libquelta1 (= $version)" libstdc++6 libc6
+expect_depends libquelta1 libpopt0 libxml2 libstdc++6 libc6
+expect_depends libquelta-dev "libquelta1 (= $version)" libpopt-dev pkgconf
 
-in_root --install "$deb"
-dpkg-query --admindir="$root/var/lib/dpkg" -W -f '${Status}\n' quelta 2>/dev/null |
-    grep -qx 'install ok installed' || fail "not installed"
+in_root --install "$@"
+for package in quelta libquelta1 libquelta-dev; do
+    dpkg-query --admindir="$root/var/lib/dpkg" -W -f '${Status}\n' $package 2>/dev/null |
+        grep -qx 'install ok installed' || fail "$package is not installed"
+done
+[ -s "$scratch/ldconfig.log" ] || fail "the cache of shared libraries is not updated"
+LD_LIBRARY_PATH=$(dirname "$(find "$root/usr/lib" -name libquelta_util.so.1)")
+export LD_LIBRARY_PATH
 
 home=$scratch/home
 cp -r "$root/usr/share/quelta/sample" "$home"
@@ -66,13 +93,15 @@ $expected) ;;
 *) fail "Rete printed: $out" ;;
 esac
 
+gunzip -r "$root/usr/share/man"
 grep -q "^cp -r /usr/share/quelta/sample " "$root/usr/share/man/man1/Rete.1" ||
     fail "Rete(1) does not name the installed sample"
-for page in man1/Rete.1 man5/log-cmdline.cfg.5; do
-    "$here/../man/page_test.sh" "$root/usr/share/man/$page" || fail "$page"
+for page in "$root"/usr/share/man/man*/*; do
+    "$here/../man/page_test.sh" "$page" || fail "$page"
 done
+gzip -r "$root/usr/share/man"
 
-in_root --purge quelta
+in_root --purge quelta libquelta-dev libquelta1
 left=$(files_below)
 [ -z "$left" ] || fail "files are left: $left"
 [ ! -e "$root/usr/share/quelta" ] && [ ! -e "$root/usr/include/quelta" ] ||

@@ -1,7 +1,7 @@
 #!/bin/sh
 # Usage: install_test.sh BUILD-TREE CXX [compiler flags]
-# Installs the build tree under a scratch prefix, builds and runs a program against it with CMake
-# and with pkg-config, and configures a project that includes the sources as a subdirectory.
+# Installs the build tree, of static or of shared libraries, under a scratch prefix. Builds and runs
+# programs against it, with CMake and with pkg-config, and asks for components that are missing.
 set -eu
 build=$1
 cxx=$2
@@ -19,16 +19,19 @@ fail() {
 cmake --install "$build" --prefix "$prefix" >"$scratch/install.log" ||
     fail "$(cat "$scratch/install.log")"
 
-for file in bin/Rete include/quelta/util/LoaderInfo.h include/quelta/util/Logger.h \
+for file in bin/Rete include/quelta/util/LoaderInfo.h \
+    include/quelta/util/Logger.h include/quelta/util/Version.h \
     include/quelta/services/pipeline/indexprocessor/Rete.h share/man/man1/Rete.1 \
-    share/man/man5/log-cmdline.cfg.5 share/quelta/sample/etc/log-cmdline.cfg; do
+    share/man/man5/log-cmdline.cfg.5 \
+    share/quelta/sample/etc/log-cmdline.cfg; do
     [ -s "$prefix/$file" ] || fail "missing: $file"
 done
 [ ! -e "$prefix/include/quelta/util/internal" ] || fail "internal headers are installed"
-for link in $(grep -o ']([^)]*)' "$prefix/share/doc/quelta/README.md" | tr -d ']()'); do
-    [ -e "$prefix/share/doc/quelta/$link" ] || fail "the README links to $link"
+documents=$(dirname "$(find "$prefix/share/doc" -name README.md)")
+for link in $(grep -o ']([^)]*)' "$documents/README.md" | tr -d ']()'); do
+    [ -e "$documents/$link" ] || fail "the README links to $link"
 done
-[ ! -d "$here/../../build/docs/html" ] || [ -s "$prefix/share/doc/quelta/api/index.html" ] ||
+[ ! -d "$here/../../build/docs/html" ] || [ -s "$documents/api/index.html" ] ||
     fail "the API reference is built but not installed"
 for directory in share/quelta/sample/etc/myinstall share/quelta/sample/var/log; do
     [ -d "$prefix/$directory" ] || fail "missing: $directory"
@@ -42,6 +45,10 @@ source=$(CDPATH= cd -- "$here/../.." && pwd)
 if grep -rIl -e "$source" -e "$build" "$prefix"; then
     fail "these files refer to the source or the build tree"
 fi
+
+pc=$(dirname "$(find "$prefix" -name quelta-util.pc)")
+# For the shared libraries; they are beside the directory of the pkg-config files.
+export LD_LIBRARY_PATH="$pc/.."
 
 status=0
 out=$(env -u QUELTA_HOME "$prefix/bin/Rete") || status=$?
@@ -61,29 +68,60 @@ it fired"
         fail "the program built with $1 did not log"
 }
 
-cmake -S "$here/consumer" -B "$scratch/consumer" -DCMAKE_PREFIX_PATH="$prefix" \
-    -DCMAKE_CXX_COMPILER="$cxx" -DCMAKE_CXX_FLAGS="$flags" >"$scratch/cmake.log" 2>&1 &&
-    cmake --build "$scratch/consumer" >>"$scratch/cmake.log" 2>&1 ||
-    fail "$(cat "$scratch/cmake.log")"
-expect_consumer cmake "$scratch/consumer/consumer"
+# configure NAME [ARGUMENT...]: configures a project that uses the installed libraries.
+configure() {
+    name=$1
+    shift
+    cmake -S "$scratch/$name" -B "$scratch/$name/build" -DCMAKE_PREFIX_PATH="$prefix" \
+        -DCMAKE_CXX_COMPILER="$cxx" -DCMAKE_CXX_FLAGS="$flags" "$@" >"$scratch/cmake.log" 2>&1
+}
 
-PKG_CONFIG_PATH=$(dirname "$(find "$prefix" -name quelta.pc)")
-export PKG_CONFIG_PATH
+cp -r "$here/consumer" "$here/collision" "$scratch"
+configure consumer &&
+    cmake --build "$scratch/consumer/build" --target consumer >>"$scratch/cmake.log" 2>&1 ||
+    fail "$(cat "$scratch/cmake.log")"
+expect_consumer cmake "$scratch/consumer/build/consumer"
+
+export PKG_CONFIG_PATH="$pc"
 # shellcheck disable=SC2046,SC2086  # lists of words on purpose
 "$cxx" -std=c++20 $flags "$here/consumer/consumer.cpp" -o "$scratch/by-pkg-config" \
-    $(pkg-config --cflags --libs quelta) || fail "building by pkg-config"
+    $(pkg-config --cflags --libs quelta-rete quelta-loader) || fail "building by pkg-config"
 expect_consumer pkg-config "$scratch/by-pkg-config"
 
-mkdir "$scratch/parent"
-cat >"$scratch/parent/CMakeLists.txt" <<END
-cmake_minimum_required(VERSION 3.25)
-project(parent LANGUAGES CXX)
-add_subdirectory("$source" quelta)
-add_executable(consumer "$here/consumer/consumer.cpp")
-target_link_libraries(consumer PRIVATE quelta::rete quelta::loader quelta::util)
-if(TARGET rule_console OR TARGET ReteTest)
-  message(FATAL_ERROR "examples or tests are built for a parent project")
-endif()
-END
-cmake -S "$scratch/parent" -B "$scratch/parent/build" -DCMAKE_CXX_COMPILER="$cxx" \
-    >"$scratch/cmake.log" 2>&1 || fail "$(cat "$scratch/cmake.log")"
+# With shared libraries, a program may have classes of the library's names.
+if [ -n "$(find "$prefix" -name 'libquelta_util.so.1')" ]; then
+    cmake --build "$scratch/consumer/build" --target collision >"$scratch/cmake.log" 2>&1 ||
+        fail "$(cat "$scratch/cmake.log")"
+    out=$("$scratch/consumer/build/collision") || fail "the program with a class Mutex exited with $?"
+    [ "$out" = "lock of the program
+unlock of the program
+worker" ] || fail "the library used the program's class Mutex: $out"
+fi
+
+# Components
+find_project() {
+    mkdir -p "$scratch/$1"
+    printf '%s\n' 'cmake_minimum_required(VERSION 3.25)' 'project(finder LANGUAGES CXX)' \
+        "find_package(quelta 1.0 REQUIRED $2)" 'message(STATUS "loader: ${quelta_loader_FOUND}")' \
+        >"$scratch/$1/CMakeLists.txt"
+}
+expect_message() {
+    tr -s '\n ' ' ' <"$scratch/cmake.log" | grep -qF "$1" ||
+        fail "expected '$1', but CMake printed: $(cat "$scratch/cmake.log")"
+}
+find_project some "COMPONENTS util rete"
+find_project all ""
+find_project loader "COMPONENTS loader"
+find_project nonsense "COMPONENTS nonsense"
+configure all || fail "$(cat "$scratch/cmake.log")"
+expect_message "loader: TRUE"
+rm -r "$scratch/all/build"
+export PKG_CONFIG_LIBDIR=/nowhere
+unset PKG_CONFIG_PATH
+configure some -DCMAKE_DISABLE_FIND_PACKAGE_LibXml2=ON || fail "$(cat "$scratch/cmake.log")"
+configure all || fail "$(cat "$scratch/cmake.log")"
+expect_message "loader: FALSE"
+! configure loader || fail "the loader was found without popt"
+expect_message "the component loader needs what is missing here: popt (found by pkg-config)"
+! configure nonsense || fail "the component nonsense was found"
+expect_message '"nonsense" is not one of the components util, rete and loader'

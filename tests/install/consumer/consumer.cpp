@@ -3,12 +3,18 @@
 
 #include <cstdio>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
 #include "services/pipeline/indexprocessor/Rete.h"
 #include "util/LoaderInfo.h"
 #include "util/Logger.h"
+#include "util/Version.h"
+
+#ifdef EXPECTED_VERSION
+static_assert(std::string_view(QUELTA_VERSION) == EXPECTED_VERSION);
+#endif
 
 int main(int argc, char** argv, char** envp) {
     LoaderInfo::common_main_setup(argc, argv, envp);

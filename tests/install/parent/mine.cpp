@@ -1,0 +1,5 @@
+#include "mine.h"
+
+bool matchesAll(const char* text) {
+    return WildcardMatcher("*").isMatch(text);
+}

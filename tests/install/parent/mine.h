@@ -1,0 +1,4 @@
+#pragma once
+#include "util/WildcardMatcher.h"
+
+bool matchesAll(const char* text);
