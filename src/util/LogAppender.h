@@ -28,8 +28,8 @@
 // describe the file that `_fd` refers to and mean nothing while it is closed. An appender without a
 // file name writes to the descriptor that it has and is never rotated.
 //
-// A fork waits for the lines that named appenders are writing. The child finds them unlocked and
-// may log, too.
+// A fork waits until no appender is writing a line. The child finds all of them unlocked and may
+// log, too.
 //
 // Configured before other threads start; safe from any thread afterwards (serialised by `_mutex`).
 
