@@ -41,12 +41,12 @@ public:
     // interrupts is repeated.
     // Returns: the number of bytes read. Fewer than `len` mean end of file, or an error after these
     // bytes; 0 means end of file; -1 means an error before the first byte.
-    // Deliberate: an error after some bytes is not reported; the next call will meet it.
+    // Deliberate: an error after some bytes is not reported; the next call returns it.
     [[nodiscard]] ssize_t read(void* buf, unsigned long len) const;
     // Writes `len` bytes, or a whole text, in the same way.
     // Returns: the number of bytes written. Fewer than given mean that the file takes no more, or
     // an error after these bytes; -1 means an error before the first byte.
-    // Deliberate: an error after some bytes is not reported; the next call will meet it.
+    // Deliberate: an error after some bytes is not reported; the next call returns it.
     [[nodiscard]] ssize_t write(const void* buf, unsigned long len) const;
     [[nodiscard]] ssize_t write(const std::string& text) const;
     // Writes `count` buffers with a single call.
@@ -61,7 +61,7 @@ public:
     void format(const char* fmt, ...) const __attribute__((format(printf, 2, 3)));
 
     // Makes the descriptor close (or stay open) when the process executes another program; does
-    // nothing if the flag is already so or cannot be changed.
+    // nothing if the flag is already as wanted or cannot be changed.
     void setCloseOnExec(bool on) const;
 
     // Fills *result by fstat.
@@ -123,7 +123,7 @@ public:
     // Closes the file, if there is one. errno is kept.
     ~ScopedFileDescriptor() { close_saveErrno(); }
 
-    // Closes the present file, if there is one, and takes over an open one. errno is kept.
+    // Closes the current file, if there is one, and takes over an open one. errno is kept.
     ScopedFileDescriptor& operator=(const FileDescriptor& other);
     ScopedFileDescriptor& operator=(const ScopedFileDescriptor& other);
     // Deleted: the temporary owner that a path converts to would close what is assigned.
@@ -145,7 +145,7 @@ public:
     // Closes the file, if there is one. errno is kept.
     ~ScopedSaferFileDescriptor() { close_saveErrno(); }
 
-    // Closes the present file, if there is one, and takes over an open one. errno is kept.
+    // Closes the current file, if there is one, and takes over an open one. errno is kept.
     ScopedSaferFileDescriptor& operator=(const FileDescriptor& other);
     ScopedSaferFileDescriptor& operator=(const ScopedSaferFileDescriptor& other);
     // Deleted: the temporary owner that a path converts to would close what is assigned.

@@ -211,6 +211,7 @@ void LogAppender::write(const LogMsgMetadata& mdata, std::string_view msg) {
         writeLine(line, mdata.stamp.sec());
         failure = std::exchange(_failure, {});
     }
+    // The report may fail in another appender. That one's report must not come back to this one.
     const ReportMark mark(this);
     report(failure);
 }

@@ -28,8 +28,8 @@
 // describe the file that `_fd` refers to and mean nothing while it is closed. An appender without a
 // file name writes to the descriptor that it has and is never rotated.
 //
-// A fork waits for the lines that named appenders are writing. The child finds them unlocked and
-// may log, too.
+// A fork waits until no appender is writing a line. The child finds all of them unlocked and may
+// log, too.
 //
 // Configured before other threads start; safe from any thread afterwards (serialised by `_mutex`).
 
@@ -83,7 +83,8 @@ public:
     // Ends the configuration. An appender without a layout takes the root appender's, and one
     // without a file writes to standard error. Settings that make no sense are reset with a
     // warning. The file is opened once, so that a bad path shows at start-up and not with the first
-    // message. `name` (not null) is used in the warnings.
+    // message. `name` (not null) is used in the warnings. Logger::initialize(file, home) calls this
+    // for every named appender after it has read the file.
     void finalSetup(const char* name);
 
     // Formats one line and writes it, then rotates the file if it is larger than its limit. Message

@@ -1,7 +1,7 @@
 #ifndef QUELTA_UTIL_LOGMSGMETADATA_H_
 #define QUELTA_UTIL_LOGMSGMETADATA_H_
 
-// What is known of a message besides its text.
+// The time, the logger and the level of a message: everything except its text.
 //
 //     #include "util/Logger.h"
 //     static const Logger logger("Queue");

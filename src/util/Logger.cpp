@@ -17,8 +17,9 @@
 
 Logger::Logger(const char* name)
     : _channel_name(name), _channel_name_len(std::strlen(name)), _channel(nullptr), _next(nullptr) {
-    // A static object whose constructor has ended before this one begins is destroyed after this
-    // logger. So the root appender's descriptor is closed after the last message of this logger.
+    // Static objects are destroyed in the reverse order of their construction. This call constructs
+    // the root appender before the logger, at the latest. So the root appender closes its
+    // descriptor after the logger's last message.
     rootAppender();
     if (logger_initialized) {
         _channel = LogChannel::find(name, false);

@@ -95,13 +95,12 @@ Thread::~Thread() {
     }
 }
 
-// Makes sure that the thread, which will never be joined, stops using this object. If the thread is
-// still waiting for go(), it is woken to end, and this function returns once it has stopped
-// waiting. Without that, the destructor of the condition would block for ever, because it has a
-// waiter.
+// Makes the thread, which will never be joined, stop using this object.
 void Thread::abandon() {
     ready_to_run_lock.lock();
     if (_start == STARTING) {
+        // The thread has not passed its wait for go(). It ends without calling main(). Wait for
+        // that, because the destructor of a condition blocks while a thread waits on it.
         _start = ABANDONED;
         _ready_to_run_cond.wake_all();
         while (_start == ABANDONED) {
@@ -109,6 +108,7 @@ void Thread::abandon() {
         }
     }
     ready_to_run_lock.unlock();
+    // The system frees a thread's stack only after a join or a detach.
     ::pthread_detach(_token._token);
 }
 
@@ -152,6 +152,7 @@ void* Thread::callMain(void* arg) {
     const bool abandoned = thr->_start == ABANDONED;
     thr->_start = STARTED;
     if (abandoned) {
+        // Wakes abandon(). The object may be destroyed as soon as the lock is free.
         thr->_ready_to_run_cond.wake_all();
     }
     ready_to_run_lock.unlock();

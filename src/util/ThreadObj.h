@@ -65,7 +65,7 @@ public:
     // Destroys the object of a thread that has ended.
     // Requires: joined (asserted), unless mainThreadDying() was called.
     // Deliberate: after mainThreadDying() a worker that has not started never runs. The destructor
-    // waits until its thread has left the start.
+    // returns after its thread has stopped waiting for go().
     virtual ~Thread();
     Thread(const Thread&) = delete;
     Thread& operator=(const Thread&) = delete;

@@ -7,7 +7,7 @@
 //     Timeval deadline = start;
 //     deadline.addMsec(1500);
 //     std::printf("%lld ms left\n", Timeval::msecDifference(deadline, Timeval::now()));
-//     std::printf("%s gone\n", start.describeSince().c_str());
+//     std::printf("%s elapsed\n", start.describeSince().c_str());
 //
 // Additions saturate at one largest instant, 2147483647 s and 999999 us, so that it does not depend
 // on the width of time_t. After every operation 0 <= _tv.tv_usec <= 999999.

@@ -153,6 +153,8 @@ bool WildcardMatcher::matches(const char* text, const char* end) const {
     if (_isWord != 0) {
         return text + lastLength == end;
     }
+    // A hard start must begin the text. Each other segment, except a hard end, is taken at its
+    // first occurrence after the one before.
     const char* cursor = text;
     int i = 0;
     if (_hardStart) {
@@ -175,6 +177,7 @@ bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& su
     if (_isWord != 0) {
         return isMatch(haystack);
     }
+    // `cursor` is the end of what has matched so far, `i` the next segment.
     const char* cursor = haystack;
     int i = 0;
     bool matched = true;
@@ -202,6 +205,7 @@ bool WildcardMatcher::isMatch(const char* haystack, std::vector<std::string>& su
         substrs.emplace_back(cursor);
         return matched;
     }
+    // The last segment must end the text. Each earlier occurrence splits what the last star covers.
     do {
         matched = matched && advance(_subStrings[limit]);
     } while (matched && *cursor != '\0');

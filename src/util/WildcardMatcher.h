@@ -17,7 +17,7 @@
 //
 // Invariants of an object that was never assigned to: the segments fill _subStrings from the front
 // without a gap and none is empty; _isWord is 1 exactly when there is one segment and both hard
-// flags are set. An object that had segments when it was assigned to keeps null entries in front.
+// flags are set. An object that had segments when it was assigned to starts with null entries.
 // Both pattern copies belong to the object.
 //
 // Immutable after construction; safe to share. The exception is assignment.
@@ -58,8 +58,8 @@ public:
     // Compiles the other's pattern text on top of what this object holds.
     // Deliberate: this is not a reset. The segment table is emptied, but count and flags stay. The
     // new segments are placed after the old count, and the earlier pattern copies stay allocated
-    // for the life of the process. An object that had segments therefore matches nothing any more,
-    // since a null entry never matches. Self-assignment is a no-op.
+    // for the life of the process. An object that had segments therefore no longer matches any
+    // text, since a null entry never matches. Self-assignment is a no-op.
     // Errors: std::length_error if the segments together exceed MAX_SUBSTRINGS; the object is
     // unchanged then. std::bad_alloc; it matches as before then.
     WildcardMatcher& operator=(const WildcardMatcher& other);
@@ -74,7 +74,7 @@ public:
     // Cost: no allocation.
     bool isMatch(const char* haystack) const;
 
-    // Returns: whether the whole of a text matches whose length in bytes, up to its NUL, is known.
+    // Tests in the same way, for callers that already have the length of `haystack` in bytes.
     bool isMatch(const char* haystack, std::size_t length) const;
 
     // Prefetches what isMatch reads of the object, for callers that try many matchers in a row.

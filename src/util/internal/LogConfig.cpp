@@ -198,14 +198,15 @@ bool read_line(std::string& result, std::FILE* ifile) {
     while (!result.ends_with('\n')) {
         // fgets does not return the length, and the text may contain NUL bytes. The buffer is
         // therefore filled with newlines first. The last NUL in it is then the one that fgets
-        // appended. fgets appends none if a signal interrupts it.
+        // appended.
         std::memset(buf, '\n', sizeof(buf));
         const char* const p = std::fgets(buf, sizeof(buf), ifile);
         if (p != nullptr) {
             QUELTA_ASSERT(p == buf);
             result += filled.substr(0, filled.rfind('\0'));
         } else if (wasInterrupted(ifile)) {
-            result += filled.substr(0, filled.find('\n'));  // read before the signal
+            // fgets has appended no NUL. What it read before the signal ends where the fill begins.
+            result += filled.substr(0, filled.find('\n'));
         } else {
             return !result.empty();
         }

@@ -67,7 +67,7 @@ private:
     const Pathname& _queltaHome;
     unsigned _lineno = 0;                   // of the last line read
     unsigned _openComment = 0;              // line of the unterminated comment; 0: none
-    NumberedText _root = {0, {}};           // the value of the last rootCategory line; 0: none
+    NumberedText _root = {0, {}};           // value of the last rootCategory line; lineno 0: none
     std::vector<NumberedText> _categories;  // category lines, without "category."
     std::vector<NumberedText> _errors;      // in the order in which they are reported
 };

@@ -79,6 +79,8 @@ void LogFormat::internal(const LogAppender* failing, LogLevel level, const char*
     static constinit NeverDestroyed<LogChannel> empty_channel;
 
     const ErrnoKeeper errnoKeeper;
+    // Before initialization the logger has no channel. An empty one is used then, which writes to
+    // the root appender.
     LogChannel& channel =
         logger.value._channel != nullptr ? *logger.value._channel : empty_channel.value;
     if (level < channel.minlevel) {

@@ -3,7 +3,7 @@
 
 // The operators of the rule network. An operator counts its matches and fires when they suffice.
 // While it fires, its implications are in the caller's set and it is a match of each child. AND
-// operators come with the network; a class of one's own gives shouldFire another meaning:
+// operators come with the network; derive a class to give shouldFire another meaning:
 //
 //     class OrOperator : public BoolOperator {
 //     public:
@@ -136,7 +136,7 @@ protected:
 // Fires while all the matches that it needs are present; without needs, from its first update.
 class AndOperator : public BoolOperator {
 public:
-    // An operator as by BoolOperator's constructor.
+    // See BoolOperator's constructor.
     AndOperator(BoolOperator* parent, std::string& implication)
         : BoolOperator(parent, implication) {
         _type = AND_OPERATOR;
