@@ -125,3 +125,8 @@ expect_message "loader: FALSE"
 expect_message "the component loader needs what is missing here: popt (found by pkg-config)"
 ! configure nonsense || fail "the component nonsense was found"
 expect_message '"nonsense" is not one of the components util, rete and loader'
+
+cmake --build "$build" --target uninstall >"$scratch/cmake.log" 2>&1 ||
+    fail "$(cat "$scratch/cmake.log")"
+left=$(find "$prefix" -type f -o -type l)
+[ -z "$left" ] || fail "uninstall leaves: $left"
