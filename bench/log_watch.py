@@ -4,10 +4,11 @@
 Usage: bench/log_watch.py LOG_WATCH [ROUNDS]
 
 Makes a log of which one line in a hundred is a failed login that a rule describes, and 10, 1,000 and
-30,000 such rules. Checks that all programs find the same lines, runs them in turn, and prints the
+30,000 such rules. Runs the programs in turn, checks that they find the same lines, and prints the
 medians as a table, in lines per second of the whole process. All of them write the lines that they
 find to a file; log_watch also logs them.
 """
+import itertools
 import os
 import pathlib
 import random
@@ -18,7 +19,7 @@ import tempfile
 import time
 
 LINES = 1_000_000
-SLOW_LINES = 20_000  # for the many rules that must all be tried for each line
+SHORT = 20_000  # lines, where many rules must all be tried for each
 RULES = (10, 1_000, 30_000)
 MESSAGES = (
     'CRON[811]: (root) CMD (test -x /usr/sbin/anacron)',
@@ -53,7 +54,7 @@ def run(command, log, directory):
     environment = {'PATH': os.environ['PATH'], 'LC_ALL': 'C', 'QUELTA_HOME': str(directory),
                    'QUELTA_DB': str(directory)}
     output = directory / 'output'
-    with log.open() as source, output.open('w') as found:
+    with (directory / log).open() as source, output.open('w') as found:
         start = time.monotonic()
         subprocess.run(command, stdin=source, stdout=found, cwd=directory, env=environment,
                        check=True)
@@ -63,34 +64,36 @@ def run(command, log, directory):
     return lines, seconds
 
 
-def compare(count, log_watch, rounds, directory):
+def make_inputs(directory, count):
+    """Makes the rules, and the logs `log` and `short`, which is its start."""
     generator = random.Random(count)
-    names = sorted({''.join(generator.choices('abcdefghijklmnopqrstuvwxyz', k=8))
-                    for _ in range(count)})
-    log = directory / 'log'
-    write_log(log, names, generator)
+    names = [''.join(generator.choices('abcdefghijklmnopqrstuvwxyz', k=8)) for _ in range(count)]
     write_rules(directory, names)
-    start = directory / 'start'
-    with log.open() as lines, start.open('w') as copy:
-        copy.writelines(line for line, _ in zip(lines, range(SLOW_LINES)))
+    write_log(directory / 'log', names, generator)
+    with (directory / 'log').open() as log, (directory / 'short').open('w') as short:
+        short.writelines(itertools.islice(log, SHORT))
+
+
+def compare(log_watch, count, rounds, directory):
+    make_inputs(directory, count)
     watch = [log_watch, '--', '-w', '1']
-    few, slow = (log, LINES), (start, SLOW_LINES)
-    commands = {
-        'log_watch, `text*` after `-f 5`': (watch + ['-f', '5', 'prefix'], *few),
-        'log_watch, `*text*`': (watch + ['inside'], *(slow if count > 1000 else few)),
-        'grep -F': (['grep', '-F', '-f', 'fixed'], *few),
-        'grep -E, `text.*port`': (['grep', '-E', '-f', 'expressions'], *few),
+    programs = {
+        'log_watch, `text*` after `-f 5`': (watch + ['-f', '5', 'prefix'], 'log'),
+        'log_watch, `*text*`': (watch + ['inside'], 'log' if count <= 1_000 else 'short'),
+        'grep -F': (['grep', '-F', '-f', 'fixed'], 'log'),
+        'grep -E, `text.*port`': (['grep', '-E', '-f', 'expressions'], 'log'),
     }
-    expected = [run(commands['grep -F'][0], file, directory)[0] for file in (log, start)]
-    for name, (command, file, _) in commands.items():
-        if run(command, file, directory)[0] != expected[file is start]:
-            sys.exit(f'{name} finds other lines than grep -F')
-    results = {name: [] for name in commands}
+    expected = {log: run(programs['grep -F'][0], log, directory)[0] for log in ('log', 'short')}
+    times = {name: [] for name in programs}
     for _ in range(rounds):
-        for name, (command, file, lines) in commands.items():
-            results[name].append(lines / run(command, file, directory)[1])
-    for name, values in results.items():
-        print(f'| {count:,} | {name} | {statistics.median(values):,.0f} |', flush=True)
+        for name, (command, log) in programs.items():
+            found, seconds = run(command, log, directory)
+            if found != expected[log]:
+                sys.exit(f'{name} finds other lines than grep -F')
+            times[name].append(seconds)
+    for name, (_, log) in programs.items():
+        speed = (LINES if log == 'log' else SHORT) / statistics.median(times[name])
+        print(f'| {count:,} | {name} | {speed:,.0f} |', flush=True)
 
 
 def main():
@@ -105,7 +108,7 @@ def main():
         (directory / 'var/log').mkdir(parents=True)
         (directory / 'etc/log-cmdline.cfg').touch()
         for count in RULES:
-            compare(count, str(log_watch), rounds, directory)
+            compare(str(log_watch), count, rounds, directory)
 
 
 main()

@@ -9,6 +9,7 @@
 #include <filesystem>
 #include <fstream>
 #include <future>
+#include <iterator>
 #include <regex>
 #include <sstream>
 #include <string>
@@ -22,11 +23,21 @@
 
 namespace {
 
-// Waits at most 20 seconds until the file contains the text.
+// The last kilobytes of a file; nothing if there is no such file.
+std::string endOf(const std::string& file) {
+    std::ifstream in(file, std::ios::ate);
+    if (!in) {
+        return "";
+    }
+    in.seekg(std::max<std::streamoff>(in.tellg() - std::streamoff(4096), 0));
+    return std::string(std::istreambuf_iterator<char>(in), {});
+}
+
+// Waits at most 20 seconds until the end of the file contains the text.
 testing::AssertionResult waitFor(const std::string& file, const std::string& text) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
     while (std::chrono::steady_clock::now() < deadline) {
-        if (std::filesystem::exists(file) && readFile(file).find(text) != std::string::npos) {
+        if (endOf(file).find(text) != std::string::npos) {
             return testing::AssertionSuccess();
         }
         std::this_thread::sleep_for(std::chrono::milliseconds(20));
@@ -290,6 +301,17 @@ TEST_F(LogWatchTest, EndsWhenItsOutputCannotBeWritten) {
     const ProgramRun run = watch({"rules"}).input("match\n").outputTo("/dev/full").run();
     EXPECT_EQ(1, run.status);
     EXPECT_EQ("log_watch: cannot write standard output\n", run.err);
+}
+
+TEST_F(LogWatchTest, DoesWhatTheTutorialShows) {
+    const std::string page = "docs/log-watch.md";
+    rules(shownAfter(page, "cat rules"));
+    const ProgramRun run =
+        watch({"-f", "4", "-w", "3", "rules"}).input(shownAfter(page, "cat sample.log")).run();
+    EXPECT_EQ("", run.err);
+    std::string out = run.out;
+    out.replace(out.find(_dir.path()), _dir.path().size(), "/home/me/quelta-home");
+    EXPECT_EQ(shownAfter(page, "log_watch -- -f 4 -w 3 rules <sample.log"), out);
 }
 
 }  // namespace
