@@ -1,78 +1,30 @@
 // Usage: rule_console RULES
-// Reads rules from a file, then terms from standard input, one to a line. Prints what each term
-// changes: "+ implication" when a rule fires, "- implication" when it stops firing.
+//        rule_console --graph RULES
+// Reads rules from a file (Rules.h describes it), then terms from standard input, one to a line.
+// Prints what each term changes: "+ implication" when a rule fires, "- implication" when it stops
+// firing.
 //
-//     implication: condition, condition    a rule; `*` in a condition matches any characters
-//     term                                 sets the conditions that match the term
-//     -term                                resets them
-//     !                                    resets all conditions
+//     term     sets the conditions that match the term
+//     -term    resets them
+//     !        resets all conditions
 //
-// Empty lines, and lines of the file that start with `#`, are ignored. The term `meta::all` is set
-// at the start and after each `!`.
+// Empty lines are ignored. The term `meta::all` is set at the start and after each `!`.
+// With --graph it prints the rules as a graph in the language of Graphviz, and reads no terms.
 
 #include <algorithm>
-#include <fstream>
+#include <exception>
+#include <iomanip>
 #include <iostream>
 #include <iterator>
 #include <memory>
-#include <sstream>
-#include <stdexcept>
 #include <string>
 
+#include "Rules.h"
 #include "services/pipeline/indexprocessor/Rete.h"
+#include "util/DCUtils.h"
+#include "util/Pathname.h"
 
 namespace {
-
-std::string trimmed(const std::string& text) {
-    const std::size_t first = text.find_first_not_of(" \t\r");
-    if (first == std::string::npos) {
-        return "";
-    }
-    return text.substr(first, text.find_last_not_of(" \t\r") - first + 1);
-}
-
-// A rule is an operator that all conditions feed and that implies one text.
-void addRule(RuleSystem& rules, const std::string& line) {
-    const std::size_t colon = line.find(':');
-    std::string implication = trimmed(line.substr(0, colon));
-    if (colon == std::string::npos || implication.empty()) {
-        throw std::runtime_error("expected \"implication: condition, ...\"");
-    }
-    auto owner = std::make_unique<AndOperator>(nullptr, implication);
-    AndOperator& op = *owner;
-    rules.addOperator(op);
-    owner.release();  // rules owns it now, even if a condition is refused
-
-    std::istringstream conditions(line.substr(colon + 1));
-    for (std::string condition; std::getline(conditions, condition, ',');) {
-        condition = trimmed(condition);
-        if (condition.empty()) {
-            throw std::runtime_error("a condition is empty");
-        }
-        rules.addCondition(condition, op);
-    }
-}
-
-void readRules(RuleSystem& rules, const char* path) {
-    std::ifstream file(path);
-    if (!file) {
-        throw std::runtime_error(std::string(path) + ": cannot be read");
-    }
-    unsigned number = 0;
-    for (std::string line; std::getline(file, line);) {
-        ++number;
-        line = trimmed(line);
-        if (line.empty() || line[0] == '#') {
-            continue;
-        }
-        try {
-            addRule(rules, line);
-        } catch (const std::exception& e) {
-            throw std::runtime_error(std::string(path) + ':' + std::to_string(number) + ": " +
-                                     e.what());
-        }
-    }
-}
 
 void printChanges(const StringSet& before, const StringSet& after) {
     StringSet changed;
@@ -95,33 +47,59 @@ void handle(RuleSystem& rules, const std::string& line, StringSet& implications)
     if (line == "!") {
         rules.resetAll(implications);
     } else if (line[0] == '-') {
-        rules.resetCondition(trimmed(line.substr(1)), candidates, implications);
+        rules.resetCondition(strip(line.substr(1)), candidates, implications);
     } else {
         rules.setCondition(line, candidates, implications);
+    }
+}
+
+void printGraph(const Pathname& path) {
+    std::cout << "digraph rules {\n    rankdir=LR;\n    node [fontname=\"sans-serif\"];\n";
+    int number = 0;
+    readRules(path, [&number](const Rule& rule) {
+        // A condition contains no comma, so it cannot have the name of this node.
+        const std::string node = "\"rule," + std::to_string(++number) + '"';
+        std::cout << "    " << node << " [shape=box, label=" << std::quoted(rule.implication)
+                  << "];\n";
+        for (const std::string& condition : rule.conditions) {
+            std::cout << "    " << std::quoted(condition) << " -> " << node << ";\n";
+        }
+    });
+    std::cout << "}\n";
+}
+
+void answerTerms(const Pathname& path) {
+    RuleSystem rules;
+    readRules(path, [&rules](Rule& rule) {
+        addRule(rules, std::make_unique<AndOperator>(nullptr, rule.implication), rule);
+    });
+
+    StringSet implications;
+    rules.resetAll(implications);
+    printChanges({}, implications);
+    for (std::string line; std::getline(std::cin, line);) {
+        line = strip(line);
+        if (!line.empty()) {
+            const StringSet before = implications;
+            handle(rules, line, implications);
+            printChanges(before, implications);
+        }
     }
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    if (argc != 2) {
-        std::cerr << "Usage: rule_console RULES < TERMS\n";
+    const bool isGraph = argc == 3 && std::string(argv[1]) == "--graph";
+    if (argc != 2 && !isGraph) {
+        std::cerr << "Usage: rule_console RULES < TERMS\n       rule_console --graph RULES\n";
         return 2;
     }
     try {
-        RuleSystem rules;
-        readRules(rules, argv[1]);
-
-        StringSet implications;
-        rules.resetAll(implications);
-        printChanges({}, implications);
-        for (std::string line; std::getline(std::cin, line);) {
-            line = trimmed(line);
-            if (!line.empty()) {
-                const StringSet before = implications;
-                handle(rules, line, implications);
-                printChanges(before, implications);
-            }
+        if (isGraph) {
+            printGraph(Pathname(argv[2]));
+        } else {
+            answerTerms(Pathname(argv[1]));
         }
     } catch (const std::exception& e) {
         std::cerr << "rule_console: " << e.what() << '\n';

@@ -3,9 +3,11 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
-#include <sstream>
+#include <regex>
+#include <set>
 #include <string>
 
+#include "examples/Page.h"
 #include "support/RunProgram.h"
 #include "support/TempDir.h"
 
@@ -15,17 +17,15 @@ const std::string project = PROJECT;
 const std::string sampleRules = project + "/examples/rules.txt";
 const std::string sampleConfig = project + "/examples/own_log.cfg";
 
-// Whether README.md contains this text, indented by four spaces like all its input and output.
-testing::AssertionResult readmeShows(const std::string& text) {
-    std::string indented;
-    std::istringstream lines(text);
-    for (std::string line; std::getline(lines, line);) {
-        indented += "    " + line + '\n';
+// All matches of a regular expression, in this format.
+std::set<std::string> allMatches(const std::string& text, const char* regex, const char* format) {
+    const std::regex expression(regex);
+    std::set<std::string> found;
+    for (std::sregex_iterator match(text.begin(), text.end(), expression), end; match != end;
+         ++match) {
+        found.insert(match->format(format));
     }
-    if (readFile(project + "/README.md").find(indented) == std::string::npos) {
-        return testing::AssertionFailure() << "README.md does not show\n" << indented;
-    }
-    return testing::AssertionSuccess();
+    return found;
 }
 
 TEST(RuleConsoleTest, PrintsWhatFiresAndWhatStopsFiring) {
@@ -62,18 +62,19 @@ TEST(RuleConsoleTest, DoesWhatTheReadmeShows) {
             .in(project)
             .input("access-0103.log.gz\ndisk full\nkernel error 5\n-disk full\n!\n")
             .run();
-    EXPECT_TRUE(readmeShows("$ cat examples/rules.txt\n" + readFile(sampleRules)));
+    EXPECT_TRUE(pageShows("README.md", "$ cat examples/rules.txt\n" + readFile(sampleRules)));
     EXPECT_TRUE(
-        readmeShows("$ printf '%s\\n' access-0103.log.gz 'disk full' 'kernel error 5' '-disk full' "
-                    "'!' |\n"
-                    "      build/dev/examples/rule_console examples/rules.txt\n" +
-                    run.out));
+        pageShows("README.md",
+                  "$ printf '%s\\n' access-0103.log.gz 'disk full' 'kernel error 5' '-disk full' "
+                  "'!' |\n"
+                  "      build/dev/examples/rule_console examples/rules.txt\n" +
+                      run.out));
 }
 
 TEST(RuleConsoleTest, NamesTheLineOfARuleThatItCannotRead) {
     const TempDir dir;
     const std::string rules = dir.file("rules");
-    for (const char* bad : {"no colon", ": a", "  : a", "a: b,,c", "a: ,"}) {
+    for (const char* bad : {"no colon", ": a", "  : a", "a:", "a: b,,c", "a: ,"}) {
         writeFile(rules, std::string("# first\n\nfine: a\n") + bad + '\n');
         const ProgramRun run = Program(RULE_CONSOLE).arg(rules).run();
         EXPECT_EQ(1, run.status) << bad;
@@ -93,6 +94,48 @@ TEST(RuleConsoleTest, RefusesAPatternOfTooManySegments) {
     const ProgramRun run = Program(RULE_CONSOLE).arg(rules).run();
     EXPECT_EQ(1, run.status);
     EXPECT_EQ(0U, run.err.find("rule_console: " + rules + ":1: "));
+}
+
+TEST(RuleConsoleTest, PrintsTheRulesAsAGraph) {
+    const ProgramRun run = Program(RULE_CONSOLE).arg("--graph").arg(sampleRules).run();
+    EXPECT_EQ(0, run.status);
+    EXPECT_EQ("", run.err);
+    EXPECT_EQ(
+        "digraph rules {\n"
+        "    rankdir=LR;\n"
+        "    node [fontname=\"sans-serif\"];\n"
+        "    \"rule,1\" [shape=box, label=\"web log\"];\n"
+        "    \"*access*log*\" -> \"rule,1\";\n"
+        "    \"rule,2\" [shape=box, label=\"old log\"];\n"
+        "    \"*.gz\" -> \"rule,2\";\n"
+        "    \"rule,3\" [shape=box, label=\"archive the web log\"];\n"
+        "    \"*.gz\" -> \"rule,3\";\n"
+        "    \"*access*log*\" -> \"rule,3\";\n"
+        "    \"rule,4\" [shape=box, label=\"watching\"];\n"
+        "    \"meta::all\" -> \"rule,4\";\n"
+        "    \"rule,5\" [shape=box, label=\"call support\"];\n"
+        "    \"*error*\" -> \"rule,5\";\n"
+        "    \"disk full\" -> \"rule,5\";\n"
+        "}\n",
+        run.out);
+}
+
+TEST(RuleConsoleTest, QuotesTheNamesInAGraph) {
+    const TempDir dir;
+    writeFile(dir.file("rules"), "a \"b\": c\\d\n");
+    const std::string graph = Program(RULE_CONSOLE).arg("--graph").arg(dir.file("rules")).run().out;
+    EXPECT_NE(std::string::npos, graph.find("label=\"a \\\"b\\\"\"];\n")) << graph;
+    EXPECT_NE(std::string::npos, graph.find("    \"c\\\\d\" -> ")) << graph;
+}
+
+// docs/network.svg is made by `rule_console --graph examples/rules.txt | dot -Tsvg`.
+TEST(RuleConsoleTest, ThePictureInTheDocumentsShowsTheSampleRules) {
+    const std::string picture = readFile(project + "/docs/network.svg");
+    const std::string graph = Program(RULE_CONSOLE).arg("--graph").arg(sampleRules).run().out;
+    EXPECT_EQ(allMatches(graph, "\"(.*)\" -> \"(.*)\"", "$1&#45;&gt;$2"),
+              allMatches(picture, "<title>(.*&gt;.*)</title>", "$1"));
+    EXPECT_EQ(allMatches(graph, "label=\"(.*)\"|\"(.*)\" ->", "$1$2"),
+              allMatches(picture, ">(.*)</text>", "$1"));
 }
 
 TEST(RuleConsoleTest, NeedsARulesFile) {
@@ -130,8 +173,9 @@ TEST(OwnLogTest, DoesWhatTheReadmeShows) {
     std::string err =
         Program(OWN_LOG).arg("examples/own_log.cfg").arg(dir.path()).in(project).run().err;
     err.replace(err.find(dir.path()), dir.path().size(), "/tmp");
-    EXPECT_TRUE(readmeShows("$ build/dev/examples/own_log examples/own_log.cfg /tmp\n" + err));
-    EXPECT_TRUE(readmeShows("/tmp/own.log  /tmp/own.log.1  /tmp/own.log.2\n"));
+    EXPECT_TRUE(
+        pageShows("README.md", "$ build/dev/examples/own_log examples/own_log.cfg /tmp\n" + err));
+    EXPECT_TRUE(pageShows("README.md", "/tmp/own.log  /tmp/own.log.1  /tmp/own.log.2\n"));
 }
 
 TEST(OwnLogTest, ContinuesWithoutAConfigurationAndReportsIt) {

@@ -19,10 +19,10 @@ fail() {
 cmake --install "$build" --prefix "$prefix" >"$scratch/install.log" ||
     fail "$(cat "$scratch/install.log")"
 
-for file in bin/Rete include/quelta/util/LoaderInfo.h \
+for file in bin/Rete bin/log_watch include/quelta/util/LoaderInfo.h \
     include/quelta/util/Logger.h include/quelta/util/Version.h \
     include/quelta/services/pipeline/indexprocessor/Rete.h share/man/man1/Rete.1 \
-    share/man/man5/log-cmdline.cfg.5 \
+    share/man/man1/log_watch.1 share/man/man5/log-cmdline.cfg.5 \
     share/quelta/sample/etc/log-cmdline.cfg; do
     [ -s "$prefix/$file" ] || fail "missing: $file"
 done
