@@ -10,12 +10,6 @@
 #include "util/Pathname.h"
 #include "util/internal/FileCloser.h"
 
-namespace {
-
-using OpenFile = std::unique_ptr<FILE, FileCloser>;
-
-}  // namespace
-
 bool readLine(FILE* f, char* linebuf, int bufSize) {
     std::fill_n(linebuf, bufSize, '\0');
     if (bufSize < 3 || std::fgets(linebuf, bufSize - 1, f) == nullptr) {
