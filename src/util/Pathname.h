@@ -24,6 +24,8 @@
 #include <utility>
 #include <vector>
 
+#include "util/Requirements.h"
+
 class FileDescriptor;
 
 // A path. Every operation of std::string works on its text.
