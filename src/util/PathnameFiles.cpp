@@ -30,7 +30,7 @@ bool Pathname::getMtime(long* mtime) const {
     if (!stat(&info)) {
         return false;
     }
-    *mtime = info.st_mtime;
+    *mtime = static_cast<long>(info.st_mtime);
     return true;
 }
 
