@@ -19,6 +19,8 @@
 #include <cstdio>
 #include <string>
 
+#include "util/Requirements.h"
+
 class Pathname;
 
 // --- Copies and comparisons ------------------------------------------------------------------

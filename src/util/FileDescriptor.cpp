@@ -11,8 +11,6 @@
 #include "util/internal/ErrnoKeeper.h"
 #include "util/internal/FormatText.h"
 
-static_assert(sizeof(off_t) == 8, "offsets need 64 bits; build with -D_FILE_OFFSET_BITS=64");
-
 namespace {
 
 // The one loop that completes a transfer: `call(done, remaining)` is one system call.

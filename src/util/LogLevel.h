@@ -6,13 +6,18 @@
 //     std::size_t length = 0;
 //     std::puts(loglevel2str(&length, WARN));  // "WARN"; length is 4
 //
-// The enumerators are global names. No build of this project defines a macro DEBUG, which would
-// replace the first of them.
+// The enumerators are global names.
 // Safe from any thread.
 
 #include <cstddef>
 #include <cstdint>
 #include <string_view>
+
+#include "util/Requirements.h"
+
+#ifdef DEBUG
+#error "DEBUG is a log level, which a macro would replace: compile without -DDEBUG"
+#endif
 
 // The severity of a message.
 enum LogLevel : std::int32_t {

@@ -30,6 +30,8 @@
 
 #include <stdexcept>
 
+#include "util/Requirements.h"
+
 // Base of the wrappers; holds their error check.
 class PthreadObject {
 public:

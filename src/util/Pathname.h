@@ -24,6 +24,8 @@
 #include <utility>
 #include <vector>
 
+#include "util/Requirements.h"
+
 class FileDescriptor;
 
 // A path. Every operation of std::string works on its text.
@@ -133,7 +135,8 @@ public:
     [[nodiscard]] bool isDir() const;
     // Returns: whether the path exists and is a regular file.
     [[nodiscard]] bool isReg() const;
-    // Replaces *mtime by the time of the last change, in seconds since the epoch.
+    // Replaces *mtime by the time of the last change, in seconds since the epoch. A long of 32 bits
+    // holds times until January 2038; later ones wrap.
     // Errors: false, and *mtime is unchanged.
     bool getMtime(long* mtime) const;
     // Replaces *size by the size in bytes.

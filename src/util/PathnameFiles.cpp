@@ -11,8 +11,6 @@
 #include "util/Assert.h"
 #include "util/FileDescriptor.h"
 
-static_assert(sizeof(off_t) == 8, "sizes need 64 bits; build with -D_FILE_OFFSET_BITS=64");
-
 bool Pathname::stat(struct stat* result) const {
     return ::stat(c_str(), result) == 0;
 }
@@ -32,7 +30,7 @@ bool Pathname::getMtime(long* mtime) const {
     if (!stat(&info)) {
         return false;
     }
-    *mtime = info.st_mtime;
+    *mtime = static_cast<long>(info.st_mtime);
     return true;
 }
 

@@ -24,7 +24,7 @@ struct Difference {
     }
 
     long long seconds;
-    long micros;  // 0..999999
+    long long micros;  // 0..999999
 };
 
 // Returns: the value with one to three decimals, at least 5 characters wide, and the unit.

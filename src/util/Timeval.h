@@ -19,6 +19,8 @@
 #include <string>
 #include <tuple>
 
+#include "util/Requirements.h"
+
 // An instant of wall-clock time.
 class Timeval {
 public:

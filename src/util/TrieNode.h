@@ -19,6 +19,8 @@
 #include <utility>
 #include <vector>
 
+#include "util/Requirements.h"
+
 // A node, and the trie below it.
 template <typename T>
 class TrieNode {

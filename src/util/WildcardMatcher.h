@@ -26,6 +26,8 @@
 #include <string>
 #include <vector>
 
+#include "util/Requirements.h"
+
 // A compiled pattern.
 class WildcardMatcher {
 public:

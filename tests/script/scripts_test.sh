@@ -15,6 +15,7 @@ cat >"$clone/script/packages.txt" <<'END'
 run shell sh
 run libpopt-dev is_there popt
 test libgtest-dev is_there gtest
+platforms shell sh
 END
 
 tool() {
@@ -95,6 +96,12 @@ for script in "run" "bootstrap run" "test"; do
     sudo apt-get update && sudo apt-get install -y libpopt-dev"
 done
 
+absent=
+run "$clone/script/platforms" debian13
+expect "a platform without rights" "$status $out" "0 $(
+    printf '%-9s %-51s %s' debian13 '' 'skipped: needs the rights of root')"
+
+absent=popt
 user=0
 run "$clone/script/bootstrap" run test
 expect "with rights: status and output" "$status $out" "0 "
@@ -106,7 +113,7 @@ absent=
 run "$clone/script/bootstrap" run test
 expect "nothing is missing" "$status $out$err" "0 "
 
-for script in bench bootstrap check fuzz run test; do
+for script in bench bootstrap check fuzz platforms run test; do
     run "$clone/script/$script" --help
     expect "$script --help: status and error" "$status $err" "0 "
     case $out in
@@ -132,5 +139,7 @@ refused bootstrap "no group is named"
 refused bootstrap "unknown group 'nonsense'" run nonsense
 refused bench "unknown program '--fast', not one of LoggerBench" --fast
 refused check "unknown check 'nonsense'" format nonsense
+refused platforms "unknown platform 'nonsense', not one of g++12 clang14 c++23 clang16 libc++ arm64 \
+armhf s390x debian13" nonsense
 refused fuzz "'ten' is not a number of seconds" ten
 refused fuzz "unknown topic 'nonsense', not one of Strings" 10 nonsense

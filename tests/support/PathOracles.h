@@ -184,7 +184,7 @@ inline std::string shellQuoted(const std::string& path) {
     };
     const std::string always = "\"$\\";
     const std::string special = "#&*;=?[]|";
-    if (path.empty() || !has("\t\n '" + always + special)) {
+    if (path.empty() || !(has("\t\n '") || has(always) || has(special))) {
         return path.empty() ? "\"\"" : path;
     }
     if (!has("'") && has(always)) {

@@ -83,10 +83,15 @@ private:
 };
 
 // LogAppender::write(const LogMsgMetadata&, std::string_view) as the linker names it, after the
-// prefix of the real or the wrapped function.
+// prefix of the real or the wrapped function. It depends on the C++ library.
 // clang-format off
+#ifdef _LIBCPP_VERSION
+#define QUELTA_APPENDER_WRITE(prefix) \
+    prefix##__ZN11LogAppender5writeERK14LogMsgMetadataNSt3__117basic_string_viewIcNS3_11char_traitsIcEEEE
+#else
 #define QUELTA_APPENDER_WRITE(prefix) \
     prefix##__ZN11LogAppender5writeERK14LogMsgMetadataSt17basic_string_viewIcSt11char_traitsIcEE
+#endif
 // clang-format on
 
 extern "C" {

@@ -24,9 +24,12 @@ struct Guard {
 std::string textOf(const char* argument) {
     return argument;
 }
-std::string textOf(mode_t mode) {
+struct Octal {
+    mode_t mode;
+};
+std::string textOf(Octal octal) {
     char text[16];
-    std::snprintf(text, sizeof text, "0%o", mode);
+    std::snprintf(text, sizeof text, "0%o", octal.mode);
     return text;
 }
 template <typename Number>
@@ -146,7 +149,7 @@ int __wrap_open(const char* path, int flags, ...) {
     va_start(args, flags);
     const mode_t mode = (flags & O_CREAT) != 0 ? va_arg(args, mode_t) : 0;
     va_end(args);
-    STUB_BODY(open, (path, flags, mode), (path, flags, mode), 0)
+    STUB_BODY(open, (path, flags, mode), (path, flags, Octal{mode}), 0)
 }
 
 // For the commands that this project uses, which take an int or nothing.

@@ -51,9 +51,9 @@ struct poptOption;
     FUNCTION(int, fsync, (int fd), (fd), ()) \
     FUNCTION(int, gettimeofday, (struct timeval* now, void* zone), (now, zone), ()) \
     FUNCTION(struct tm*, localtime_r, (const time_t* t, struct tm* result), (t, result), ()) \
-    FUNCTION(int, mkdir, (const char* path, mode_t mode), (path, mode), (path, mode)) \
+    FUNCTION(int, mkdir, (const char* path, mode_t mode), (path, mode), (path, Octal{mode})) \
     VARIADIC(int, open, (const char* path, int flags, mode_t mode), \
-        (path, flags, mode), (path, flags, mode)) \
+        (path, flags, mode), (path, flags, Octal{mode})) \
     FUNCTION(poptContext_s*, poptGetContext, \
         (const char* name, int argc, const char** argv, const struct poptOption* o, unsigned f), \
         (name, argc, argv, o, f), ()) \

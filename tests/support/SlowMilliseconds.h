@@ -1,18 +1,17 @@
 #ifndef QUELTA_TESTS_SUPPORT_SLOWMILLISECONDS_H_
 #define QUELTA_TESTS_SUPPORT_SLOWMILLISECONDS_H_
 
-// A slow convert_string_to_milliseconds, for comparison. It collects the digits as text and counts
-// tenths of milliseconds in 128 bits.
+// A slow convert_string_to_milliseconds, for comparison. It collects the digits of the tenths of
+// milliseconds as text and lets strtoull convert, and limit, all but the last.
 
 #include <algorithm>
-#include <limits>
+#include <climits>
+#include <cstdlib>
 #include <string>
 
 // Returns: the milliseconds and the number of characters, separated by a blank; "none" if there is
 // no number.
 inline std::string convertSlowly(const std::string& text) {
-    __extension__ using Wide = unsigned __int128;
-    constexpr Wide ALL_ONES = std::numeric_limits<unsigned long long>::max();
     const auto endOfDigits = [&text](std::size_t from) {
         return std::min(text.find_first_not_of("0123456789", from), text.size());
     };
@@ -28,15 +27,16 @@ inline std::string convertSlowly(const std::string& text) {
     if (end == start) {
         return "none";
     }
-    Wide tenths = 0;
-    for (const char digit : whole + (fraction + "0000").substr(0, 4)) {
-        tenths = std::min(tenths * 10 + static_cast<unsigned>(digit - '0'), ALL_ONES * 100);
+    const std::string tenths = whole + (fraction + "0000").substr(0, 4);
+    const std::string digits = tenths.substr(0, tenths.size() - 1);
+    unsigned long long msecs = std::strtoull(digits.c_str(), nullptr, 10);
+    if (tenths.back() >= '5' && msecs != ULLONG_MAX) {
+        ++msecs;
     }
-    Wide msecs = std::min((tenths + 5) / 10, ALL_ONES);
     if (msecs == 0 && fraction.find_first_not_of('0') != std::string::npos) {
         msecs = 1;
     }
-    return std::to_string(static_cast<unsigned long long>(msecs)) + ' ' + std::to_string(end);
+    return std::to_string(msecs) + ' ' + std::to_string(end);
 }
 
 #endif  // QUELTA_TESTS_SUPPORT_SLOWMILLISECONDS_H_

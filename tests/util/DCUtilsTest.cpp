@@ -256,6 +256,9 @@ TEST(DCUtilsTest, WritesNumbersInDecimal) {
 }
 
 TEST(DCUtilsTest, ReadsLongs) {
+    const std::string largest = std::to_string(LONG_MAX), smallest = std::to_string(LONG_MIN);
+    const std::string tooLarge = std::to_string(LONG_MAX + 1UL);
+    const std::string tooSmall = '-' + std::to_string(LONG_MAX + 2UL);
     for (const int stale : {0, EDOM, ERANGE}) {
         const auto read = [stale](const std::string& text) {
             bool successful = false;
@@ -265,12 +268,11 @@ TEST(DCUtilsTest, ReadsLongs) {
             return std::to_string(value) + (successful ? "" : " failed");
         };
         expectEach(read, {"0 > 0", "12 > 12", "-12 > -12", "+12 > 12", " \t\n12 > 12", "007 > 7",
-                          "9223372036854775807 > 9223372036854775807",
-                          "-9223372036854775808 > -9223372036854775808"});
-        expectEach(read, {"9223372036854775808 > 9223372036854775807 failed",
-                          "-9223372036854775809 > -9223372036854775808 failed", "12x > 12 failed",
-                          "12  > 12 failed", "0x10 > 0 failed", " > 0 failed", "  > 0 failed",
-                          "x > 0 failed", "- > 0 failed", "12\0 > 12 failed"s});
+                          largest + " > " + largest, smallest + " > " + smallest});
+        expectEach(read,
+                   {tooLarge + " > " + largest + " failed", tooSmall + " > " + smallest + " failed",
+                    "12x > 12 failed", "12  > 12 failed", "0x10 > 0 failed", " > 0 failed",
+                    "  > 0 failed", "x > 0 failed", "- > 0 failed", "12\0 > 12 failed"s});
     }
 }
 

@@ -1,9 +1,5 @@
 #include "util/LogLevel.h"
 
-#ifdef DEBUG
-#error "DEBUG is a log level and no build may define it as a macro"
-#endif
-
 #include <gtest/gtest.h>
 
 #include <climits>

@@ -32,8 +32,13 @@ static void recordLookup(const std::string& name, bool create) {
 // The two forms of LogChannel::find.
 // clang-format off
 #define FIND_TEXT(prefix) prefix##__ZN10LogChannel4findEPKcb
+#ifdef _LIBCPP_VERSION
+#define FIND_STRING(prefix) \
+    prefix##__ZN10LogChannel4findERKNSt3__112basic_stringIcNS0_11char_traitsIcEENS0_9allocatorIcEEEEb
+#else
 #define FIND_STRING(prefix) \
     prefix##__ZN10LogChannel4findERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEEb
+#endif
 // clang-format on
 extern "C" {
 LogChannel* FIND_TEXT(__real)(const char* name, bool create);

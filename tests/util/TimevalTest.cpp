@@ -127,7 +127,7 @@ TEST(TimevalTest, AddMsecAssertsThatTheMicrosecondsWereInRange) {
 // The additions as 32-bit machine arithmetic does them: wrap around, and notice by the sign.
 std::string addIn32Bits(const Timeval& start, unsigned long long msecs, bool wholeSeconds) {
     const auto before = static_cast<std::int32_t>(start._tv.tv_sec);
-    long usec = start._tv.tv_usec;
+    long long usec = start._tv.tv_usec;
     std::uint32_t sec = static_cast<std::uint32_t>(before);
     if (wholeSeconds) {
         sec += static_cast<std::uint32_t>(msecs);

@@ -30,6 +30,8 @@
 #include <set>
 #include <string>
 
+#include "util/Requirements.h"
+
 class BoolOperator;
 
 // A set of implications or names.

@@ -15,6 +15,8 @@
 #include <set>
 #include <string>
 
+#include "util/Requirements.h"
+
 // Draws one number.
 // Requires: min <= max; only an empty range, max = min - 1, is asserted.
 // Returns: a number from min to max, both included.

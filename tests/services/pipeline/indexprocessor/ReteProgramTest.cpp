@@ -327,7 +327,7 @@ TEST_F(ReteProgramTest, PrintsTheSecondsBetweenTwoReadings) {
 
 // The measured time begins after the line of conditions and ends after the line of implications.
 TEST_F(ReteProgramTest, ReadsTheClockAroundResetAndMatch) {
-    static std::vector<long> printedSoFar;
+    static std::vector<off_t> printedSoFar;
     printedSoFar.clear();
     onReading = [] {
         std::fflush(stdout);
