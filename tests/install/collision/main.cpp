@@ -10,11 +10,8 @@ namespace {
 
 class Worker : public Thread {
 public:
-    Worker() : Thread("worker") {
-    }
-    void main() override {
-        std::puts("worker");
-    }
+    Worker() : Thread("worker") {}
+    void main() override { std::puts("worker"); }
 };
 
 }  // namespace
