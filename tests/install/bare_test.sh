@@ -9,7 +9,7 @@ packages=$(CDPATH= cd -- "$1" && pwd)
 
 mmdebstrap --quiet --variant=apt --format=null \
     --customize-hook="copy-in $here/consumer $here/collision $packages /root" \
-    --customize-hook='chroot "$1" sh -euc "
+    --customize-hook='chroot "$1" env -i PATH="$PATH" HOME=/root sh -euc "
         export DEBIAN_FRONTEND=noninteractive
         cd /root
         apt-get install -y -qq --no-install-recommends ./*/libquelta*.deb g++ cmake make
