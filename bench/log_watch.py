@@ -1,13 +1,12 @@
 #!/usr/bin/env python3
 """Compares log_watch with grep.
 
-Usage: bench/log_watch.py LOG_WATCH [ROUNDS]
-
 Makes a log of which one line in a hundred is a failed login that a rule describes, and 10, 1,000 and
 30,000 such rules. Runs the programs in turn, checks that they find the same lines, and prints the
 medians as a table, in lines per second of the whole process. All of them write the lines that they
 find to a file; log_watch also logs them.
 """
+import argparse
 import itertools
 import os
 import pathlib
@@ -97,10 +96,10 @@ def compare(log_watch, count, rounds, directory):
 
 
 def main():
-    if len(sys.argv) not in (2, 3):
-        sys.exit(__doc__)
-    log_watch = pathlib.Path(sys.argv[1]).resolve()
-    rounds = int(sys.argv[2]) if len(sys.argv) == 3 else 5
+    parser = argparse.ArgumentParser(description=__doc__)
+    parser.add_argument('log_watch', type=pathlib.Path, help='the program')
+    parser.add_argument('rounds', type=int, nargs='?', default=5)
+    options = parser.parse_args()
     print('| rules | program | lines per second |\n|---|---|---|')
     with tempfile.TemporaryDirectory() as scratch:
         directory = pathlib.Path(scratch)
@@ -108,7 +107,7 @@ def main():
         (directory / 'var/log').mkdir(parents=True)
         (directory / 'etc/log-cmdline.cfg').touch()
         for count in RULES:
-            compare(str(log_watch), count, rounds, directory)
+            compare(str(options.log_watch.resolve()), count, options.rounds, directory)
 
 
 main()

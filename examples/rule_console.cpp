@@ -26,6 +26,9 @@
 
 namespace {
 
+constexpr const char* USAGE =
+    "Usage: rule_console RULES < TERMS\n       rule_console --graph RULES\n";
+
 void printChanges(const StringSet& before, const StringSet& after) {
     StringSet changed;
     std::set_difference(before.begin(), before.end(), after.begin(), after.end(),
@@ -92,8 +95,12 @@ void answerTerms(const Pathname& path) {
 int main(int argc, char** argv) {
     const bool isGraph = argc == 3 && std::string(argv[1]) == "--graph";
     if (argc != 2 && !isGraph) {
-        std::cerr << "Usage: rule_console RULES < TERMS\n       rule_console --graph RULES\n";
+        std::cerr << USAGE;
         return 2;
+    }
+    if (argv[1] == std::string("--help")) {
+        std::cout << USAGE;
+        return 0;
     }
     try {
         if (isGraph) {

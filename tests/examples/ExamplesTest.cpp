@@ -139,6 +139,9 @@ TEST(RuleConsoleTest, ThePictureInTheDocumentsShowsTheSampleRules) {
 }
 
 TEST(RuleConsoleTest, NeedsARulesFile) {
+    const ProgramRun help = Program(RULE_CONSOLE).arg("--help").run();
+    EXPECT_EQ(0, help.status);
+    EXPECT_EQ(0U, help.out.find("Usage: rule_console RULES"));
     EXPECT_EQ(2, Program(RULE_CONSOLE).run().status);
     const ProgramRun run = Program(RULE_CONSOLE).arg("/nowhere/rules").run();
     EXPECT_EQ(1, run.status);
