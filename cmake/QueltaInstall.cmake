@@ -107,15 +107,17 @@ endif()
 # The programs, their manual pages and a sample installation. The pages contain the prefix. They
 # are configured during installation, because `cmake --install --prefix` and CPack may change it.
 install(TARGETS Rete RUNTIME COMPONENT program)
+set(pages Rete.1 log-cmdline.cfg.5)
 if(QUELTA_BUILD_EXAMPLES)
   install(TARGETS log_watch RUNTIME COMPONENT program)
+  list(APPEND pages log_watch.1)
 endif()
 set(sample "${CMAKE_INSTALL_DATADIR}/quelta/sample")
 set(QUELTA_SAMPLE "${CMAKE_INSTALL_PREFIX}/${sample}")
 install(CODE "
   set(PROJECT_VERSION \"${PROJECT_VERSION}\")
   set(QUELTA_SAMPLE \"\${CMAKE_INSTALL_PREFIX}/${sample}\")" COMPONENT program)
-foreach(page Rete.1 log_watch.1 log-cmdline.cfg.5)
+foreach(page ${pages})
   set(source "${PROJECT_SOURCE_DIR}/man/${page}.in")
   set(installed "${PROJECT_BINARY_DIR}/man/installed/${page}")
   configure_file("${source}" "${PROJECT_BINARY_DIR}/man/${page}" @ONLY)
